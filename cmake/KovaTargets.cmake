@@ -1,0 +1,28 @@
+# The few kinds of target the project has, so that each folder's CMakeLists.txt names only its own.
+
+# kova_library(NAME SHARED|STATIC SOURCES ... [LINK ...] [PRIVATE_LINK ...])
+function(kova_library name kind)
+  cmake_parse_arguments(ARG "" "" "SOURCES;LINK;PRIVATE_LINK" ${ARGN})
+  add_library(${name} ${kind} ${ARG_SOURCES})
+  target_link_libraries(${name} PUBLIC kova::options ${ARG_LINK} PRIVATE ${ARG_PRIVATE_LINK})
+  if(kind STREQUAL "SHARED")
+    set_target_properties(${name} PROPERTIES VERSION ${PROJECT_VERSION} SOVERSION ${PROJECT_VERSION_MAJOR})
+    target_link_options(${name} PRIVATE -Wl,--no-undefined)
+    install(TARGETS ${name} LIBRARY DESTINATION ${CMAKE_INSTALL_LIBDIR} NAMELINK_SKIP)
+  endif()
+endfunction()
+
+# kova_test(NAME LABEL unit|contract|integration|abi|e2e SOURCES ... [LINK ...] [TIMEOUT seconds])
+# One executable; every TEST in it is one test of ctest.
+function(kova_test name)
+  cmake_parse_arguments(ARG "" "LABEL;TIMEOUT" "SOURCES;LINK" ${ARGN})
+  find_package(GTest REQUIRED)
+  include(GoogleTest)
+  if(NOT ARG_TIMEOUT)
+    set(ARG_TIMEOUT 300)
+  endif()
+  add_executable(${name} ${ARG_SOURCES})
+  target_link_libraries(${name} PRIVATE kova::options ${ARG_LINK} GTest::gmock GTest::gtest_main)
+  set_target_properties(${name} PROPERTIES RUNTIME_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/test)
+  gtest_discover_tests(${name} DISCOVERY_MODE PRE_TEST PROPERTIES LABELS ${ARG_LABEL} TIMEOUT ${ARG_TIMEOUT})
+endfunction()

@@ -1,0 +1,22 @@
+// The one manager of the process, and its making. Internal to the plug-in.
+#pragma once
+
+#include "tessa/Logger.h"
+#include "tessa/Ref.h"
+
+namespace Kovasvc {
+
+class KovaManagerImpl;
+
+// What panics name as their source. The name and the lines are fixed: tools that read panics know them.
+inline constexpr const char* sourcePath = "kova/agentd/KovaLibManager";
+
+// The manager behind all hooks; null until InitKovaPlugin has made it. Not guarded: it is written before
+// the first hook is called. A test may put a manager of its own here.
+extern Tessa::Ref<KovaManagerImpl> _kovaManagerImpl;
+
+// Makes the manager; panics when there is one already. Throws what its construction throws, and there is
+// no manager then.
+void CreateKovaManager(Tessa::Ref<Tessa::Service::Logger>& logger);
+
+}  // namespace Kovasvc

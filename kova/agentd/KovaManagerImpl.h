@@ -1,0 +1,108 @@
+// The object behind all hooks: it owns the kernel provider, the two locks and the disk cache, and holds
+// the order of each operation's steps. The rules themselves stand elsewhere (planning, marshal, query).
+//
+// Threads: operations may be called from several threads at once. Two locks guard the shared state: the
+// operation lock lets one disk-changing operation work at a time, the disk-cache lock guards the cached
+// records and their valid flag. Where both are held, the operation lock was taken first. Neither is
+// recursive: an operation releases the operation lock before it calls one that takes it.
+//
+// Answers: `faultText` and `resultText` are appended to, never assigned. An operation turns the kernel's
+// exceptions into faults; any other exception leaves it, with all locks released.
+#pragma once
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "kova/agentd/include/KovaRecords.h"
+#include "kova/agentd/util/KovaUtil.h"
+#include "nox/Fwd.h"
+#include "orbis/DataArray.h"
+#include "tessa/Lockable.h"
+#include "tessa/Logger.h"
+#include "tessa/Ref.h"
+
+namespace HostCtl::Kova {
+class KovaInfo;
+}
+namespace Orbis {
+class MethodFault;
+}
+
+namespace Kovasvc {
+
+class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
+ public:
+  using Texts = std::vector<std::string>;
+  using Mapping = Nox::Kova::Host::DiskMapping;
+  using MapResult = Nox::Kova::Host::DiskMapResult;
+
+  // Throws HostCtl::Lib::HostCtlException when there is no provider, and whatever making the locks throws.
+  explicit KovaManagerImpl(Tessa::Ref<Tessa::Service::Logger>& logger);
+  ~KovaManagerImpl() override;
+
+  // The order of these operations is that of the operation table and must not change.
+
+  virtual void AddDisks(const Texts& disks, const std::string& requestTag, std::string& faultText,
+                        std::string& resultText);
+  virtual void InitializeDisks(const Texts& mappings, const std::string& requestTag, std::string& faultText,
+                               std::string& resultText);
+  virtual void RemoveDisk(const std::string& disk, const std::string& passThrough,
+                          const std::string& optionText, int optionFirst, int optionSecond,
+                          std::string& faultText);
+  virtual void RemoveDiskMapping(const std::string& mapping, const std::string& passThrough,
+                                 const std::string& optionText, int optionFirst, int optionSecond,
+                                 std::string& faultText);
+  // Which disks the service could use. No names: every disk that the kernel and the agent both know.
+  // Names that match no disk are passed over. Without an inventory there is no answer at all.
+  virtual void QueryDisksForKova(Texts& names, std::string& faultText, std::string& resultText);
+  virtual void AddAllEligibleDisks(const std::string& requestTag, std::string& faultText,
+                                   std::string& resultText);
+  virtual void UnmountDiskMapping(const Texts& mappings, const std::string& requestTag,
+                                  std::string& faultText, std::string& resultText);
+  virtual void GetStorageInfo(std::string& resultText);
+  virtual void GetConfigInfo(std::string& resultText);
+  virtual void ClaimUnmountedDiskgroup();
+  // The kernel's mounted disk groups, appended. Provider exceptions pass.
+  virtual void GetKovaDiskMapping(std::vector<HostCtl::Kova::DiskMapping>& mappings);
+  virtual void InitializeDisksInt(Orbis::DataArray<Mapping>* mappings, const std::string& requestTag,
+                                  Tessa::Ref<Orbis::Any>& result, Tessa::Ref<Orbis::MethodFault>& fault);
+  virtual void ValidateDiskMapping(Tessa::Ref<Mapping> mapping, Tessa::Ref<MapResult>& result);
+  virtual void ValidateDiskMappings(Orbis::DataArray<Mapping>* mappings);
+  virtual bool DiskMappingExists(Tessa::Ref<Mapping> mapping);
+  virtual void FormatDiskMapping(const std::string& ssdName, Texts& nonSsdNames,
+                                 const std::string& requestTag, int mappingCount, int mappingIndex);
+  virtual void RestampDiskMapping(const std::string& ssdName, Texts& capacityNames);
+  virtual void InitializeMapping(Tessa::Ref<Mapping> mapping, const std::string& requestTag,
+                                 int mappingCount, int mappingIndex, Tessa::Ref<MapResult>& result);
+  virtual void UnmountDiskMappingInt(Tessa::Ref<Mapping>& mapping, const std::string& requestTag,
+                                     Tessa::Ref<Orbis::MethodFault>& fault);
+
+  // Makes the cache valid, if it is not, by asking the kernel for every disk's record. A failing kernel is
+  // a warning and an empty, invalid cache, not an error. Takes the disk-cache lock.
+  void RefreshKovaDiskCache();
+  // The same for a caller that holds the disk-cache lock.
+  void RefreshKovaDiskCacheLocked();
+  // The next refresh will ask the kernel again. The records stay in memory until then. Takes the
+  // disk-cache lock.
+  void InvalidateKovaDiskCache();
+
+  // Appends the SOAP texts of what is there; both, one or none may be null.
+  void SerializeKovaResultAndFault(std::string& resultText, std::string& faultText,
+                                   Tessa::Ref<Orbis::Any>& result, Tessa::Ref<Orbis::MethodFault>& fault);
+
+ protected:
+  const Tessa::Ref<Tessa::Service::Logger>& GetLogger() const noexcept { return _logger; }
+
+ private:
+  // In reverse, the order in which a manager goes down: the provider first.
+  Tessa::Ref<Tessa::Service::Logger> _logger;
+  Tessa::Ref<Util::KovaUtil> _util;
+  std::vector<HostCtl::Kova::DiskResult> _diskCache;  // guarded by _diskCacheLock
+  bool _diskCacheValid = false;                       // guarded by _diskCacheLock
+  Tessa::Ref<Tessa::System::Lock> _operationLock;
+  Tessa::Ref<Tessa::System::Lock> _diskCacheLock;
+  std::unique_ptr<HostCtl::Kova::KovaInfo> _provider;
+};
+
+}  // namespace Kovasvc

@@ -1,0 +1,28 @@
+// The filter over the kernel's records that queries, planning and validation share.
+#pragma once
+
+#include <string>
+#include <vector>
+
+#include "kova/agentd/include/KovaRecords.h"
+#include "tessa/Logger.h"
+
+namespace Kovasvc {
+
+// What to filter by. The values below are where every user starts from.
+struct DiskQueryLimit {
+  bool byState = false;
+  HostCtl::Kova::DiskState state = HostCtl::Kova::DiskState::Eligible;
+  bool byReason = false;
+  HostCtl::Kova::DiskReason reason = HostCtl::Kova::DiskReason::None;
+  bool fifthFlag = true;  // carried along; no filter reads it
+};
+
+// Appends copies of the records that pass, in the order of the records. No names: every name passes; a
+// name that matches nothing is passed over. A failing kernel ends the walk with a warning.
+void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<std::string>& names,
+                            const DiskQueryLimit& limit,
+                            const std::vector<HostCtl::Kova::DiskResult>& records,
+                            std::vector<HostCtl::Kova::DiskResult>& passed);
+
+}  // namespace Kovasvc

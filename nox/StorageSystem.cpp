@@ -1,0 +1,5 @@
+#include "nox/StorageSystem.h"
+
+namespace Nox::Host {
+StorageSystem::~StorageSystem() = default;
+}  // namespace Nox::Host

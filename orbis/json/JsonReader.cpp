@@ -1,0 +1,214 @@
+#include <limits>
+#include <string>
+
+#include "orbis/Json.h"
+#include "orbis/ParseException.h"
+#include "orbis/Scalar.h"
+#include "orbis/TypeDescriptor.h"
+#include "orbis/json/JsonText.h"
+
+namespace Orbis {
+namespace {
+
+using Json::Kind;
+using Json::Value;
+
+constexpr std::string_view typeKey = "@type";
+constexpr std::string_view valueKey = "@value";
+constexpr std::string_view simplePrefix = "xsd:";
+
+// Where a value stands; only printed when something is refused.
+struct Place {
+  const Place* parent;
+  std::string_view name;  // empty: the element of a list
+  std::size_t index = 0;
+
+  std::string ToString() const {
+    std::string path = parent == nullptr ? "" : parent->ToString();
+    if (parent == nullptr) {
+      return path;
+    }
+    if (name.empty()) {
+      return path + "[" + std::to_string(index) + "]";
+    }
+    return path + (path.empty() ? "" : ".") + std::string(name);
+  }
+};
+
+[[noreturn]] void Refuse(const Value& value, const Place& place, const std::string& reason) {
+  const std::string path = place.ToString();
+  throw ParseException(path.empty() ? "(root)" : path, value.line, reason);
+}
+
+void Demand(Kind kind, const char* wanted, const Value& value, const Place& place) {
+  if (value.kind != kind) {
+    Refuse(value, place, std::string("wanted ") + wanted + ", found " + Json::Describe(value));
+  }
+}
+
+class JsonReader {
+ public:
+  explicit JsonReader(Missing missing) : _missing(missing) {}
+
+  // A value whose declared type is null (any) or a data object's or list's.
+  Ref<Any> Read(const Value& value, const TypeDescriptor* declared, const Place& place) const {
+    if (declared != nullptr && declared->kind != TypeKind::DataObject) {
+      return ReadList(value, *declared, place);
+    }
+    Demand(Kind::Object, "an object", value, place);
+    const TypeDescriptor& type = TypeOf(value, declared, place);
+    return type.kind == TypeKind::DataObject ? ReadObject(value, type, place) : ReadWrapped(value, type, place);
+  }
+
+ private:
+  const TypeDescriptor& TypeOf(const Value& value, const TypeDescriptor* declared, const Place& place) const {
+    const Value* const name = value.Find(typeKey);
+    if (name != nullptr) {
+      Demand(Kind::String, "the name of a type", *name, Place{&place, typeKey});
+    }
+    const TypeDescriptor* const type = name == nullptr ? declared : Named(name->text);
+    if (name != nullptr && type == nullptr) {
+      Refuse(*name, Place{&place, typeKey}, "unknown type '" + name->text + "'");
+    }
+    if (type == nullptr) {
+      Refuse(value, place, "a value of any type needs \"@type\"");
+    }
+    if (declared != nullptr && !type->IsA(*declared)) {
+      Refuse(*name, Place{&place, typeKey}, "type " + type->name + " is not a " + declared->name);
+    }
+    if (type->IsAbstract()) {
+      Refuse(value, place, "type " + type->name + " has no objects of its own; \"@type\" must name one of its kinds");
+    }
+    return *type;
+  }
+
+  static const TypeDescriptor* Named(std::string_view name) {
+    return name.substr(0, simplePrefix.size()) == simplePrefix ? FindSimpleType(name.substr(simplePrefix.size()))
+                                                               : FindType(name);
+  }
+
+  Ref<Any> ReadObject(const Value& value, const TypeDescriptor& type, const Place& place) const {
+    const Ref<Any> made = type.create();
+    auto& object = static_cast<DataObject&>(*made);
+    std::size_t used = value.Find(typeKey) != nullptr ? 1 : 0;
+    for (const FieldDescriptor* field : type.fields) {
+      const Value* const member = value.Find(field->name);
+      if (member != nullptr) {
+        ReadField(*member, *field, object, Place{&place, field->name});
+        ++used;
+      } else if (field->presence == Presence::Required && _missing == Missing::Refused) {
+        Refuse(value, place, "required field '" + std::string(field->name) + "' is missing");
+      }
+    }
+    if (used != value.members.size()) {
+      RefuseUnknown(value, type, place);
+    }
+    return made;
+  }
+
+  [[noreturn]] static void RefuseUnknown(const Value& value, const TypeDescriptor& type, const Place& place) {
+    for (const auto& [key, member] : value.members) {
+      bool known = key == typeKey;
+      for (const FieldDescriptor* field : type.fields) {
+        known = known || field->name == key;
+      }
+      if (!known) {
+        Refuse(member, Place{&place, key}, "unknown field; " + type.name + " has none of that name");
+      }
+    }
+    Refuse(value, place, "unknown field");
+  }
+
+  // {"@type": .., "@value": ..}: a simple value, or a list where any value may stand.
+  Ref<Any> ReadWrapped(const Value& value, const TypeDescriptor& type, const Place& place) const {
+    const Value* const inner = value.Find(valueKey);
+    if (inner == nullptr || value.members.size() != 2) {
+      Refuse(value, place, "a value of type " + type.name + " has exactly \"@type\" and \"@value\"");
+    }
+    const Place innerPlace{&place, valueKey};
+    if (type.kind != TypeKind::Simple) {
+      return ReadList(*inner, type, innerPlace);
+    }
+    const Ref<Any> boxed = type.create();
+    ReadScalar(*inner, type.simple, BoxedValue(*boxed), innerPlace);
+    return boxed;
+  }
+
+  Ref<Any> ReadList(const Value& value, const TypeDescriptor& type, const Place& place) const {
+    Demand(Kind::Array, "an array", value, place);
+    Place itemPlace{&place, {}, 0};
+    if (type.kind == TypeKind::StringArray) {
+      const Ref<ArrayOfString> texts = MakeRef<ArrayOfString>();
+      for (const Value& item : value.items) {
+        ReadScalar(item, FieldKind::String, &texts->Items().emplace_back(), itemPlace);
+        ++itemPlace.index;
+      }
+      return texts;
+    }
+    const Ref<DataArrayBase> list = type.createArray();
+    for (const Value& item : value.items) {
+      list->AppendAny(Read(item, type.element, itemPlace));
+      ++itemPlace.index;
+    }
+    return list;
+  }
+
+  void ReadField(const Value& value, const FieldDescriptor& field, DataObject& object, const Place& place) const {
+    switch (field.kind) {
+      case FieldKind::Object: {
+        const TypeDescriptor& declared = field.declaredType();
+        field.assign(object, Read(value, field.presence == Presence::List ? declared.array : &declared, place));
+        return;
+      }
+      case FieldKind::Strings:
+        field.assign(object, ReadList(value, ArrayOfString::StaticType(), place));
+        return;
+      case FieldKind::Any:
+        field.assign(object, Read(value, nullptr, place));
+        return;
+      case FieldKind::Base64: {
+        const Ref<Binary> bytes = MakeRef<Binary>();
+        ReadScalar(value, FieldKind::Base64, &bytes->Value(), place);
+        field.assign(object, bytes);
+        return;
+      }
+      default:
+        ReadScalar(value, field.kind, field.write(object), place);
+    }
+  }
+
+  static void ReadScalar(const Value& value, FieldKind kind, void* target, const Place& place) {
+    bool sound = false;
+    switch (kind) {
+      case FieldKind::Boolean:
+        sound = value.kind == Kind::Boolean;
+        *static_cast<bool*>(target) = value.boolean;
+        break;
+      case FieldKind::Int:
+        sound = value.kind == Kind::Integer && value.integer >= std::numeric_limits<std::int32_t>::min() &&
+                value.integer <= std::numeric_limits<std::int32_t>::max();
+        *static_cast<std::int32_t*>(target) = sound ? static_cast<std::int32_t>(value.integer) : 0;
+        break;
+      case FieldKind::Long:
+        sound = value.kind == Kind::Integer;
+        *static_cast<std::int64_t*>(target) = value.integer;
+        break;
+      default:
+        sound = value.kind == Kind::String && ParseScalar(kind, value.text, target);
+    }
+    if (!sound) {
+      Refuse(value, place, "wanted " + std::string(DescribeKind(kind)) + ", found " + Json::Describe(value));
+    }
+  }
+
+  Missing _missing;
+};
+
+}  // namespace
+
+Ref<Any> ReadJson(std::string_view text, const Limits& limits, const TypeDescriptor* declared, Missing missing) {
+  const Value root = Json::Parse(text, limits);
+  return JsonReader(missing).Read(root, declared, Place{nullptr, {}});
+}
+
+}  // namespace Orbis

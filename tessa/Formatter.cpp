@@ -1,0 +1,19 @@
+#include "tessa/Formatter.h"
+
+#include <exception>
+
+namespace Tessa::PrintFormatter {
+
+void PrintedObject::PrintTo(std::string& out) const {
+  if (_object == nullptr) {
+    out.append("(null)");
+    return;
+  }
+  try {
+    out.append(_object->ToString());
+  } catch (const std::exception&) {
+    out.append("(unprintable)");
+  }
+}
+
+}  // namespace Tessa::PrintFormatter

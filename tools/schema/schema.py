@@ -1,0 +1,168 @@
+"""Reads the schema language of the API types (described in orbis/schema/binding.schema)."""
+
+import re
+from dataclasses import dataclass, field
+
+SIMPLE_TYPES = ("boolean", "int", "long", "dateTime", "string", "base64", "any")
+
+
+class SchemaError(Exception):
+    """A schema that cannot be understood; the text names file and line."""
+
+
+@dataclass
+class Field:
+    name: str
+    type: str
+    optional: bool
+    list: bool
+    lazy: bool = False
+    doc: str = ""
+
+    @property
+    def is_object(self):
+        return self.type not in SIMPLE_TYPES
+
+
+@dataclass
+class Type:
+    name: str
+    cpp: str
+    base: str
+    fault: bool
+    abstract: bool
+    file: str
+    origin: str
+    doc: str = ""
+    fields: list = field(default_factory=list)
+    constants: list = field(default_factory=list)
+    construct: str = ""
+
+    @property
+    def cpp_path(self):
+        return self.cpp.split("::")
+
+    @property
+    def cpp_name(self):
+        return self.cpp_path[-1]
+
+
+@dataclass
+class Operation:
+    name: str
+    parameters: list
+    returns: str
+    returns_list: bool
+    doc: str = ""
+
+
+@dataclass
+class Schema:
+    types: dict
+    operations: list
+
+    def all_fields(self, type_):
+        """Fields in wire order: those of the bases first."""
+        inherited = self.all_fields(self.types[type_.base]) if type_.base in self.types else []
+        return inherited + type_.fields
+
+    def ancestors(self, type_):
+        while type_.base in self.types:
+            type_ = self.types[type_.base]
+            yield type_
+
+    def derived(self, type_):
+        return [other for other in self.types.values() if other.base == type_.name]
+
+    def outer(self, type_):
+        """The type whose C++ class the given one is nested in, or None."""
+        path = "::".join(type_.cpp_path[:-1])
+        return next((other for other in self.types.values() if other.cpp == path), None)
+
+
+TYPE = re.compile(r"(abstract )?(type|fault) (\w+) = ([\w:]+) : (\w+) \{$")
+FIELD = re.compile(r"(\w+)(\?|\[\])?: (\w+)( lazy)?$")
+CONSTANT = re.compile(r'const (\w+) = "([^"]*)"$')
+CONSTRUCT = re.compile(r"construct\((\w+)\)$")
+OPERATION = re.compile(r"operation (\w+)\((.*)\)(?: returns (\w+)(\[\])?)?$")
+
+
+def _field(text, where):
+    match = FIELD.match(text)
+    if not match:
+        raise SchemaError(f"{where}: not a field: {text}")
+    name, mark, type_, lazy = match.groups()
+    if lazy and mark != "[]":
+        raise SchemaError(f"{where}: only a list can be lazy: {text}")
+    return Field(name, type_, mark == "?", mark == "[]", bool(lazy))
+
+
+def _read(path, schema):
+    current, file_, doc = None, None, []
+    for number, line in enumerate(open(path, encoding="utf-8"), 1):
+        where, text = f"{path}:{number}", line.strip()
+        if text.startswith("## "):
+            doc.append(text[3:])
+            continue
+        if not text or text.startswith("#"):
+            continue
+        if text.startswith("file "):
+            file_ = text[5:]
+        elif match := TYPE.match(text):
+            abstract, kind, name, cpp, base = match.groups()
+            if name in schema.types:
+                raise SchemaError(f"{where}: {name} is defined twice")
+            if file_ is None:
+                raise SchemaError(f"{where}: no `file` before the first type")
+            current = Type(name, cpp, base, kind == "fault", bool(abstract), file_, path, " ".join(doc))
+            schema.types[name] = current
+        elif text == "}" and current:
+            current = None
+        elif match := OPERATION.match(text):
+            name, parameters, returns, many = match.groups()
+            fields = [_field(part.strip(), where) for part in parameters.split(",") if part.strip()]
+            schema.operations.append(Operation(name, fields, returns or "", bool(many), " ".join(doc)))
+        elif current and (match := CONSTANT.match(text)):
+            current.constants.append(match.groups())
+        elif current and (match := CONSTRUCT.match(text)):
+            current.construct = match.group(1)
+        elif current:
+            current.fields.append(_field(text, where))
+            current.fields[-1].doc = " ".join(doc)
+        else:
+            raise SchemaError(f"{where}: not understood: {text}")
+        doc = []
+    if current:
+        raise SchemaError(f"{path}: {current.name} is not closed")
+
+
+def _check(schema):
+    for type_ in schema.types.values():
+        if type_.base != "DataObject" and type_.base not in schema.types:
+            raise SchemaError(f"{type_.name}: unknown base {type_.base}")
+        names = [f.name for f in schema.all_fields(type_)]
+        for name in names:
+            if names.count(name) > 1:
+                raise SchemaError(f"{type_.name}: field {name} is defined twice")
+        if type_.construct and type_.construct not in names:
+            raise SchemaError(f"{type_.name}: cannot construct from unknown field {type_.construct}")
+        for f in type_.fields:
+            if f.is_object and f.type not in schema.types:
+                raise SchemaError(f"{type_.name}.{f.name}: unknown type {f.type}")
+            if f.list and not f.is_object and f.type != "string":
+                raise SchemaError(f"{type_.name}.{f.name}: lists hold data objects or texts")
+    for operation in schema.operations:
+        for f in operation.parameters:
+            if f.is_object and f.type not in schema.types:
+                raise SchemaError(f"{operation.name}({f.name}): unknown type {f.type}")
+        if operation.returns and operation.returns not in schema.types:
+            raise SchemaError(f"{operation.name}: unknown result {operation.returns}")
+
+
+def read(paths):
+    """One schema from several files, later ones building on earlier ones."""
+    schema = Schema({}, [])
+    for path in paths:
+        _read(path, schema)
+    _check(schema)
+    return schema

@@ -17,6 +17,10 @@
 
 namespace Orbis {
 
+namespace Json {
+struct Value;
+}
+
 // Appends the text of the value; what `out` held stays in front, and is all it holds when this throws.
 // Never fails on texts: broken UTF-8 is written as U+FFFD. Throws Tessa::NotInitializedException for a
 // null in a list or in a required field, naming it.
@@ -33,6 +37,10 @@ enum class Missing {
 // and the line. `declared` is the type of the value, a list's element type with it (see ArrayTypeOf);
 // null: the text must name it.
 TESSA_API Ref<Any> ReadJson(std::string_view text, const Limits& limits, const TypeDescriptor* declared,
+                            Missing missing = Missing::Refused);
+
+// The same for a value of a text that was read before (orbis/json/JsonText.h). `path` is where it stands.
+TESSA_API Ref<Any> ReadJson(const Json::Value& value, const TypeDescriptor* declared, std::string_view path = {},
                             Missing missing = Missing::Refused);
 
 }  // namespace Orbis

@@ -40,12 +40,24 @@ void AppendPadded(std::string& out, long long number, std::size_t width) {
 
 constexpr std::int64_t microsecondsPerSecond = 1'000'000;
 constexpr std::int64_t secondsPerDay = 86'400;
+constexpr std::int64_t firstSecond = -62'135'596'800;  // 0001-01-01T00:00:00Z
+constexpr std::int64_t lastSecond = 253'402'300'799;   // 9999-12-31T23:59:59Z
 
-void Append(const bool& value, std::string& out) { out += value ? "true" : "false"; }
-void Append(const std::int32_t& value, std::string& out) { out += std::to_string(value); }
-void Append(const std::int64_t& value, std::string& out) { out += std::to_string(value); }
-void Append(const std::string& value, std::string& out) { out += value; }
-void Append(const Bytes& value, std::string& out) { AppendBase64(value, out); }
+void Append(const bool& value, std::string& out) {
+  out += value ? "true" : "false";
+}
+void Append(const std::int32_t& value, std::string& out) {
+  out += std::to_string(value);
+}
+void Append(const std::int64_t& value, std::string& out) {
+  out += std::to_string(value);
+}
+void Append(const std::string& value, std::string& out) {
+  out += value;
+}
+void Append(const Bytes& value, std::string& out) {
+  AppendBase64(value, out);
+}
 
 void Append(const DateTime& value, std::string& out) {
   using namespace std::chrono;
@@ -89,15 +101,21 @@ bool ParseInteger(std::string_view text, T& value) {
   return true;
 }
 
-bool Parse(std::string_view text, std::int32_t& value) { return ParseInteger(text, value); }
-bool Parse(std::string_view text, std::int64_t& value) { return ParseInteger(text, value); }
+bool Parse(std::string_view text, std::int32_t& value) {
+  return ParseInteger(text, value);
+}
+bool Parse(std::string_view text, std::int64_t& value) {
+  return ParseInteger(text, value);
+}
 
 bool Parse(std::string_view text, std::string& value) {
   value = text;
   return true;
 }
 
-bool Parse(std::string_view text, Bytes& value) { return ParseBase64(text, value); }
+bool Parse(std::string_view text, Bytes& value) {
+  return ParseBase64(text, value);
+}
 
 // Reads a date piece by piece, from the front.
 class DateReader {
@@ -190,6 +208,10 @@ bool Parse(std::string_view text, DateTime& value) {
   }
   const std::int64_t days = sys_days(date).time_since_epoch().count();
   const std::int64_t seconds = days * secondsPerDay + hour * 3600 + minute * 60 + second - zone;
+  // A zone may carry the moment over the edge of what can be written.
+  if (seconds < firstSecond || seconds > lastSecond) {
+    return false;
+  }
   value.microseconds = seconds * microsecondsPerSecond + fraction;
   return true;
 }
@@ -211,7 +233,9 @@ bool EqualScalar(FieldKind kind, const void* left, const void* right) {
   });
 }
 
-const void* BoxedValue(const Any& boxed) { return BoxedValue(const_cast<Any&>(boxed)); }
+const void* BoxedValue(const Any& boxed) {
+  return BoxedValue(const_cast<Any&>(boxed));
+}
 
 void* BoxedValue(Any& boxed) {
   switch (boxed.GetType().simple) {

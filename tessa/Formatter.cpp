@@ -1,7 +1,5 @@
 #include "tessa/Formatter.h"
 
-#include <exception>
-
 namespace Tessa::PrintFormatter {
 
 void PrintedObject::PrintTo(std::string& out) const {
@@ -11,7 +9,7 @@ void PrintedObject::PrintTo(std::string& out) const {
   }
   try {
     out.append(_object->ToString());
-  } catch (const std::exception&) {
+  } catch (...) {
     out.append("(unprintable)");
   }
 }

@@ -38,6 +38,8 @@ void LogArgument::PrintTo(std::string& out) const {
     out.append(*text);
   } else if (const auto* number = std::get_if<long long>(&_value)) {
     out.append(std::to_string(*number));
+  } else if (const auto* count = std::get_if<unsigned long long>(&_value)) {
+    out.append(std::to_string(*count));
   } else if (const auto* lazy = std::get_if<Lazy>(&_value)) {
     lazy->print(lazy->object, out);
   }

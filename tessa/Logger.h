@@ -28,11 +28,13 @@ class TESSA_API LogArgument {
  public:
   LogArgument(std::string_view text) noexcept : _value(text) {}
   LogArgument(const std::string& text) noexcept : _value(std::string_view(text)) {}
-  LogArgument(const char* text) noexcept : _value(std::string_view(text)) {}
-  template <std::integral T>
+  LogArgument(const char* text) noexcept : _value(std::string_view(text != nullptr ? text : "(null)")) {}
+  template <std::signed_integral T>
   LogArgument(T number) noexcept : _value(static_cast<long long>(number)) {}
+  template <std::unsigned_integral T>
+  LogArgument(T number) noexcept : _value(static_cast<unsigned long long>(number)) {}
   template <class T>
-    requires requires(const T& value, std::string& out) { value.PrintTo(out); }
+  requires requires(const T& value, std::string& out) { value.PrintTo(out); }
   LogArgument(const T& lazy) noexcept
       : _value(Lazy{&lazy, [](const void* object, std::string& out) {
                       static_cast<const T*>(object)->PrintTo(out);
@@ -47,7 +49,7 @@ class TESSA_API LogArgument {
     const void* object;
     void (*print)(const void*, std::string&);
   };
-  std::variant<std::string_view, long long, Lazy> _value;
+  std::variant<std::string_view, long long, unsigned long long, Lazy> _value;
 };
 
 class TESSA_API Logger : public ObjectImpl {

@@ -11,13 +11,10 @@
 
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/include/KovaConstants.h"
-#include "kova/agentd/include/KovaHooks.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "orbis/Formatter.h"
 #include "orbis/Types.h"
 #include "tessa/Panic.h"
-
-#define KOVA_EXPORT extern "C" __attribute__((visibility("default")))
 
 using Tessa::MakeRef;
 using Tessa::Ref;

@@ -1,6 +1,7 @@
 // The one manager of the process, and its making. Internal to the plug-in.
 #pragma once
 
+#include "kova/agentd/include/KovaHooks.h"
 #include "tessa/Logger.h"
 #include "tessa/Ref.h"
 
@@ -20,3 +21,19 @@ extern Tessa::Ref<KovaManagerImpl> _kovaManagerImpl;
 void CreateKovaManager(Tessa::Ref<Tessa::Service::Logger>& logger);
 
 }  // namespace Kovasvc
+
+// The entry points, declared here so that their definitions are held to the types that host programs call
+// them by.
+#define KOVA_EXPORT extern "C" __attribute__((visibility("default")))
+
+KOVA_EXPORT Kovasvc::InitKovaPluginFn InitKovaPlugin;
+KOVA_EXPORT Kovasvc::AddDisksFn AddDisksHookFn;
+KOVA_EXPORT Kovasvc::InitializeDisksFn InitializeDisksHookFn;
+KOVA_EXPORT Kovasvc::RemoveDisksFn RemoveDisksHookFn;
+KOVA_EXPORT Kovasvc::RemoveDiskMappingFn RemoveDiskMappingHookFn;
+KOVA_EXPORT Kovasvc::QueryDisksForKovaFn QueryDisksForKovaHookFn;
+KOVA_EXPORT Kovasvc::AddAllEligibleDisksFn AddAllEligibleDisksHookFn;
+KOVA_EXPORT Kovasvc::UnmountDiskMappingFn UnmountDiskMappingHookFn;
+KOVA_EXPORT Kovasvc::GetStorageInfoFn GetStorageInfoHookFn;
+KOVA_EXPORT Kovasvc::GetConfigInfoFn GetConfigInfoHookFn;
+KOVA_EXPORT Kovasvc::ClaimUnmountedDiskgroupFn ClaimUnmountedDiskgroupHookFn;

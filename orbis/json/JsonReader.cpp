@@ -19,16 +19,18 @@ constexpr std::string_view simplePrefix = "xsd:";
 
 // Where a value stands; only printed when something is refused.
 struct Place {
+  static constexpr std::size_t noIndex = static_cast<std::size_t>(-1);
+
   const Place* parent;
-  std::string_view name;  // empty: the element of a list
-  std::size_t index = 0;
+  std::string_view name;
+  std::size_t index = noIndex;  // of the element of a list, which has no name
 
   std::string ToString() const {
-    std::string path = parent == nullptr ? "" : parent->ToString();
     if (parent == nullptr) {
-      return path;
+      return std::string(name);
     }
-    if (name.empty()) {
+    const std::string path = parent->ToString();
+    if (index != noIndex) {
       return path + "[" + std::to_string(index) + "]";
     }
     return path + (path.empty() ? "" : ".") + std::string(name);
@@ -52,12 +54,15 @@ class JsonReader {
 
   // A value whose declared type is null (any) or a data object's or list's.
   Ref<Any> Read(const Value& value, const TypeDescriptor* declared, const Place& place) const {
-    if (declared != nullptr && declared->kind != TypeKind::DataObject) {
+    const bool list = declared != nullptr &&
+                      (declared->kind == TypeKind::ObjectArray || declared->kind == TypeKind::StringArray);
+    if (list) {
       return ReadList(value, *declared, place);
     }
     Demand(Kind::Object, "an object", value, place);
     const TypeDescriptor& type = TypeOf(value, declared, place);
-    return type.kind == TypeKind::DataObject ? ReadObject(value, type, place) : ReadWrapped(value, type, place);
+    return type.kind == TypeKind::DataObject ? ReadObject(value, type, place)
+                                             : ReadWrapped(value, type, place);
   }
 
  private:
@@ -77,14 +82,16 @@ class JsonReader {
       Refuse(*name, Place{&place, typeKey}, "type " + type->name + " is not a " + declared->name);
     }
     if (type->IsAbstract()) {
-      Refuse(value, place, "type " + type->name + " has no objects of its own; \"@type\" must name one of its kinds");
+      Refuse(value, place,
+             "type " + type->name + " has no objects of its own; \"@type\" must name one of its kinds");
     }
     return *type;
   }
 
   static const TypeDescriptor* Named(std::string_view name) {
-    return name.substr(0, simplePrefix.size()) == simplePrefix ? FindSimpleType(name.substr(simplePrefix.size()))
-                                                               : FindType(name);
+    return name.substr(0, simplePrefix.size()) == simplePrefix
+               ? FindSimpleType(name.substr(simplePrefix.size()))
+               : FindType(name);
   }
 
   Ref<Any> ReadObject(const Value& value, const TypeDescriptor& type, const Place& place) const {
@@ -153,11 +160,13 @@ class JsonReader {
     return list;
   }
 
-  void ReadField(const Value& value, const FieldDescriptor& field, DataObject& object, const Place& place) const {
+  void ReadField(const Value& value, const FieldDescriptor& field, DataObject& object,
+                 const Place& place) const {
     switch (field.kind) {
       case FieldKind::Object: {
         const TypeDescriptor& declared = field.declaredType();
-        field.assign(object, Read(value, field.presence == Presence::List ? declared.array : &declared, place));
+        field.assign(object,
+                     Read(value, field.presence == Presence::List ? declared.array : &declared, place));
         return;
       }
       case FieldKind::Strings:
@@ -206,9 +215,14 @@ class JsonReader {
 
 }  // namespace
 
-Ref<Any> ReadJson(std::string_view text, const Limits& limits, const TypeDescriptor* declared, Missing missing) {
-  const Value root = Json::Parse(text, limits);
-  return JsonReader(missing).Read(root, declared, Place{nullptr, {}});
+Ref<Any> ReadJson(std::string_view text, const Limits& limits, const TypeDescriptor* declared,
+                  Missing missing) {
+  return ReadJson(Json::Parse(text, limits), declared, {}, missing);
+}
+
+Ref<Any> ReadJson(const Json::Value& value, const TypeDescriptor* declared, std::string_view path,
+                  Missing missing) {
+  return JsonReader(missing).Read(value, declared, Place{nullptr, path});
 }
 
 }  // namespace Orbis

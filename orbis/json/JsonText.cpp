@@ -2,8 +2,9 @@
 
 #include <cstddef>
 #include <iterator>
+#include <limits>
 #include <nlohmann/json.hpp>
-#include <unordered_set>
+#include <set>
 
 #include "orbis/ParseException.h"
 
@@ -12,7 +13,15 @@ namespace {
 
 using Library = nlohmann::json;
 
-// Walks the text for the library and counts the lines it has read.
+// How far the library has read.
+struct Progress {
+  int line = 1;
+  bool atLineEnd = false;  // the last character read ends the line, which is not yet counted
+};
+
+// Walks the text for the library and counts the lines. The library reads one character beyond a number,
+// so a line feed counts only when something behind it is read: else a number at the end of a line would
+// be said to stand on the next.
 class LineCounter {
  public:
   using value_type = char;
@@ -21,10 +30,11 @@ class LineCounter {
   using reference = const char&;
   using iterator_category = std::forward_iterator_tag;
 
-  LineCounter(const char* at, int* line) : _at(at), _line(line) {}
+  LineCounter(const char* at, Progress* progress) : _at(at), _progress(progress) {}
   reference operator*() const { return *_at; }
   LineCounter& operator++() {
-    *_line += *_at == '\n' ? 1 : 0;
+    _progress->line += _progress->atLineEnd ? 1 : 0;
+    _progress->atLineEnd = *_at == '\n';
     ++_at;
     return *this;
   }
@@ -38,7 +48,7 @@ class LineCounter {
 
  private:
   const char* _at;
-  int* _line;
+  Progress* _progress;
 };
 
 // Builds the tree from the library's events and refuses what passes the limits.
@@ -85,7 +95,7 @@ class Builder final : public Library::json_sax_t {
     if (!level.keys.insert(name).second) {
       Refuse("key '" + name + "' stands twice");
     }
-    level.value->members.emplace_back(std::move(name), Value());
+    level.value->members.push_back({std::move(name), Value()});
     return true;
   }
 
@@ -93,14 +103,15 @@ class Builder final : public Library::json_sax_t {
     // The library's text begins with its own numbering and place; ours follows.
     const std::string text = error.what();
     const std::size_t place = text.find("column ");
-    const std::size_t reason = place == std::string::npos ? place : text.find(": ", place);
+    const std::string_view mark = place == std::string::npos ? "] " : ": ";
+    const std::size_t reason = text.find(mark, place == std::string::npos ? 0 : place);
     Refuse(reason == std::string::npos ? text : text.substr(reason + 2));
   }
 
  private:
   struct Level {
     Value* value;
-    std::unordered_set<std::string> keys;
+    std::set<std::string> keys;  // ordered, not hashed: a sender must not be able to choose collisions
   };
 
   Value* Add(Kind kind) {
@@ -110,7 +121,7 @@ class Builder final : public Library::json_sax_t {
     Value* added = &_root;
     if (!_open.empty()) {
       Value& parent = *_open.back().value;
-      added = parent.kind == Kind::Array ? &parent.items.emplace_back() : &parent.members.back().second;
+      added = parent.kind == Kind::Array ? &parent.items.emplace_back() : &parent.members.back().value;
     }
     added->kind = kind;
     added->line = _line;
@@ -142,7 +153,7 @@ class Builder final : public Library::json_sax_t {
       if (level.value->kind == Kind::Array) {
         path += "[" + std::to_string(level.value->items.empty() ? 0 : level.value->items.size() - 1) + "]";
       } else if (!level.value->members.empty()) {
-        path += (path.empty() ? "" : ".") + level.value->members.back().first;
+        path += (path.empty() ? "" : ".") + level.value->members.back().key;
       }
     }
     throw ParseException(path.empty() ? "(root)" : path, _line, reason);
@@ -190,10 +201,11 @@ Value Parse(std::string_view text, const Limits& limits) {
   if (text.size() > limits.documentBytes) {
     throw ParseException("(root)", 0, "larger than " + std::to_string(limits.documentBytes) + " bytes");
   }
-  int line = 1;
+  Progress progress;
   Value root;
-  Builder builder(limits, line, root);
-  Library::sax_parse(LineCounter(text.data(), &line), LineCounter(text.data() + text.size(), &line), &builder);
+  Builder builder(limits, progress.line, root);
+  Library::sax_parse(LineCounter(text.data(), &progress), LineCounter(text.data() + text.size(), &progress),
+                     &builder);
   return root;
 }
 

@@ -4,7 +4,6 @@
 #include <cstdint>
 #include <string>
 #include <string_view>
-#include <utility>
 #include <vector>
 
 #include "orbis/Limits.h"
@@ -13,6 +12,8 @@ namespace Orbis::Json {
 
 enum class Kind { Null, Boolean, Integer, Number, String, Array, Object };
 
+struct Member;
+
 struct Value {
   Kind kind = Kind::Null;
   int line = 0;
@@ -20,10 +21,15 @@ struct Value {
   std::int64_t integer = 0;  // Integer; what does not fit in 64 bits is a Number
   std::string text;          // String; of a Number, the digits as they stood
   std::vector<Value> items;
-  std::vector<std::pair<std::string, Value>> members;  // in order; no key twice
+  std::vector<Member> members;  // in order; no key twice
 
   // The member of that key, or null.
   const Value* Find(std::string_view key) const noexcept;
+};
+
+struct Member {
+  std::string key;
+  Value value;
 };
 
 // "an object", "the text 'x'", for messages.

@@ -39,7 +39,9 @@ class JsonWriter {
   }
 
  private:
-  void WriteHead(const std::string& type) { _out.append("{\"@type\":\"").append(type).append("\",\"@value\":"); }
+  void WriteHead(const std::string& type) {
+    _out.append("{\"@type\":\"").append(type).append("\",\"@value\":");
+  }
 
   void WriteObject(const DataObject& object) {
     _out.append("{\"@type\":\"").append(object.GetType().name).append("\"");

@@ -16,7 +16,9 @@ using Xml::Element;
   throw ParseException(Xml::PathOf(element), element.line, reason);
 }
 
-std::string Quoted(std::string_view text) { return "'" + std::string(text) + "'"; }
+std::string Quoted(std::string_view text) {
+  return "'" + std::string(text) + "'";
+}
 
 class SoapReader {
  public:
@@ -54,7 +56,8 @@ class SoapReader {
       Refuse(element, "type " + type->name + " is not a " + declared->name);
     }
     if (type->IsAbstract()) {
-      Refuse(element, "type " + type->name + " has no objects of its own; xsi:type must name one of its kinds");
+      Refuse(element,
+             "type " + type->name + " has no objects of its own; xsi:type must name one of its kinds");
     }
     if (_filter != nullptr && !(*_filter)(*type)) {
       Refuse(element, "type " + type->name + " is not allowed here");
@@ -70,8 +73,8 @@ class SoapReader {
       type = FindSimpleType(element.type.name);
     }
     if (type == nullptr || !Has(type->since)) {
-      Refuse(element, "unknown type " + Quoted(element.type.name) + " in namespace " +
-                          Quoted(element.type.nameSpace));
+      Refuse(element,
+             "unknown type " + Quoted(element.type.name) + " in namespace " + Quoted(element.type.nameSpace));
     }
     return type;
   }
@@ -96,14 +99,21 @@ class SoapReader {
     return element != nullptr && element->name == name && element->nameSpace == apiNamespace;
   }
 
+  static std::string Described(const Element* element) {
+    if (element == nullptr) {
+      return "the end";
+    }
+    const bool ours = element->nameSpace == apiNamespace;
+    return Quoted(element->name) + (ours ? "" : " in namespace " + Quoted(element->nameSpace));
+  }
+
   // Takes the children that belong to the field and returns the first that does not.
   const Element* ReadField(const Element& parent, const Element* child, const FieldDescriptor& field,
                            DataObject& object) const {
     if (!IsNamed(child, field.name)) {
       if (field.presence == Presence::Required) {
-        const std::string found = child == nullptr ? "the end" : Quoted(child->name);
         Refuse(child == nullptr ? parent : *child,
-               "required element " + Quoted(field.name) + " is missing, found " + found);
+               "required element " + Quoted(field.name) + " is missing, found " + Described(child));
       }
       return child;
     }
@@ -201,8 +211,8 @@ class SoapReader {
 
   static void CheckItem(const Element& element) {
     if (!IsNamed(&element, "item")) {
-      Refuse(element, "unexpected element " + Quoted(element.name) + " in a list; wanted 'item' in namespace " +
-                          Quoted(apiNamespace));
+      Refuse(element, "unexpected element " + Quoted(element.name) +
+                          " in a list; wanted 'item' in namespace " + Quoted(apiNamespace));
     }
   }
 

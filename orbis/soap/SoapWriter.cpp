@@ -26,8 +26,12 @@ class SoapWriter {
  private:
   bool Has(int since) const { return _version == nullptr || _version->Has(since); }
 
-  // The type that a reader of this version knows the value by.
+  // The type that a reader of this version knows the value by. A list is as new as its elements.
   const TypeDescriptor& KnownType(const TypeDescriptor& type) const {
+    if (type.kind == TypeKind::ObjectArray && !Has(type.since)) {
+      const TypeDescriptor* const list = KnownType(*type.element).array;
+      return list != nullptr ? *list : type;
+    }
     const TypeDescriptor* known = &type;
     while (!Has(known->since) && known->base != nullptr) {
       known = known->base;

@@ -499,8 +499,8 @@ TEST(XmlReader, AcceptsTokensOfManyChunksWithinTheBounds) {
   limits.nameBytes = 10;
   limits.textBytes = 400'000;
   limits.attributes = 10'002;
-  std::string tag =
-      "<a b='" + Repeat("&lt;", limits.textBytes) + "' c=\"" + Repeat("'=/>", limits.textBytes / 4) + "\" ";
+  std::string tag = "<a" + std::string(200'000, ' ') + "b='" + Repeat("&lt;", limits.textBytes) + "' c=\"" +
+                    Repeat("'=/>", limits.textBytes / 4) + "\" ";
   for (int i = 0; i < 10'000; ++i) {
     tag += "d" + std::to_string(i) + "='" + std::to_string(i) + "' \n";
   }

@@ -278,8 +278,10 @@ def write(path, lines):
     text = "\n".join(lines) + "\n"
     os.makedirs(os.path.dirname(path), exist_ok=True)
     # An unchanged file keeps its time, so that nothing is built again for it.
-    if os.path.exists(path) and open(path, encoding="utf-8").read() == text:
-        return
+    if os.path.exists(path):
+        with open(path, encoding="utf-8") as there:
+            if there.read() == text:
+                return
     with open(path, "w", encoding="utf-8") as out:
         out.write(text)
 

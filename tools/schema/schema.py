@@ -92,14 +92,16 @@ def _field(text, where):
     if not match:
         raise SchemaError(f"{where}: not a field: {text}")
     name, mark, type_, lazy = match.groups()
-    if lazy and mark != "[]":
-        raise SchemaError(f"{where}: only a list can be lazy: {text}")
+    if lazy and (mark != "[]" or type_ in SIMPLE_TYPES):
+        raise SchemaError(f"{where}: only a list of data objects can be lazy: {text}")
     return Field(name, type_, mark == "?", mark == "[]", bool(lazy))
 
 
 def _read(path, schema):
     current, file_, doc = None, None, []
-    for number, line in enumerate(open(path, encoding="utf-8"), 1):
+    with open(path, encoding="utf-8") as file:
+        lines = file.readlines()
+    for number, line in enumerate(lines, 1):
         where, text = f"{path}:{number}", line.strip()
         if text.startswith("## "):
             doc.append(text[3:])
@@ -112,13 +114,15 @@ def _read(path, schema):
             abstract, kind, name, cpp, base = match.groups()
             if name in schema.types:
                 raise SchemaError(f"{where}: {name} is defined twice")
+            if current:
+                raise SchemaError(f"{where}: {current.name} is not closed before {name}")
             if file_ is None:
                 raise SchemaError(f"{where}: no `file` before the first type")
             current = Type(name, cpp, base, kind == "fault", bool(abstract), file_, path, " ".join(doc))
             schema.types[name] = current
         elif text == "}" and current:
             current = None
-        elif match := OPERATION.match(text):
+        elif not current and (match := OPERATION.match(text)):
             name, parameters, returns, many = match.groups()
             fields = [_field(part.strip(), where) for part in parameters.split(",") if part.strip()]
             schema.operations.append(Operation(name, fields, returns or "", bool(many), " ".join(doc)))
@@ -136,10 +140,43 @@ def _read(path, schema):
         raise SchemaError(f"{path}: {current.name} is not closed")
 
 
+def _check_base(schema, type_):
+    """Walks up to DataObject; must come first, everything else walks the same way and trusts it."""
+    seen, at = {type_.name}, type_
+    while at.base != "DataObject":
+        if at.base not in schema.types:
+            raise SchemaError(f"{at.name}: unknown base {at.base}")
+        if at.base in seen:
+            raise SchemaError(f"{type_.name}: its bases run in a circle through {at.base}")
+        seen.add(at.base)
+        at = schema.types[at.base]
+    if type_.base in schema.types and type_.fault != schema.types[type_.base].fault:
+        raise SchemaError(f"{type_.name}: faults derive from faults, and only they")
+
+
+def _check_required(schema, type_):
+    """A new object makes its required objects, so these must have objects and must come to an end."""
+    seen, at = [], [type_]
+    while at:
+        outer = at.pop()
+        for f in schema.all_fields(outer):
+            if f.list or f.optional or f.type not in schema.types:
+                continue
+            if schema.types[f.type].abstract:
+                raise SchemaError(f"{outer.name}.{f.name}: {f.type} is abstract, so the field cannot be required")
+            if f.type == type_.name:
+                raise SchemaError(f"{type_.name}: requires an object of its own type, without end")
+            if f.type not in seen:
+                seen.append(f.type)
+                at.append(schema.types[f.type])
+
+
 def _check(schema):
     for type_ in schema.types.values():
-        if type_.base != "DataObject" and type_.base not in schema.types:
-            raise SchemaError(f"{type_.name}: unknown base {type_.base}")
+        if type_.name in ("DataObject", "String") or type_.name.startswith("ArrayOf"):
+            raise SchemaError(f"{type_.name}: the name belongs to the binding itself")
+        _check_base(schema, type_)
+    for type_ in schema.types.values():
         names = [f.name for f in schema.all_fields(type_)]
         for name in names:
             if names.count(name) > 1:
@@ -151,7 +188,12 @@ def _check(schema):
                 raise SchemaError(f"{type_.name}.{f.name}: unknown type {f.type}")
             if f.list and not f.is_object and f.type != "string":
                 raise SchemaError(f"{type_.name}.{f.name}: lists hold data objects or texts")
+    for type_ in schema.types.values():
+        _check_required(schema, type_)
+    names = [operation.name for operation in schema.operations]
     for operation in schema.operations:
+        if names.count(operation.name) > 1:
+            raise SchemaError(f"{operation.name}: operation is defined twice")
         for f in operation.parameters:
             if f.is_object and f.type not in schema.types:
                 raise SchemaError(f"{operation.name}({f.name}): unknown type {f.type}")
@@ -163,6 +205,9 @@ def read(paths):
     """One schema from several files, later ones building on earlier ones."""
     schema = Schema({}, [])
     for path in paths:
-        _read(path, schema)
+        try:
+            _read(path, schema)
+        except (OSError, UnicodeDecodeError) as error:
+            raise SchemaError(f"{path}: cannot be read: {error}") from error
     _check(schema)
     return schema

@@ -1,0 +1,68 @@
+# The front door. Every target installs what it needs and builds what it uses.
+.DEFAULT_GOAL := help
+.PHONY: help demo test check bench build format-check format asan tsan clang fuzz clean
+
+SETUP := tools/setup/install-packages.sh
+JOBS ?= $(shell nproc)
+CTEST := ctest --output-on-failure --no-tests=error -j $(JOBS)
+
+help:
+	@echo "make demo    build, start the agent on an example host and look at its disks"
+	@echo "make test    build and run every test that needs no virtual machine"
+	@echo "make check   sanitizers, second compiler, fuzzing, format"
+	@echo "make bench   benchmarks"
+	@echo "make build   the release build only: build/release"
+
+build:
+	@$(SETUP) build
+	@cmake --preset release >/dev/null
+	@cmake --build --preset release -j $(JOBS)
+
+demo:
+	@$(SETUP) build
+	@cmake --preset release -DKOVA_BENCHMARKS=OFF >/dev/null
+	@cmake --build --preset release -j $(JOBS) --target agentd kovactl
+	@tools/demo.sh build/release
+
+test:
+	@$(SETUP) build test
+	@cmake --preset dev >/dev/null
+	@cmake --build --preset dev -j $(JOBS)
+	@cd build/dev && $(CTEST)
+
+check: format-check clang asan tsan fuzz
+
+format-check:
+	@$(SETUP) check
+	@git ls-files '*.h' '*.cpp' | xargs clang-format-14 --dry-run --Werror
+
+format:
+	@git ls-files '*.h' '*.cpp' | xargs clang-format-14 -i
+
+# The second compiler: everything must compile without a warning.
+clang:
+	@$(SETUP) build test check
+	@cmake --preset dev-clang >/dev/null
+	@cmake --build --preset dev-clang -j $(JOBS)
+
+asan tsan:
+	@$(SETUP) build test
+	@cmake --preset $@ >/dev/null
+	@cmake --build --preset $@ -j $(JOBS)
+	@cd build/$@ && $(CTEST)
+
+# A short run of every fuzz target; a finding is a failure.
+fuzz:
+	@$(SETUP) build check
+	@cmake --preset fuzz >/dev/null
+	@cmake --build --preset fuzz -j $(JOBS) --target fuzzers
+	@fuzz/run.sh build/fuzz $(or $(SECONDS),20)
+
+bench:
+	@$(SETUP) build
+	@cmake --preset release -DKOVA_BENCHMARKS=ON >/dev/null
+	@cmake --build --preset release -j $(JOBS) --target benchmarks
+	@bench/run.sh build/release
+
+clean:
+	rm -rf build

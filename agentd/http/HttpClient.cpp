@@ -1,0 +1,87 @@
+#include "agentd/http/HttpClient.h"
+
+#include <boost/asio/io_context.hpp>
+#include <boost/asio/local/stream_protocol.hpp>
+#include <boost/beast/core.hpp>
+#include <boost/beast/http.hpp>
+
+namespace Agentd {
+namespace {
+
+namespace asio = boost::asio;
+namespace beast = boost::beast;
+namespace http = beast::http;
+using Protocol = asio::local::stream_protocol;
+using boost::system::error_code;
+
+constexpr std::uint64_t longestAnswer = std::uint64_t{1} << 30;
+
+// Blocking calls on a stream that knows time limits: each is started and the network run until it is done.
+class Exchanger {
+ public:
+  Exchanger(const std::string& socketPath, std::chrono::seconds patience)
+      : _path(socketPath), _patience(patience), _stream(_network) {}
+
+  void Connect() {
+    Finish("no agent answers on", [&](auto done) { _stream.async_connect(Protocol::endpoint(_path), done); });
+  }
+
+  void Send(const http::request<http::string_body>& message) {
+    Finish("cannot send to the agent on", [&](auto done) {
+      http::async_write(_stream, message, [done](error_code error, std::size_t) { done(error); });
+    });
+  }
+
+  void Receive(http::response_parser<http::string_body>& parser) {
+    Finish("no answer from the agent on", [&](auto done) {
+      http::async_read(_stream, _buffer, parser, [done](error_code error, std::size_t) { done(error); });
+    });
+  }
+
+ private:
+  template <class Start>
+  void Finish(const char* failure, Start start) {
+    error_code result;
+    _stream.expires_after(_patience);
+    start([&result](error_code error) { result = error; });
+    _network.restart();
+    _network.run();
+    if (result) {
+      throw ConnectionError(std::string(failure) + " " + _path + ": " + result.message());
+    }
+  }
+
+  std::string _path;
+  std::chrono::seconds _patience;
+  asio::io_context _network;
+  beast::basic_stream<Protocol> _stream;
+  beast::flat_buffer _buffer;
+};
+
+}  // namespace
+
+HttpAnswer Exchange(const std::string& socketPath, const HttpRequest& request, std::chrono::seconds patience) {
+  if (socketPath.empty() || socketPath.size() > sizeof(sockaddr_un::sun_path) - 1) {
+    throw ConnectionError("'" + socketPath + "' cannot be the path of a socket: it must have 1 to " +
+                          std::to_string(sizeof(sockaddr_un::sun_path) - 1) + " bytes");
+  }
+  Exchanger exchanger(socketPath, patience);
+  exchanger.Connect();
+  http::request<http::string_body> message(http::string_to_verb(request.method), request.target, 11);
+  message.set(http::field::host, "localhost");
+  message.keep_alive(false);
+  if (!request.contentType.empty()) {
+    message.set(http::field::content_type, request.contentType);
+  }
+  message.body() = request.body;
+  message.prepare_payload();
+  exchanger.Send(message);
+
+  http::response_parser<http::string_body> parser;
+  parser.body_limit(longestAnswer);
+  exchanger.Receive(parser);
+  http::response<http::string_body> response = parser.release();
+  return {response.result_int(), std::string(response[http::field::content_type]), std::move(response.body())};
+}
+
+}  // namespace Agentd

@@ -1,0 +1,65 @@
+#include "agentd/http/HttpTarget.h"
+
+#include <charconv>
+
+namespace Agentd {
+namespace {
+
+std::optional<std::string> Decode(std::string_view text) {
+  std::string decoded;
+  for (std::size_t at = 0; at < text.size(); ++at) {
+    if (text[at] != '%') {
+      decoded.push_back(text[at]);
+      continue;
+    }
+    const std::string_view digits = text.substr(at + 1, 2);
+    unsigned value = 0;
+    const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), value, 16);
+    if (digits.size() != 2 || error != std::errc() || end != digits.data() + 2) {
+      return std::nullopt;
+    }
+    decoded.push_back(static_cast<char>(value));
+    at += 2;
+  }
+  return decoded;
+}
+
+}  // namespace
+
+std::vector<std::string> HttpTarget::ValuesOf(std::string_view name) const {
+  std::vector<std::string> values;
+  for (const auto& [key, value] : parameters) {
+    if (key == name) {
+      values.push_back(value);
+    }
+  }
+  return values;
+}
+
+std::optional<HttpTarget> ParseTarget(std::string_view target) {
+  HttpTarget parsed;
+  const std::size_t question = target.find('?');
+  const std::optional<std::string> path = Decode(target.substr(0, question));
+  if (!path) {
+    return std::nullopt;
+  }
+  parsed.path = *path;
+  std::string_view rest = question == std::string_view::npos ? "" : target.substr(question + 1);
+  while (!rest.empty()) {
+    const std::size_t end = std::min(rest.find('&'), rest.size());
+    const std::string_view pair = rest.substr(0, end);
+    const std::size_t equals = std::min(pair.find('='), pair.size());
+    const std::optional<std::string> name = Decode(pair.substr(0, equals));
+    const std::optional<std::string> value = Decode(pair.substr(std::min(equals + 1, pair.size())));
+    if (!name || !value) {
+      return std::nullopt;
+    }
+    if (!pair.empty()) {
+      parsed.parameters.emplace_back(*name, *value);
+    }
+    rest.remove_prefix(std::min(end + 1, rest.size()));
+  }
+  return parsed;
+}
+
+}  // namespace Agentd

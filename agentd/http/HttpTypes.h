@@ -1,0 +1,34 @@
+// Requests and answers as plain values, free of the HTTP library.
+#pragma once
+
+#include <chrono>
+#include <cstddef>
+#include <string>
+
+namespace Agentd {
+
+struct HttpRequest {
+  std::string method;       // "GET"
+  std::string target;       // as sent: "/api/v1/disks?names=naa.1"
+  std::string contentType;  // empty: none
+  std::string body;
+};
+
+struct HttpAnswer {
+  unsigned status = 200;
+  std::string contentType = "application/json";
+  std::string body;
+};
+
+// What a connection may cost before it is refused.
+struct HttpLimits {
+  std::size_t headerBytes = 16 << 10;                   // beyond: 431
+  std::size_t bodyBytes = 16 << 20;                     // beyond: 413
+  std::size_t connections = 256;                        // beyond: 503
+  std::chrono::seconds readTime = std::chrono::seconds(30);   // for one whole request; beyond: 408
+  std::chrono::seconds writeTime = std::chrono::seconds(60);  // for one whole answer; beyond: closed
+  std::chrono::seconds drainTime = std::chrono::seconds(60);  // for what is in flight when stopping
+  unsigned workers = 4;                                 // requests handled at the same time
+};
+
+}  // namespace Agentd

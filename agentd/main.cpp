@@ -1,0 +1,109 @@
+// The host agent: loads the plug-in, gives it a host, and answers for it over a socket.
+
+#include <CLI/CLI.hpp>
+#include <cstdio>
+#include <cstdlib>
+#include <fstream>
+#include <iostream>
+
+#include "agentd/http/HttpServer.h"
+#include "agentd/routes/Routes.h"
+#include "agentd/Trace.h"
+#include "host/HostRuntime.h"
+#include "host/KovaService.h"
+#include "host/LogSink.h"
+#include "tessa/Panic.h"
+
+namespace {
+
+constexpr const char* defaultSocket = "unix:/run/kova/agentd.sock";
+constexpr std::string_view unixScheme = "unix:";
+
+struct Options {
+  Host::RuntimeOptions runtime;
+  std::string listen = defaultSocket;
+  std::string readyFile;
+  std::string logLevel = "info";
+  std::string traceFile;
+};
+
+void AddOptions(CLI::App& cli, Options& options) {
+  cli.add_option("--host", options.runtime.hostFile,
+                 "Host description to serve; without one, an example host is served");
+  cli.add_option("--listen", options.listen, "Where to answer: unix:PATH")->capture_default_str();
+  cli.add_flag("--save", options.runtime.save, "Write every change of the host back to its description");
+  cli.add_option("--ready-file", options.readyFile, "File to write the address to, once it is answered on");
+  cli.add_option("--log-level", options.logLevel, "none, error, warning, info, verbose, trivia")
+      ->capture_default_str();
+  cli.add_option("--trace", options.traceFile, "File to append one JSON line per call of the kernel provider to");
+  cli.add_option("--plugin", options.runtime.pluginFile, "The plug-in, if it is not beside the program");
+}
+
+[[noreturn]] void EndOverPanic(const char* text) {
+  Host::FlushLogs();
+  std::fprintf(stderr, "agentd: panic: %s\n", text);
+  std::abort();
+}
+
+std::string SocketPath(const std::string& address) {
+  if (address.compare(0, unixScheme.size(), unixScheme) != 0) {
+    throw std::runtime_error("cannot listen on '" + address + "': only unix:PATH is served");
+  }
+  return address.substr(unixScheme.size());
+}
+
+void WriteReadyFile(const Options& options) {
+  if (options.readyFile.empty()) {
+    return;
+  }
+  std::ofstream file(options.readyFile);
+  file << options.listen << "\n";
+  if (!file.flush()) {
+    throw std::runtime_error("cannot write the ready file " + options.readyFile);
+  }
+}
+
+void Serve(Options& options) {
+  Tessa::Service::LogLevel level{};
+  if (!Tessa::Service::ParseLevel(options.logLevel, level)) {
+    throw std::runtime_error("unknown log level '" + options.logLevel +
+                             "'; levels are none, error, warning, info, verbose, trivia");
+  }
+  const std::string socketPath = SocketPath(options.listen);
+  const auto logger = Host::MakeConsoleLogger(level);
+  Tessa::Service::SetDefaultLogger(logger);
+  Tessa::SetPanicHandler(&EndOverPanic);
+  if (!options.traceFile.empty()) {
+    options.runtime.recorder = Agentd::TraceTo(options.traceFile);
+  }
+  const Host::KovaService service(Host::HostRuntime::Start(options.runtime).Hooks());
+  Agentd::HttpServer server(socketPath, Agentd::HttpLimits(), [&service](const Agentd::HttpRequest& request) {
+    return Agentd::Route(service, request);
+  });
+  WriteReadyFile(options);
+  using Tessa::Service::LogInternal;
+  using Tessa::Service::LogLevel;
+  LogInternal(logger, LogLevel::Info, "Answering on %1", options.listen);
+  server.Run();
+  LogInternal(logger, LogLevel::Info, "Stopped");
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  CLI::App cli("The KOVA host agent", "agentd");
+  Options options;
+  AddOptions(cli, options);
+  try {
+    cli.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    return cli.exit(error) == 0 ? 0 : 2;
+  }
+  try {
+    Serve(options);
+    return 0;
+  } catch (const std::exception& exception) {
+    std::cerr << "agentd: " << exception.what() << "\n";
+    return 2;
+  }
+}

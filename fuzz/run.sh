@@ -1,0 +1,16 @@
+#!/bin/sh
+# Runs every fuzz target for some seconds, beginning with its seeds. Ends with the first finding.
+#   run.sh BUILD_DIR SECONDS
+set -eu
+here=$(cd "$(dirname "$0")" && pwd)
+build=$(cd "$1" && pwd)
+for target in "$build"/fuzz/fuzz_*; do
+  [ -x "$target" ] && [ ! -d "$target" ] || continue
+  name=$(basename "$target")
+  corpus=$build/fuzz/corpus/$name
+  mkdir -p "$corpus"
+  echo "fuzzing $name for $2 s"
+  # The seed is fixed, so that CI finds today what it found yesterday; the corpus grows between local runs.
+  (cd "$build/fuzz" && "$target" -seed=1 -max_total_time="$2" -rss_limit_mb=4096 -timeout=20 -max_len=65536 \
+    -print_final_stats=0 -verbosity=0 "$corpus" "$here/seeds/$name")
+done

@@ -1,0 +1,31 @@
+// What a request came to: a result, a fault, or both.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "orbis/Any.h"
+#include "orbis/Types.h"
+
+namespace Host {
+
+struct Answer {
+  Tessa::Ref<Orbis::Any> result;           // null: none
+  Tessa::Ref<Orbis::MethodFault> fault;    // null: none
+};
+
+// Reads what a hook appended to the texts it was given; an empty text is nothing. Throws
+// Orbis::ParseException, which would be a mistake of the plug-in.
+Answer ReadAnswer(const std::string& faultText, const std::string& resultText);
+
+// The same from the JSON form {"result": .., "fault": ..}, either null, that an agent sends. `resultType` is
+// the declared type of the result. Throws Orbis::ParseException.
+Answer ReadJsonAnswer(std::string_view text, const Orbis::TypeDescriptor* resultType);
+
+// And back, appended.
+void WriteJsonAnswer(const Answer& answer, std::string& out);
+
+// An answer that is only a SystemError with that reason.
+Answer FailedWith(const std::string& reason);
+
+}  // namespace Host

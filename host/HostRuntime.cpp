@@ -1,0 +1,74 @@
+#include "host/HostRuntime.h"
+
+#include <utility>
+
+#include "host/HostError.h"
+#include "nox/Host.h"
+#include "otxctl/ProviderFactory.h"
+#include "otxctl/fault/CallRecorder.h"
+#include "otxctl/fault/RecordingProvider.h"
+#include "otxctl/sim/DefaultHost.h"
+#include "otxctl/sim/SimProvider.h"
+
+namespace Host {
+
+using OtxCtl::Sim::HostDescription;
+using OtxCtl::Sim::SimHost;
+
+namespace {
+
+constexpr const char* storageSystemName = "storageSystem";
+
+std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(
+    const std::shared_ptr<SimHost>& host, const std::shared_ptr<OtxCtl::Fault::CallRecorder>& recorder) {
+  auto provider = std::make_unique<OtxCtl::Sim::SimProvider>(host);
+  if (recorder == nullptr) {
+    return provider;
+  }
+  return std::make_unique<OtxCtl::Fault::RecordingProvider>(std::move(provider), recorder);
+}
+
+}  // namespace
+
+HostRuntime& HostRuntime::Start(const RuntimeOptions& options) {
+  static HostRuntime* const runtime = new HostRuntime(options);
+  return *runtime;
+}
+
+HostRuntime::HostRuntime(const RuntimeOptions& options) : _inventory(Tessa::MakeRef<Inventory>()) {
+  _hooks = OpenPlugin(options.pluginFile.empty() ? FindPlugin() : options.pluginFile);
+  LoadHost(options);
+  PublishInventory();
+  _host->SetListener([this] { PublishInventory(); });
+
+  Tessa::Service::SetApp(&_app);
+  Tessa::Authorize::AuthorizeManager::SetInstance(Tessa::MakeRef<LocalAuthorization>());
+  OtxCtl::Kova::SetProviderFactory(
+      [host = _host, recorder = options.recorder] { return MakeProvider(host, recorder); });
+  if (_hooks.init() != 1) {
+    throw HostError("the plug-in could not be initialised");
+  }
+}
+
+void HostRuntime::LoadHost(const RuntimeOptions& options) {
+  if (options.save && options.hostFile.empty()) {
+    throw HostError("--save needs a host of your own: name its file with --host");
+  }
+  if (options.save) {
+    _writer.emplace(options.hostFile);  // before reading: nobody else may write from here on
+  }
+  _host = std::make_shared<SimHost>(options.hostFile.empty() ? OtxCtl::Sim::DefaultHost()
+                                                             : OtxCtl::Sim::LoadHostFile(options.hostFile));
+  if (_writer) {
+    _host->SetSaver([this](const HostDescription& changed) { _writer->Save(changed); });
+  }
+}
+
+void HostRuntime::PublishInventory() {
+  const HostDescription host = _host->Snapshot();
+  _inventory->Replace(DescribeInventory(host));
+  const bool present = host.storageSystem == OtxCtl::Sim::StorageSystem::Present;
+  _app.SetObject(storageSystemName, present ? _inventory : nullptr);
+}
+
+}  // namespace Host

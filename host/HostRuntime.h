@@ -1,0 +1,54 @@
+// A program's half of the plug-in's world: the host, its inventory, the registry, the kernel provider, and
+// the plug-in itself, initialised.
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "host/AgentApp.h"
+#include "host/Inventory.h"
+#include "host/PluginLoader.h"
+#include "otxctl/sim/HostFile.h"
+#include "otxctl/sim/SimHost.h"
+
+namespace OtxCtl::Fault {
+class CallRecorder;
+}
+
+namespace Host {
+
+struct RuntimeOptions {
+  std::string hostFile;    // empty: the embedded example host
+  bool save = false;       // write every change of the host back to its file
+  std::string pluginFile;  // empty: where FindPlugin finds it
+  // Records every call of the provider, if set.
+  std::shared_ptr<OtxCtl::Fault::CallRecorder> recorder;
+};
+
+// One per process, made by the main thread. The default logger and the panic handler must be set before.
+// It lives until the process ends: the plug-in keeps its provider that long.
+class HostRuntime {
+ public:
+  // Throws HostError, HostFileError or HostDescriptionError.
+  static HostRuntime& Start(const RuntimeOptions& options);
+
+  const PluginHooks& Hooks() const noexcept { return _hooks; }
+  OtxCtl::Sim::SimHost& SimulatedHost() noexcept { return *_host; }
+
+ private:
+  explicit HostRuntime(const RuntimeOptions& options);
+
+  void LoadHost(const RuntimeOptions& options);
+  // Brings registry and inventory in line with the host as it is now.
+  void PublishInventory();
+
+  std::optional<OtxCtl::Sim::HostFileWriter> _writer;
+  std::shared_ptr<OtxCtl::Sim::SimHost> _host;
+  AgentApp _app;
+  Tessa::Ref<Inventory> _inventory;
+  PluginHooks _hooks{};
+};
+
+}  // namespace Host

@@ -1,0 +1,33 @@
+// The agent's inventory: the host's logical units as management API objects.
+#pragma once
+
+#include <mutex>
+
+#include "nox/Fwd.h"
+#include "nox/StorageSystem.h"
+#include "tessa/Ref.h"
+
+namespace OtxCtl::Sim {
+struct HostDescription;
+}
+
+namespace Host {
+
+// The managed object "storageSystem". Holds one inventory, which is replaced as a whole; objects that were
+// handed out stay as they are.
+//
+// Threads: safe from any thread.
+class Inventory final : public Nox::Host::StorageSystem {
+ public:
+  void GetStorageDeviceInfo(Tessa::Ref<Nox::Host::StorageDeviceInfo>& info) override;
+  void Replace(Tessa::Ref<Nox::Host::StorageDeviceInfo> info);
+
+ private:
+  mutable std::mutex _mutex;
+  Tessa::Ref<Nox::Host::StorageDeviceInfo> _info;
+};
+
+// What the agent lists on a simulated host: the disks that have not left it, then the other logical units.
+Tessa::Ref<Nox::Host::StorageDeviceInfo> DescribeInventory(const OtxCtl::Sim::HostDescription& host);
+
+}  // namespace Host

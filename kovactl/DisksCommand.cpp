@@ -1,0 +1,98 @@
+#include "kovactl/DisksCommand.h"
+
+#include <map>
+#include <ostream>
+#include <set>
+
+#include "host/Text.h"
+#include "kovactl/Table.h"
+#include "kovactl/Words.h"
+#include "nox/Kova.h"
+#include "orbis/Json.h"
+#include "orbis/Soap.h"
+
+namespace Kovactl {
+namespace {
+
+using Nox::Kova::Host::DiskResult;
+using DiskResults = Orbis::DataArray<DiskResult>;
+
+std::string NameOf(const DiskResult& result) {
+  return result.GetDisk()->HasCanonicalName() ? result.GetDisk()->GetCanonicalName() : "";
+}
+
+std::string DescriptionOf(const DiskResult& result) {
+  return result.GetDisk()->HasDisplayName() ? result.GetDisk()->GetDisplayName() : "";
+}
+
+// "12 disks: 8 eligible, 4 ineligible"
+void PrintSummary(const DiskResults& disks, std::ostream& out) {
+  std::map<std::string, int> counts;
+  for (const DiskResult* disk : disks) {
+    ++counts[StateOf(*disk)];
+  }
+  out << disks.Size() << (disks.Size() == 1 ? " disk" : " disks");
+  const char* separator = ": ";
+  for (const auto& [state, count] : counts) {
+    out << separator << count << " " << state;
+    separator = ", ";
+  }
+  out << "\n";
+}
+
+void PrintTable(const DiskResults& disks, std::ostream& out) {
+  using Align = Table::Align;
+  Table table({{"DISK"}, {"KIND"}, {"SIZE", Align::Right}, {"STATE"}, {"WHY NOT"}, {"DESCRIPTION"}});
+  for (const DiskResult* disk : disks) {
+    table.AddRow({NameOf(*disk), KindOf(*disk->GetDisk()), SizeOf(*disk->GetDisk()), StateOf(*disk),
+                  ReasonOf(*disk), DescriptionOf(*disk)});
+  }
+  if (!disks.IsEmpty()) {
+    table.Print(out);
+    out << "\n";
+  }
+  PrintSummary(disks, out);
+}
+
+void PrintDisks(const DiskResults& disks, const std::string& output, std::ostream& out) {
+  if (output == "table") {
+    PrintTable(disks, out);
+    return;
+  }
+  std::string text;
+  if (output == "json") {
+    Orbis::WriteJson(disks, text);
+  } else {
+    Orbis::SerializeObjectToSoap(disks, nullptr, text);
+  }
+  out << text << "\n";
+}
+
+}  // namespace
+
+ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>& names, const std::string& output,
+                    std::ostream& out, std::ostream& err) {
+  const Host::Answer answer = connection.QueryDisksForKova(names);
+  if (answer.fault) {
+    err << "kovactl: " << Host::Printable(Explain(*answer.fault)) << "\n";
+  }
+  const auto* const disks = dynamic_cast<const DiskResults*>(answer.result.Get());
+  if (disks == nullptr) {
+    return ExitStatus::Fault;
+  }
+  PrintDisks(*disks, output, out);
+
+  std::set<std::string> unknown(names.begin(), names.end());
+  for (const DiskResult* disk : *disks) {
+    unknown.erase(NameOf(*disk));
+  }
+  for (const std::string& name : unknown) {
+    err << "kovactl: this host has no disk '" << Host::Printable(name) << "'\n";
+  }
+  if (answer.fault) {
+    return ExitStatus::Fault;
+  }
+  return unknown.empty() ? ExitStatus::Done : ExitStatus::BadInput;
+}
+
+}  // namespace Kovactl

@@ -1,0 +1,64 @@
+#include "kovactl/HostCommands.h"
+
+#include <fstream>
+#include <iterator>
+#include <istream>
+#include <ostream>
+
+#include "host/Text.h"
+#include "otxctl/sim/HostFile.h"
+#include "otxctl/sim/LsblkImport.h"
+
+namespace Kovactl {
+namespace {
+
+constexpr std::size_t longestImport = std::size_t{64} << 20;
+constexpr const char* standardInput = "-";
+
+std::string ReadInput(const std::string& file, std::istream& in) {
+  if (file != standardInput) {
+    return OtxCtl::Sim::ReadTextFile(file, longestImport);
+  }
+  return {std::istreambuf_iterator<char>(in), {}};
+}
+
+std::string Count(std::size_t count, const std::string& what) {
+  return std::to_string(count) + " " + what + (count == 1 ? "" : "s");
+}
+
+}  // namespace
+
+ExitStatus RunHostImport(const ImportOptions& options, std::istream& in, std::ostream& out) {
+  using OtxCtl::Sim::HostDescriptionError;
+  std::string description;
+  try {
+    const OtxCtl::Sim::HostDescription host = OtxCtl::Sim::ImportLsblk(
+        ReadInput(options.file, in), {.hostName = options.name, .minimumDiskBytes = options.minimumDiskBytes});
+    description = OtxCtl::Sim::WriteHostDescription(host);
+    if (!options.output.empty()) {
+      OtxCtl::Sim::HostFileWriter(options.output).Save(host);
+      out << "Wrote " << options.output << ": " << Count(host.disks.size(), "disk") << ".\n";
+      return ExitStatus::Done;
+    }
+  } catch (const HostDescriptionError& refused) {
+    throw BadInput(options.file + ": " + refused.what());
+  } catch (const OtxCtl::Sim::HostFileError& failed) {
+    throw BadInput(failed.what());
+  }
+  out << description;
+  return ExitStatus::Done;
+}
+
+ExitStatus RunHostCheck(const std::string& file, std::ostream& out) {
+  try {
+    const OtxCtl::Sim::HostDescription host = OtxCtl::Sim::LoadHostFile(file);
+    const std::string name = host.name.empty() ? "unnamed host" : "host " + Host::Printable(host.name);
+    out << file << ": " << name << ", " << Count(host.disks.size(), "disk") << ", "
+        << Count(host.groups.size(), "disk group") << ": sound\n";
+    return ExitStatus::Done;
+  } catch (const OtxCtl::Sim::HostFileError& refused) {
+    throw BadInput(refused.what());
+  }
+}
+
+}  // namespace Kovactl

@@ -1,0 +1,327 @@
+#include "kovactl/replay/ReplayRunner.h"
+
+#include <cxxabi.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <fstream>
+#include <istream>
+#include <memory>
+#include <ostream>
+#include <typeinfo>
+#include <utility>
+
+#include "host/Answer.h"
+#include "host/LogSink.h"
+#include "kovactl/replay/CapturingLogger.h"
+#include "kovactl/replay/ReplayRequest.h"
+#include "nox/Host.h"
+#include "nox/Kova.h"
+#include "nox/StorageSystem.h"
+#include "orbis/Json.h"
+#include "orbis/ParseException.h"
+#include "orbis/Soap.h"
+#include "orbis/json/JsonText.h"
+#include "otxctl/fault/CallRecorder.h"
+#include "otxctl/sim/HostDescriptionError.h"
+#include "tessa/App.h"
+#include "tessa/Panic.h"
+
+namespace Kovactl {
+namespace {
+
+using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapping;
+using Orbis::DataArray;
+using Tessa::MakeRef;
+using Tessa::Ref;
+using Tessa::Service::LogLevel;
+using Texts = std::vector<std::string>;
+
+// The class of an exception as the source names it.
+std::string TypeName(const std::exception& exception) {
+  int status = 0;
+  const std::unique_ptr<char, decltype(&std::free)> demangled(
+      abi::__cxa_demangle(typeid(exception).name(), nullptr, nullptr, &status), &std::free);
+  std::string name = status == 0 ? demangled.get() : typeid(exception).name();
+  for (const std::string_view noise : {"__cxx11::", "__1::"}) {
+    for (std::size_t at = name.find(noise); at != std::string::npos; at = name.find(noise)) {
+      name.erase(at, noise.size());
+    }
+  }
+  return name.substr(0, name.find('<'));
+}
+
+std::string ToSoap(const Orbis::Any& object) {
+  std::string text;
+  Orbis::SerializeObjectToSoap(object, nullptr, text);
+  return text;
+}
+
+// The inventory's disk of that name, or a disk that has only the name.
+Ref<ScsiDisk> LookUpDisk(const std::string& name) {
+  Ref<Nox::Host::StorageSystem> storageSystem;
+  Tessa::Service::TryLookupObject("storageSystem", storageSystem);
+  Ref<Nox::Host::StorageDeviceInfo> info;
+  if (storageSystem) {
+    storageSystem->GetStorageDeviceInfo(info);
+  }
+  if (info && info->GetScsiLun()) {
+    for (Nox::Host::ScsiLun* unit : *info->GetScsiLun()) {
+      auto* const disk = dynamic_cast<ScsiDisk*>(unit);
+      if (disk != nullptr && disk->HasCanonicalName() && disk->GetCanonicalName() == name) {
+        return Ref<ScsiDisk>(disk);
+      }
+    }
+  }
+  const auto unknown = MakeRef<ScsiDisk>();
+  unknown->SetCanonicalName(name);
+  return unknown;
+}
+
+Ref<ScsiDisk> Resolve(const DiskArgument& disk) {
+  const auto* const name = std::get_if<std::string>(&disk);
+  return name != nullptr ? LookUpDisk(*name) : std::get<Ref<ScsiDisk>>(disk);
+}
+
+std::string MappingText(const MappingArgument& argument) {
+  const auto mapping = MakeRef<DiskMapping>();
+  mapping->SetSsd(Resolve(argument.ssd));
+  const auto disks = MakeRef<DataArray<ScsiDisk>>();
+  for (const DiskArgument& disk : argument.nonSsd) {
+    disks->Append(Resolve(disk));
+  }
+  mapping->SetNonSsd(disks);
+  return ToSoap(*mapping);
+}
+
+// The texts that the hook of the request takes: those of a raw request as they are, else made from its
+// objects.
+Texts HookTexts(const ReplayRequest& request) {
+  Texts texts = request.texts;
+  for (const DiskArgument& disk : request.disks) {
+    texts.push_back(ToSoap(*Resolve(disk)));
+  }
+  for (const MappingArgument& mapping : request.mappings) {
+    texts.push_back(MappingText(mapping));
+  }
+  return texts;
+}
+
+using Hooks = Host::PluginHooks;
+using HookCall = void (*)(const Hooks&, ReplayRequest&, const Texts&, std::string& fault, std::string& result);
+
+struct HookRow {
+  std::string_view hook;
+  HookCall call;
+};
+
+const HookRow hookRows[] = {
+    {"QueryDisksForKovaHookFn",
+     [](const Hooks& hooks, ReplayRequest& request, const Texts&, std::string& fault, std::string& result) {
+       hooks.queryDisksForKova(request.names, fault, result);
+     }},
+    {"AddDisksHookFn",
+     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault, std::string& result) {
+       hooks.addDisks(texts, request.requestTag, fault, result);
+     }},
+    {"InitializeDisksHookFn",
+     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault, std::string& result) {
+       hooks.initializeDisks(texts, request.requestTag, fault, result);
+     }},
+    {"RemoveDisksHookFn",
+     [](const Hooks& hooks, ReplayRequest& request, const Texts&, std::string& fault, std::string&) {
+       hooks.removeDisks(request.disk, request.passThrough, request.optionText, request.optionFirst,
+                         request.optionSecond, fault);
+     }},
+    {"RemoveDiskMappingHookFn",
+     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault, std::string&) {
+       hooks.removeDiskMapping(texts.empty() ? std::string() : texts.front(), request.passThrough,
+                               request.optionText, request.optionFirst, request.optionSecond, fault);
+     }},
+    {"AddAllEligibleDisksHookFn",
+     [](const Hooks& hooks, ReplayRequest& request, const Texts&, std::string& fault, std::string& result) {
+       hooks.addAllEligibleDisks(request.requestTag, fault, result);
+     }},
+    {"UnmountDiskMappingHookFn",
+     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault, std::string& result) {
+       hooks.unmountDiskMapping(texts, request.requestTag, fault, result);
+     }},
+    {"GetStorageInfoHookFn", [](const Hooks& hooks, ReplayRequest&, const Texts&, std::string&,
+                                std::string& result) { hooks.getStorageInfo(result); }},
+    {"GetConfigInfoHookFn", [](const Hooks& hooks, ReplayRequest&, const Texts&, std::string&,
+                               std::string& result) { hooks.getConfigInfo(result); }},
+    {"ClaimUnmountedDiskgroupHookFn", [](const Hooks& hooks, ReplayRequest&, const Texts&, std::string&,
+                                         std::string&) { hooks.claimUnmountedDiskgroup(); }},
+};
+
+template <class T>
+void AppendOrNull(const Ref<T>& value, std::string& out) {
+  if (value) {
+    Orbis::WriteJson(*value, out);
+  } else {
+    out += "null";
+  }
+}
+
+void AppendLog(const std::vector<CapturedLine>& lines, std::string& out) {
+  const char* separator = "";
+  for (const CapturedLine& line : lines) {
+    out += separator;
+    separator = ",";
+    out += "{\"level\":" + std::to_string(static_cast<int>(line.level)) + ",\"format\":";
+    Orbis::Json::AppendString(line.format, out);
+    out += ",\"arguments\":[";
+    for (std::size_t i = 0; i < line.arguments.size(); ++i) {
+      out += i == 0 ? "" : ",";
+      Orbis::Json::AppendString(line.arguments[i], out);
+    }
+    out += "]}";
+  }
+}
+
+class Replay {
+ public:
+  Replay(Host::RuntimeOptions options, LogLevel level, std::ostream& out)
+      : _logger(MakeRef<CapturingLogger>(level)),
+        _recorder(std::make_shared<OtxCtl::Fault::CallRecorder>()),
+        _out(out) {
+    Tessa::Service::SetDefaultLogger(WithChild(Host::MakeConsoleLogger(LogLevel::Error), _logger));
+    Tessa::SetPanicHandler(&AnswerPanic);
+    options.recorder = _recorder;
+    _runtime = &Host::HostRuntime::Start(options);
+    _running = this;
+    TakeNoise();
+  }
+  ~Replay() { _running = nullptr; }
+  Replay(const Replay&) = delete;
+  Replay& operator=(const Replay&) = delete;
+
+  void Run(ReplayRequest request) {
+    _operation = request.operation;
+    _faultText.clear();
+    _resultText.clear();
+    if (request.operation == "host") {
+      _runtime->SimulatedHost().Change(request.hostSet, request.hostDisk);
+      TakeNoise();
+      Answer({});
+      return;
+    }
+    const Texts texts = HookTexts(request);
+    TakeNoise();
+    try {
+      Call(request, texts);
+      Answer({});
+    } catch (const std::exception& exception) {
+      Answer("exception: " + TypeName(exception) + ": " + exception.what());
+    }
+  }
+
+ private:
+  void Call(ReplayRequest& request, const Texts& texts) {
+    for (const HookRow& row : hookRows) {
+      if (row.hook == request.hook) {
+        row.call(_runtime->Hooks(), request, texts, _faultText, _resultText);
+      }
+    }
+  }
+
+  // What was logged and called outside of requests belongs to no answer.
+  void TakeNoise() {
+    _logger->Take();
+    _recorder->TakeEnded();
+  }
+
+  // `ended`: how the hook ended; empty: as it should.
+  void Answer(const std::string& ended) {
+    const Host::Answer answer = Host::ReadAnswer(_faultText, _resultText);
+    std::string line = "{\"operation\":";
+    Orbis::Json::AppendString(_operation, line);
+    line += ",\"fault\":";
+    AppendOrNull(answer.fault, line);
+    line += ",\"result\":";
+    AppendOrNull(answer.result, line);
+    line += ",\"ended\":";
+    if (ended.empty()) {
+      line += "null";
+    } else {
+      Orbis::Json::AppendString(ended, line);
+    }
+    line += ",\"log\":[";
+    AppendLog(_logger->Take(), line);
+    line += "],\"calls\":[";
+    const char* separator = "";
+    for (const OtxCtl::Fault::RecordedCall& call : _recorder->TakeEnded()) {
+      line.append(separator).append(OtxCtl::Fault::ToJsonLine(call));
+      separator = ",";
+    }
+    line += "]}\n";
+    _out << line << std::flush;
+  }
+
+  static void AnswerPanic(const char* text) {
+    Host::FlushLogs();
+    if (_running != nullptr) {
+      _running->Answer(std::string("panic: ") + text);
+    }
+    _exit(static_cast<int>(ExitStatus::Panic));
+  }
+
+  static inline Replay* _running = nullptr;  // a panic handler is given nothing but the text
+
+  Ref<CapturingLogger> _logger;
+  std::shared_ptr<OtxCtl::Fault::CallRecorder> _recorder;
+  std::ostream& _out;
+  Host::HostRuntime* _runtime = nullptr;
+  std::string _operation;
+  std::string _faultText;
+  std::string _resultText;
+};
+
+std::vector<std::pair<int, ReplayRequest>> ReadRequests(const std::string& file, std::istream& in) {
+  std::vector<std::pair<int, ReplayRequest>> requests;
+  std::string line;
+  for (int number = 1; std::getline(in, line); ++number) {
+    if (line.find_first_not_of(" \t\r") == std::string::npos) {
+      continue;
+    }
+    try {
+      requests.emplace_back(number, ParseReplayRequest(line));
+    } catch (const Orbis::ParseException& refused) {
+      throw BadInput(file + ", line " + std::to_string(number) + ": " + refused.GetPath() + ": " +
+                     refused.GetReason());
+    }
+  }
+  if (in.bad()) {
+    throw BadInput(file + " cannot be read");
+  }
+  return requests;
+}
+
+}  // namespace
+
+ExitStatus RunReplay(Host::RuntimeOptions runtime, const std::string& file, LogLevel level, std::istream& in,
+                     std::ostream& out) {
+  if (runtime.hostFile.empty()) {
+    throw BadInput("replay needs a host to run on: name its description with --host");
+  }
+  std::ifstream opened;
+  if (file != "-") {
+    opened.open(file);
+    if (!opened) {
+      throw BadInput(file + " cannot be opened");
+    }
+  }
+  auto requests = ReadRequests(file, file == "-" ? in : opened);
+  Replay replay(std::move(runtime), level, out);
+  for (auto& [number, request] : requests) {
+    try {
+      replay.Run(std::move(request));
+    } catch (const OtxCtl::Sim::HostDescriptionError& refused) {
+      throw BadInput(file + ", line " + std::to_string(number) + ": " + refused.what());
+    }
+  }
+  return ExitStatus::Done;
+}
+
+}  // namespace Kovactl

@@ -1,0 +1,120 @@
+#include "kova/agentd/include/KovaPlugin.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <stdexcept>
+#include <thread>
+#include <vector>
+
+#include "kova/agentd/include/HostCtlException.h"
+#include "kova/agentd/include/KovaInfo.h"
+#include "otxctl/ProviderFactory.h"
+
+namespace OtxCtl::Kova {
+namespace {
+
+using HostCtl::Kova::KovaInfo;
+using HostCtl::Lib::HostCtlException;
+using testing::HasSubstr;
+using testing::Property;
+using testing::ThrowsMessage;
+
+// A provider that says which factory made it.
+class NamedProvider : public KovaInfo {
+ public:
+  explicit NamedProvider(std::string name) : _name(std::move(name)) {}
+  void QueryDisks(const std::vector<std::string>&, std::vector<HostCtl::Kova::DiskResult>&, bool) override {}
+  void GetDiskMappings(std::vector<HostCtl::Kova::DiskMapping>&, bool) override {}
+  void FormatDiskMapping(const std::string&, const std::vector<std::string>&,
+                         const HostCtl::Kova::FormatContext&) override {}
+  void RestampDiskMapping(const std::string&, const std::vector<std::string>&) override {}
+  void MountDiskMapping(const std::string&, bool) override {}
+  void RestampDiskMappingByUuid(const std::string&) override {}
+  void RemoveDisk(const std::string&, const std::string&, const HostCtl::Kova::RemovalOptions&) override {}
+  void RemoveDiskMapping(const std::string&, const std::string&,
+                         const HostCtl::Kova::RemovalOptions&) override {}
+  void UnmountDiskMapping(const std::string&) override {}
+  void RemoveDiskByUuid(const std::string&, const std::string&) override {}
+  bool IsAutoModeEnabled() override { return false; }
+  std::vector<HostCtl::Kova::KovaOtxNicConfig*> GetKovaOtxNicConfigs() override { return {}; }
+  void GetClusterInfoDetailed(HostCtl::Kova::KovaClusterInfoDetailed&) override {}
+  std::string GetFaultDomainName() override { return _name; }
+  void ClaimUnmountedDiskgroups() override {}
+  void RefreshKovaInfo() override {}
+
+ private:
+  std::string _name;
+};
+
+class ProviderFactoryTest : public testing::Test {
+ protected:
+  ~ProviderFactoryTest() override { SetProviderFactory({}); }
+
+  static std::unique_ptr<KovaInfo> Get() { return std::unique_ptr<KovaInfo>(KovaPluginImpl().GetKovaInfo()); }
+};
+
+TEST_F(ProviderFactoryTest, WithoutAFactoryTheErrorSaysWhatToCall) {
+  EXPECT_THAT([] { Get(); }, ThrowsMessage<HostCtlException>(HasSubstr("SetProviderFactory")));
+}
+
+TEST_F(ProviderFactoryTest, TheLastInstalledFactoryCounts) {
+  SetProviderFactory([] { return std::make_unique<NamedProvider>("first"); });
+  SetProviderFactory([] { return std::make_unique<NamedProvider>("second"); });
+  EXPECT_EQ(Get()->GetFaultDomainName(), "second");
+}
+
+TEST_F(ProviderFactoryTest, EveryCallMakesAProviderOfItsOwn) {
+  SetProviderFactory([] { return std::make_unique<NamedProvider>("one"); });
+  const auto first = Get();
+  const auto second = Get();
+  EXPECT_NE(first.get(), second.get());
+}
+
+TEST_F(ProviderFactoryTest, AnEmptyFactoryTakesTheOneBeforeAway) {
+  SetProviderFactory([] { return std::make_unique<NamedProvider>("one"); });
+  SetProviderFactory({});
+  EXPECT_THROW(Get(), HostCtlException);
+}
+
+TEST_F(ProviderFactoryTest, AFactoryThatReturnsNothingIsAnError) {
+  SetProviderFactory([] { return std::unique_ptr<KovaInfo>(); });
+  EXPECT_THAT([] { Get(); }, ThrowsMessage<HostCtlException>(HasSubstr("returned none")));
+}
+
+TEST_F(ProviderFactoryTest, OtherExceptionsOfAFactoryBecomeTheOneFamily) {
+  SetProviderFactory([]() -> std::unique_ptr<KovaInfo> { throw std::runtime_error("no such host"); });
+  EXPECT_THAT([] { Get(); }, ThrowsMessage<HostCtlException>(HasSubstr("no such host")));
+}
+
+TEST_F(ProviderFactoryTest, ItsOwnExceptionsPassUnchanged) {
+  SetProviderFactory(
+      []() -> std::unique_ptr<KovaInfo> { throw HostCtl::Lib::KovaStorageException("gone", "naa.1"); });
+  EXPECT_THROW(Get(), HostCtl::Lib::KovaStorageException);
+}
+
+TEST_F(ProviderFactoryTest, MayBeReplacedWhileOthersAskForProviders) {
+  SetProviderFactory([] { return std::make_unique<NamedProvider>("a"); });
+  std::atomic<int> strange = 0;
+  std::vector<std::thread> askers;
+  for (int asker = 0; asker < 4; ++asker) {
+    askers.emplace_back([&strange] {
+      for (int round = 0; round < 200; ++round) {
+        const std::string name = Get()->GetFaultDomainName();
+        strange += name == "a" || name == "b" ? 0 : 1;
+      }
+    });
+  }
+  for (int round = 0; round < 200; ++round) {
+    SetProviderFactory([] { return std::make_unique<NamedProvider>("b"); });
+  }
+  for (std::thread& asker : askers) {
+    asker.join();
+  }
+  EXPECT_EQ(strange, 0);
+  EXPECT_EQ(Get()->GetFaultDomainName(), "b");
+}
+
+}  // namespace
+}  // namespace OtxCtl::Kova

@@ -1,0 +1,133 @@
+#include <nlohmann/json.hpp>
+#include <type_traits>
+
+#include "otxctl/sim/Base64.h"
+#include "otxctl/sim/CleanText.h"
+#include "otxctl/sim/HostDescription.h"
+#include "otxctl/sim/HostDescriptionFields.h"
+
+namespace OtxCtl::Sim {
+namespace {
+
+using nlohmann::json;
+using nlohmann::ordered_json;
+
+template <typename Struct>
+requires std::is_class_v<Struct> ordered_json ToJson(const Struct& object);
+
+template <typename Scalar>
+requires std::is_arithmetic_v<Scalar> ordered_json ToJson(const Scalar& value) {
+  return value;
+}
+
+ordered_json ToJson(const std::string& text) {
+  return text;
+}
+
+ordered_json ToJson(const StorageSystem& system) {
+  return system == StorageSystem::Missing ? "missing" : "present";
+}
+
+ordered_json ToJson(const std::vector<std::uint8_t>& bytes) {
+  return EncodeBase64(bytes);
+}
+
+template <typename Value>
+ordered_json ToJson(const std::optional<Value>& optional) {
+  return optional ? ToJson(*optional) : ordered_json(nullptr);
+}
+
+template <typename Element>
+ordered_json ToJson(const std::vector<Element>& list) {
+  ordered_json array = ordered_json::array();
+  for (const Element& element : list) {
+    array.push_back(ToJson(element));
+  }
+  return array;
+}
+
+template <typename Struct>
+class FieldWriter {
+ public:
+  explicit FieldWriter(const Struct& object) : _object(object) {}
+
+  template <typename Value>
+  void Required(const char* key, Value Struct::*member, const Fields::Rule& = {}) {
+    _result[key] = ToJson(_object.*member);
+  }
+
+  template <typename Value>
+  void Optional(const char* key, Value Struct::*member, const Fields::Rule& = {}) {
+    static const Struct kDefaults{};
+    if (_object.*member != kDefaults.*member) {
+      _result[key] = ToJson(_object.*member);
+    }
+  }
+
+  ordered_json Take() { return std::move(_result); }
+
+ private:
+  const Struct& _object;
+  ordered_json _result = ordered_json::object();
+};
+
+template <typename Struct>
+requires std::is_class_v<Struct> ordered_json ToJson(const Struct& object) {
+  FieldWriter<Struct> writer(object);
+  Fields::Describe(writer, static_cast<const Struct*>(nullptr));
+  return writer.Take();
+}
+
+bool IsGiven(const json& object, const char* what) {
+  if (object.is_null()) {
+    return false;
+  }
+  if (!object.is_object()) {
+    throw HostDescriptionError(std::string(what) + ": must be an object");
+  }
+  return true;
+}
+
+json& FindDisk(json& document, const json& change) {
+  const auto name = change.find("name");
+  if (name == change.end() || !name->is_string()) {
+    throw HostDescriptionError("disk.name: must be the name of the disk to change");
+  }
+  json& disks = document["disks"];
+  if (disks.is_array()) {
+    for (json& disk : disks) {
+      if (disk.is_object() && disk.contains("name") && disk["name"] == *name) {
+        return disk;
+      }
+    }
+  }
+  throw HostDescriptionError("disk.name: the host has no disk " +
+                             Quoted(CleanText(name->get_ref<const std::string&>())));
+}
+
+}  // namespace
+
+std::string WriteHostDescription(const HostDescription& host) {
+  try {
+    return ToJson(host).dump(2) + "\n";
+  } catch (const json::exception& failure) {
+    throw HostDescriptionError(std::string("document: cannot be written: ") + failure.what());
+  }
+}
+
+void ApplyChange(HostDescription& host, const json& set, const json& disk) {
+  json document = ToJson(host);
+  if (IsGiven(set, "set")) {
+    document.update(set);
+  }
+  if (IsGiven(disk, "disk")) {
+    FindDisk(document, disk).update(disk);
+  }
+  host = ReadHostDescription(document);
+}
+
+void CheckHostDescription(const HostDescription& host) {
+  ReadHostDescription(ToJson(host));
+}
+
+}  // namespace OtxCtl::Sim

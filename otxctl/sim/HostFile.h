@@ -1,0 +1,59 @@
+// A host description in a file: read, saved whole or not at all, and kept from a second writer.
+//
+// Threads: one thread at a time. Every error is a HostFileError whose text names the file.
+#pragma once
+
+#include <stdexcept>
+#include <string>
+
+#include "otxctl/sim/HostDescription.h"
+
+namespace OtxCtl::Sim {
+
+class HostFileError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+// An open file, closed at the end.
+class FileDescriptor {
+ public:
+  FileDescriptor() = default;
+  explicit FileDescriptor(int number) : _number(number) {}
+  ~FileDescriptor();
+  FileDescriptor(FileDescriptor&& other) noexcept;
+  FileDescriptor& operator=(FileDescriptor&& other) noexcept;
+
+  int Get() const noexcept { return _number; }
+  bool IsOpen() const noexcept { return _number >= 0; }
+  // Closes now; false where the system reports that writing had failed.
+  bool Close() noexcept;
+
+ private:
+  int _number = -1;
+};
+
+// The whole of a regular file, at most `mostBytes` of it; more is an error.
+std::string ReadTextFile(const std::string& path, std::size_t mostBytes);
+
+// Reads and checks a host description. Takes no lock.
+HostDescription LoadHostFile(const std::string& path);
+
+// The right to write one file. While it lives, no other HostFileWriter, of this process or another, can be
+// made for that file.
+class HostFileWriter {
+ public:
+  // Locks PATH.lock beside the file, which need not exist yet. A link is followed: what it points to is
+  // locked and saved.
+  explicit HostFileWriter(const std::string& path);
+
+  // Replaces the file: written beside it, made durable, then renamed over it. If that fails, the old file
+  // stands as it was and nothing is left behind.
+  void Save(const HostDescription& host) const;
+
+ private:
+  std::string _path;
+  FileDescriptor _lock;
+};
+
+}  // namespace OtxCtl::Sim

@@ -1,0 +1,107 @@
+#!/usr/bin/env python3
+"""Checks who may include whom, and that third-party libraries stay in their rooms.
+
+The table is the architecture, as ARCHITECTURE.md draws it. A folder may include itself, what its row
+names, and the C++ standard library; system headers only where a row says so.
+"""
+
+import re
+import sys
+from pathlib import Path
+
+# Folder: folders it may include. The longest folder that a file lies in counts.
+RULES = {
+    "tessa": [],
+    "orbis": ["tessa"],
+    "nox": ["orbis", "tessa"],
+    "kova/agentd/include": [],
+    "otxctl": ["kova/agentd/include"],
+    "kova/agentd/planning/pure": [],
+    "kova/agentd": ["tessa", "orbis", "nox", "kova/agentd/include", "kova/agentd/planning/pure"],
+    "host": ["tessa", "orbis", "nox", "otxctl", "kova/agentd/include"],
+    "agentd": ["tessa", "orbis", "nox", "otxctl", "host", "kova/agentd/include"],
+    "kovactl": ["tessa", "orbis", "nox", "otxctl", "host", "agentd/client", "agentd/http/HttpClient.h",
+                "kova/agentd/include", "kova/agentd/planning/pure"],
+}
+# What only one library must not drag into another: these headers are for whoever links the kernel library.
+FORBIDDEN = {
+    "otxctl": ["kova/agentd/include/KovaConstants.h", "kova/agentd/include/KovaHooks.h"],
+    "kova/agentd": ["otxctl"],
+}
+# Library: (pattern of its headers, folders that may include it).
+LIBRARIES = {
+    "expat": (r"expat\.h", ["orbis/xml"]),
+    "JSON": (r"nlohmann/.*", ["orbis/json", "otxctl/sim", "otxctl/fault", "kovactl/replay"]),
+    "HTTP and network": (r"boost/.*", ["agentd/http"]),
+    "log sink": (r"spdlog/.*", ["host"]),
+    "command line": (r"CLI/.*", ["agentd", "kovactl"]),
+    "UUID": (r"uuid/.*", ["otxctl/sim"]),
+    "dynamic loading": (r"dlfcn\.h", ["host", "tests/abi"]),
+    "block devices": (r"(sys/ioctl|linux/.*|blkid/.*|libudev)\.h", ["otxctl/linux", "host/inventory/linux"]),
+    "system calls": (r"(unistd|fcntl|sys/.*|poll|pthread|netinet/.*|arpa/.*)(\.h)?",
+                     ["tessa", "otxctl/sim", "host", "agentd", "kovactl", "tests"]),
+    "test framework": (r"(gtest|gmock)/.*", []),
+    "benchmark framework": (r"benchmark/.*", ["bench"]),
+}
+# Tests and the support for them may use anything; so may what crosses rooms by its nature.
+FREE = ("tests/", "bench/", "fuzz/", "otxctl/contract/")
+INCLUDE = re.compile(r'^\s*#\s*include\s+([<"])([^>"]+)[>"]')
+
+
+def room_of(path):
+    rooms = [room for room in RULES if path.startswith(room + "/")]
+    return max(rooms, key=len) if rooms else None
+
+
+def allowed(path, room, target):
+    if path.startswith(FREE) or path.endswith("_test.cpp") or target.startswith(room + "/"):
+        return True
+    for forbidden in FORBIDDEN.get(room, []):
+        if target == forbidden or target.startswith(forbidden + "/"):
+            return False
+    inner = room_of(target)
+    return any(target == rule or target.startswith(rule + "/") for rule in RULES[room]) and not (
+        inner not in (None, room) and inner.startswith(room) and inner not in RULES[room])
+
+
+def library_fault(path, header):
+    if path.startswith(FREE) or path.endswith("_test.cpp"):
+        return None
+    for library, (pattern, rooms) in LIBRARIES.items():
+        if re.fullmatch(pattern, header) and not any(path.startswith(room + "/") for room in rooms):
+            return f"<{header}>: the {library} library belongs to {', '.join(rooms) or 'tests'}"
+    return None
+
+
+def faults_of(path, text):
+    """Faults of one file: (line, reason)."""
+    room = room_of(path)
+    for number, line in enumerate(text.splitlines(), 1):
+        match = INCLUDE.match(line)
+        if not match:
+            continue
+        kind, header = match.groups()
+        if kind == "<":
+            fault = library_fault(path, header)
+            if fault:
+                yield number, fault
+        elif room and not allowed(path, room, header):
+            yield number, f'"{header}": {room} may not know it'
+
+
+def main(root):
+    faults = 0
+    for file in sorted(Path(root).rglob("*")):
+        path = file.relative_to(root).as_posix()
+        if file.suffix not in (".h", ".cpp") or path.startswith(("build/", ".")):
+            continue
+        for number, reason in faults_of(path, file.read_text(encoding="utf-8")):
+            print(f"{path}:{number}: {reason}")
+            faults += 1
+    if faults:
+        print(f"{faults} include(s) break the rules of tools/lint/include_rules.py")
+    return 1 if faults else 0
+
+
+if __name__ == "__main__":
+    sys.exit(main(sys.argv[1] if len(sys.argv) > 1 else "."))

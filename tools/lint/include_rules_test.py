@@ -1,0 +1,43 @@
+#!/usr/bin/env python3
+"""The lint finds what it is there to find."""
+
+import unittest
+
+from include_rules import faults_of
+
+
+def reasons(path, line):
+    return [reason for _, reason in faults_of(path, line)]
+
+
+class IncludeRules(unittest.TestCase):
+    def test_a_lower_room_may_not_know_a_higher_one(self):
+        self.assertEqual(len(reasons("tessa/Ref.h", '#include "orbis/Any.h"')), 1)
+        self.assertEqual(len(reasons("otxctl/sim/SimHost.h", '#include "nox/Host.h"')), 1)
+        self.assertEqual(len(reasons("host/Gate.cpp", '#include "agentd/Trace.h"')), 1)
+
+    def test_a_higher_room_may_know_a_lower_one(self):
+        self.assertEqual(reasons("orbis/Any.h", '#include "tessa/Ref.h"'), [])
+        self.assertEqual(reasons("kova/agentd/query/DiskQuery.h", '#include "kova/agentd/include/KovaRecords.h"'), [])
+
+    def test_the_plug_in_knows_the_kernel_library_by_its_shared_headers_only(self):
+        self.assertEqual(len(reasons("kova/agentd/KovaManagerImpl.cpp", '#include "otxctl/TaskScope.h"')), 1)
+
+    def test_the_kernel_library_does_not_see_the_plug_ins_constants(self):
+        self.assertEqual(len(reasons("otxctl/sim/SimHost.cpp", '#include "kova/agentd/include/KovaConstants.h"')), 1)
+
+    def test_the_pure_planning_rules_know_nothing(self):
+        self.assertEqual(len(reasons("kova/agentd/planning/pure/Plan.h", '#include "tessa/Ref.h"')), 1)
+
+    def test_libraries_stay_in_their_rooms(self):
+        self.assertEqual(len(reasons("orbis/soap/SoapReader.cpp", "#include <expat.h>")), 1)
+        self.assertEqual(reasons("orbis/xml/XmlReader.cpp", "#include <expat.h>"), [])
+        self.assertEqual(len(reasons("kovactl/main.cpp", "#include <boost/asio.hpp>")), 1)
+        self.assertEqual(len(reasons("kova/agentd/KovaLibManager.cpp", "#include <unistd.h>")), 1)
+
+    def test_the_line_is_named(self):
+        self.assertEqual([n for n, _ in faults_of("tessa/Ref.h", '#pragma once\n#include "nox/Fwd.h"\n')], [2])
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,274 @@
+#!/usr/bin/env python3
+"""Tests of the schema language and of what is generated from it."""
+
+import os
+import pathlib
+import re
+import subprocess
+import sys
+import tempfile
+import unittest
+import xml.etree.ElementTree as ElementTree
+
+HERE = pathlib.Path(__file__).resolve().parent
+ROOT = HERE.parent.parent
+BINDING = ROOT / "orbis/schema/binding.schema"
+API = ROOT / "nox/schema/nox.schema"
+
+sys.path.insert(0, str(HERE))
+sys.dont_write_bytecode = True
+import emit_page  # noqa: E402
+import emit_xsd  # noqa: E402
+import schema as schema_language  # noqa: E402
+
+XSD = "{http://www.w3.org/2001/XMLSchema}"
+WSDL = "{http://schemas.xmlsoap.org/wsdl/}"
+SOAP = "{http://schemas.xmlsoap.org/wsdl/soap/}"
+
+
+class InFolder(unittest.TestCase):
+    def setUp(self):
+        folder = tempfile.TemporaryDirectory()
+        self.addCleanup(folder.cleanup)
+        self.folder = pathlib.Path(folder.name)
+
+    def schema_file(self, text, name="test.schema"):
+        path = self.folder / name
+        path.write_text(text, encoding="utf-8")
+        return str(path)
+
+    def read(self, text):
+        return schema_language.read([self.schema_file(text)])
+
+
+def types(*lines):
+    return "file Test\n" + "\n".join(lines) + "\n"
+
+
+LAMP = "type Lamp = Test::Lamp : DataObject {\n  name: string\n}"
+FAULT = "fault Broken = Test::Broken : DataObject {\n}"
+
+# What the text says wrong, and what the error must name.
+ERRORS = {
+    "a line that is nothing": ("file Test\nhello\n", r"test\.schema:2: not understood: hello"),
+    "a field that is none": (types("type Lamp = Test::Lamp : DataObject {", "  name string", "}"),
+                             r"test\.schema:3: not a field: name string"),
+    "a field with two marks": (types("type Lamp = Test::Lamp : DataObject {", "  name?[]: string", "}"),
+                               r"test\.schema:3: not a field"),
+    "a lazy field that is no list": (types("type Lamp = Test::Lamp : DataObject {", "  other?: Lamp lazy", "}"),
+                                     r"test\.schema:3: only a list"),
+    "a lazy list of texts": (types("type Lamp = Test::Lamp : DataObject {", "  names[]: string lazy", "}"),
+                             r"test\.schema:3: only a list of data objects"),
+    "a type twice": (types(LAMP, LAMP), r"test\.schema:5: Lamp is defined twice"),
+    "a type before `file`": (LAMP + "\n", r"test\.schema:1: no `file`"),
+    "a type that is not closed": (types("type Lamp = Test::Lamp : DataObject {"), r"test\.schema: Lamp is not closed"),
+    "a type inside another": (types("type Lamp = Test::Lamp : DataObject {", FAULT),
+                              r"test\.schema:3: Lamp is not closed before Broken"),
+    "an operation inside a type": (types("type Lamp = Test::Lamp : DataObject {", "operation Run()", "}"),
+                                   r"test\.schema:3: not a field: operation Run\(\)"),
+    "a closing brace too many": (types(LAMP, "}"), r"test\.schema:5: not understood: \}"),
+    "an unknown base": (types("type Lamp = Test::Lamp : Furniture {", "}"), r"Lamp: unknown base Furniture"),
+    "its own base": (types("type Lamp = Test::Lamp : Lamp {", "}"), r"Lamp: its bases run in a circle"),
+    "bases in a circle": (types("type Lamp = Test::Lamp : Light {", "}", "type Light = Test::Light : Lamp {", "}"),
+                          r"Lamp: its bases run in a circle through Lamp"),
+    "a fault that derives from a type": (types(LAMP, "fault Dark = Test::Dark : Lamp {", "}"),
+                                         r"Dark: faults derive from faults"),
+    "a type that derives from a fault": (types(FAULT, "type Lamp = Test::Lamp : Broken {", "}"),
+                                         r"Lamp: faults derive from faults"),
+    "a field twice": (types("type Lamp = Test::Lamp : DataObject {", "  name: string", "  name?: int", "}"),
+                      r"Lamp: field name is defined twice"),
+    "a field of the base again": (types(LAMP, "type Torch = Test::Torch : Lamp {", "  name: string", "}"),
+                                  r"Torch: field name is defined twice"),
+    "a field of an unknown type": (types("type Lamp = Test::Lamp : DataObject {", "  shade?: Shade", "}"),
+                                   r"Lamp\.shade: unknown type Shade"),
+    "a list of numbers": (types("type Lamp = Test::Lamp : DataObject {", "  watts[]: int", "}"),
+                          r"Lamp\.watts: lists hold"),
+    "construct from nothing": (types("type Lamp = Test::Lamp : DataObject {", "  construct(watts)", "}"),
+                               r"Lamp: cannot construct from unknown field watts"),
+    "a required abstract object": (types("abstract type Light = Test::Light : DataObject {", "}",
+                                         "type Lamp = Test::Lamp : DataObject {", "  light: Light", "}"),
+                                   r"Lamp\.light: Light is abstract"),
+    "an object that requires itself": (types("type Lamp = Test::Lamp : DataObject {", "  spare: Lamp", "}"),
+                                       r"Lamp: requires an object of its own type"),
+    "objects that require each other": (types("type Lamp = Test::Lamp : DataObject {", "  shade: Shade", "}",
+                                              "type Shade = Test::Shade : DataObject {", "  lamp: Lamp", "}"),
+                                        r"Lamp: requires an object of its own type"),
+    "a name of the binding": (types("type ArrayOfLamp = Test::ArrayOfLamp : DataObject {", "}"),
+                              r"ArrayOfLamp: the name belongs"),
+    "a parameter of an unknown type": ("operation Run(lamp: Lamp)\n", r"Run\(lamp\): unknown type Lamp"),
+    "a parameter that is none": ("operation Run(lamp)\n", r"test\.schema:1: not a field: lamp"),
+    "an unknown result": ("operation Run() returns Lamp\n", r"Run: unknown result Lamp"),
+    "an operation twice": ("operation Run()\noperation Run()\n", r"Run: operation is defined twice"),
+}
+
+
+class Errors(InFolder):
+    def test_each_error_says_where_it_is(self):
+        for what, (text, message) in ERRORS.items():
+            with self.subTest(what):
+                with self.assertRaisesRegex(schema_language.SchemaError, message):
+                    self.read(text)
+
+    def test_a_file_that_is_not_there_or_no_text_is_an_error_that_names_it(self):
+        with self.assertRaisesRegex(schema_language.SchemaError, r"missing\.schema: cannot be read"):
+            schema_language.read([str(self.folder / "missing.schema")])
+        (self.folder / "bytes.schema").write_bytes(b"file \xff\n")
+        with self.assertRaisesRegex(schema_language.SchemaError, r"bytes\.schema: cannot be read"):
+            schema_language.read([str(self.folder / "bytes.schema")])
+
+    def test_the_program_prints_the_error_and_fails(self):
+        broken = self.schema_file("file Test\nhello\n")
+        run = subprocess.run([sys.executable, "-B", HERE / "generate.py", "xsd", self.folder / "out.xsd", broken],
+                             capture_output=True, text=True, check=False)
+        self.assertEqual(run.returncode, 1)
+        self.assertEqual(run.stderr, f"error: {broken}:2: not understood: hello\n")
+        self.assertFalse((self.folder / "out.xsd").exists())
+
+    def test_the_program_explains_itself_when_it_is_called_wrongly(self):
+        for arguments in ([], ["xsd"], ["cpp", "orbis"], ["pdf", "out", str(BINDING)]):
+            run = subprocess.run([sys.executable, "-B", HERE / "generate.py", *arguments],
+                                 capture_output=True, text=True, check=False)
+            self.assertEqual(run.returncode, 1, arguments)
+            self.assertIn("generate.py xsd", run.stderr)
+
+
+class Language(InFolder):
+    def test_fields_have_marks_types_and_what_is_said_of_them(self):
+        schema = self.read(types("## A lamp.", "type Lamp = Test::Lamp : DataObject {", '  const RED = "red"',
+                                 "  name: string", "  ## How bright,", "  ## at its best.", "  watts?: int",
+                                 "  spare[]: Lamp lazy", "  # no word about this", "  shade[]: string", "}"))
+        lamp = schema.types["Lamp"]
+        self.assertEqual(lamp.doc, "A lamp.")
+        self.assertEqual(lamp.constants, [("RED", "red")])
+        self.assertEqual([(f.name, f.type, f.optional, f.list, f.lazy, f.doc) for f in lamp.fields], [
+            ("name", "string", False, False, False, ""),
+            ("watts", "int", True, False, False, "How bright, at its best."),
+            ("spare", "Lamp", False, True, True, ""),
+            ("shade", "string", False, True, False, ""),
+        ])
+
+    def test_fields_of_the_bases_come_first(self):
+        schema = self.read(types(LAMP, "type Torch = Test::Torch : Lamp {", "  battery: string", "}"))
+        self.assertEqual([f.name for f in schema.all_fields(schema.types["Torch"])], ["name", "battery"])
+
+    def test_operations_have_parameters_and_a_result(self):
+        schema = self.read(types(LAMP, "## Turns lamps on.",
+                                 "operation TurnOn(lamps[]: Lamp, label?: string) returns Lamp[]"))
+        operation = schema.operations[0]
+        self.assertEqual((operation.name, operation.returns, operation.returns_list, operation.doc),
+                         ("TurnOn", "Lamp", True, "Turns lamps on."))
+        self.assertEqual([(f.name, f.optional, f.list) for f in operation.parameters],
+                         [("lamps", False, True), ("label", True, False)])
+
+    def test_later_files_build_on_earlier_ones(self):
+        first = self.schema_file(types(LAMP), "first.schema")
+        second = self.schema_file(types("type Torch = Test::Torch : Lamp {", "}"), "second.schema")
+        self.assertEqual(list(schema_language.read([first, second]).types), ["Lamp", "Torch"])
+        with self.assertRaisesRegex(schema_language.SchemaError, "unknown base Lamp"):
+            schema_language.read([second])
+
+
+class Generated(InFolder):
+    def generate(self, *arguments):
+        subprocess.run([sys.executable, "-B", HERE / "generate.py", *map(str, arguments)], check=True)
+
+    def generate_all(self, out):
+        self.generate("cpp", "orbis", out, BINDING)
+        self.generate("cpp", "nox", out, BINDING, API)
+        for kind, name in (("xsd", "nox.xsd"), ("wsdl", "nox.wsdl"), ("page", "api-reference.md")):
+            self.generate(kind, out / name, BINDING, API)
+        return {str(path.relative_to(out)): path for path in sorted(out.rglob("*")) if path.is_file()}
+
+    def test_is_the_same_every_time(self):
+        first = self.generate_all(self.folder / "first")
+        second = self.generate_all(self.folder / "second")
+        self.assertEqual(list(first), list(second))
+        self.assertIn("nox/Kova.h", first)
+        for name, path in first.items():
+            self.assertEqual(path.read_bytes(), second[name].read_bytes(), name)
+
+    def test_keeps_the_time_of_files_that_do_not_change(self):
+        long_ago = 1_000_000_000
+        files = self.generate_all(self.folder)
+        for path in files.values():
+            os.utime(path, (long_ago, long_ago))
+        files["nox/Host.h"].write_text("something else", encoding="utf-8")
+        os.utime(files["nox/Host.h"], (long_ago, long_ago))
+        self.generate_all(self.folder)
+        changed = [name for name, path in files.items() if path.stat().st_mtime != long_ago]
+        self.assertEqual(changed, ["nox/Host.h"])
+
+    def test_names_no_path_of_the_machine(self):
+        for name, path in self.generate_all(self.folder).items():
+            self.assertNotIn(str(ROOT), path.read_text(encoding="utf-8"), name)
+
+
+class Documents(unittest.TestCase):
+    @classmethod
+    def setUpClass(cls):
+        cls.schema = schema_language.read([str(BINDING), str(API)])
+        cls.xsd = ElementTree.fromstring("\n".join(emit_xsd.xsd(cls.schema)).encode())
+        cls.wsdl = ElementTree.fromstring("\n".join(emit_xsd.wsdl(cls.schema)).encode())
+
+    def names(self, tree, tag):
+        return [element.get("name") for element in tree.findall(tag)]
+
+    def test_every_type_and_its_list_stand_in_the_schema_once(self):
+        names = self.names(self.xsd, XSD + "complexType")
+        self.assertEqual(len(names), len(set(names)))
+        wanted = {"DataObject", "ArrayOfString"}
+        wanted |= set(self.schema.types) | {"ArrayOf" + name for name in self.schema.types}
+        self.assertEqual(set(names), wanted)
+
+    def test_every_type_that_is_referred_to_is_defined(self):
+        defined = set(self.names(self.xsd, XSD + "complexType"))
+        for element in self.xsd.iter():
+            for reference in (element.get("type"), element.get("base")):
+                if reference and reference.startswith("nox:"):
+                    self.assertIn(reference[4:], defined)
+
+    def test_nothing_is_nillable(self):
+        self.assertFalse([element for element in self.xsd.iter() if element.get("nillable")])
+
+    def test_abstract_types_say_so(self):
+        abstract = {e.get("name") for e in self.xsd.findall(XSD + "complexType") if e.get("abstract") == "true"}
+        self.assertEqual(abstract, {"DataObject", "MethodFault", "RuntimeFault"})
+
+    def test_every_message_has_its_element_in_the_schema(self):
+        elements = set(self.names(self.xsd, XSD + "element"))
+        parts = [part.get("element") for part in self.wsdl.iter(WSDL + "part")]
+        self.assertEqual(len(parts), 2 * len(self.schema.operations) + 1)
+        for part in parts:
+            self.assertTrue(part.startswith("nox:"), part)
+            self.assertIn(part[4:], elements)
+
+    def test_every_operation_has_its_messages_and_its_binding(self):
+        messages = set(self.names(self.wsdl, WSDL + "message"))
+        operations = [operation.name for operation in self.schema.operations]
+        ports = self.wsdl.find(WSDL + "portType").findall(WSDL + "operation")
+        self.assertEqual([port.get("name") for port in ports], operations)
+        for port in ports:
+            for tag in ("input", "output", "fault"):
+                self.assertIn(port.find(WSDL + tag).get("message")[4:], messages)
+        bound = self.wsdl.find(WSDL + "binding").findall(WSDL + "operation")
+        self.assertEqual([b.get("name") for b in bound], operations)
+        actions = [b.find(SOAP + "operation").get("soapAction") for b in bound]
+        self.assertEqual(actions, [f"urn:nox#{name}" for name in operations])
+
+    def test_every_operation_can_answer_with_a_fault(self):
+        for operation in self.schema.operations:
+            response = next(e for e in self.xsd.findall(XSD + "element") if e.get("name") == operation.name + "Response")
+            last = list(response.iter(XSD + "element"))[-1]
+            self.assertEqual((last.get("name"), last.get("type"), last.get("minOccurs")),
+                             ("fault", "nox:MethodFault", "0"))
+
+    def test_the_page_describes_every_type_and_its_links_lead_somewhere(self):
+        page = "\n".join(emit_page.page(self.schema))
+        headings = {line[4:].lower() for line in page.splitlines() if line.startswith("### ")}
+        self.assertEqual(headings, {n.lower() for n in self.schema.types} | {o.name.lower() for o in self.schema.operations})
+        for link in re.findall(r"\]\(#([^)]*)\)", page):
+            self.assertIn(link, headings)
+
+
+if __name__ == "__main__":
+    unittest.main()

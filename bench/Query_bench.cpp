@@ -97,8 +97,12 @@ void WriteAnswer(benchmark::State& state) {
   CountDisks(state);
 }
 
-void QueryAllFloor(benchmark::State& state) { WriteAnswer(state); }
-void QueryByNameFloor(benchmark::State& state) { WriteAnswer(state); }
+void QueryAllFloor(benchmark::State& state) {
+  WriteAnswer(state);
+}
+void QueryByNameFloor(benchmark::State& state) {
+  WriteAnswer(state);
+}
 
 BENCHMARK(QueryAll)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096);
 BENCHMARK(QueryAllFloor)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096);

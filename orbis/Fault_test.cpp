@@ -2,7 +2,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <atomic>
+#include <latch>
 #include <set>
 #include <thread>
 #include <vector>
@@ -75,14 +75,12 @@ TEST(FaultMessage, IsOneListHoweverManyThreadsAskFirst) {
   constexpr int rounds = 200;
   for (int round = 0; round < rounds; ++round) {
     const Ref<Fault::SystemError> fault = ASystemError("r");
-    std::atomic<int> ready{0};
+    std::latch start(threadCount);
     std::vector<const void*> seen(threadCount);
     std::vector<std::thread> threads;
     for (int i = 0; i < threadCount; ++i) {
       threads.emplace_back([&, i] {
-        ++ready;
-        while (ready != threadCount) {
-        }  // all at once
+        start.arrive_and_wait();  // all at once
         seen[static_cast<std::size_t>(i)] = fault->GetFaultMessage().Get();
       });
     }

@@ -15,14 +15,22 @@ struct Limits {
 
   // For texts that anyone may have sent.
   static constexpr Limits Untrusted() {
-    return {.documentBytes = 16u << 20, .depth = 64, .elements = 500'000, .attributes = 32,
-            .nameBytes = 256, .textBytes = 1u << 20};
+    return {.documentBytes = 16u << 20,
+            .depth = 64,
+            .elements = 500'000,
+            .attributes = 32,
+            .nameBytes = 256,
+            .textBytes = 1u << 20};
   }
 
   // For texts that our own program wrote. Roomy, but still bounds: a mistake must not eat the host.
   static constexpr Limits OwnOutput() {
-    return {.documentBytes = 1u << 30, .depth = 512, .elements = 50'000'000, .attributes = 64,
-            .nameBytes = 1024, .textBytes = 64u << 20};
+    return {.documentBytes = 1u << 30,
+            .depth = 512,
+            .elements = 8'000'000,
+            .attributes = 64,
+            .nameBytes = 1024,
+            .textBytes = 64u << 20};
   }
 };
 

@@ -2,11 +2,11 @@
 #pragma once
 
 #include <string>
-#include <typeinfo>
 
 #include "tessa/Object.h"
 #include "tessa/Ref.h"
 #include "tessa/Throwable.h"
+#include "tessa/TypeName.h"
 
 namespace Tessa {
 class Session;
@@ -40,7 +40,7 @@ void TryLookupObject(const std::string& name, Ref<T>& object) {
   const Ref<Object> found = app == nullptr ? Ref<Object>() : app->LookupObject(name);
   T* const typed = dynamic_cast<T*>(found.Get());
   if (found && typed == nullptr) {
-    TypeMismatchException::Throw(typeid(T).name(), found->ToString());
+    TypeMismatchException::Throw(TypeName(typeid(T)), found->ToString());
   }
   object = Ref<T>(typed);
 }

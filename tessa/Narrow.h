@@ -1,10 +1,9 @@
 // Asking an object for the type it really has.
 #pragma once
 
-#include <typeinfo>
-
 #include "tessa/Ref.h"
 #include "tessa/Throwable.h"
+#include "tessa/TypeName.h"
 
 namespace Tessa {
 
@@ -13,7 +12,7 @@ template <class T, class U>
 Ref<T> NarrowToType(const Ref<U>& object) {
   T* const narrowed = dynamic_cast<T*>(object.Get());
   if (object && narrowed == nullptr) {
-    TypeMismatchException::Throw(typeid(T).name(), object->ToString());
+    TypeMismatchException::Throw(TypeName(typeid(T)), object->ToString());
   }
   return Ref<T>(narrowed);
 }

@@ -1,10 +1,6 @@
 #include "tessa/Object.h"
 
-#include <cxxabi.h>
-
-#include <cstdlib>
-#include <memory>
-#include <typeinfo>
+#include "tessa/TypeName.h"
 
 namespace Tessa {
 
@@ -27,12 +23,7 @@ void ObjectImpl::DecRef() const {
   }
 }
 
-std::string ObjectImpl::ToString() const {
-  int status = 0;
-  const std::unique_ptr<char, decltype(&std::free)> name(
-      abi::__cxa_demangle(typeid(*this).name(), nullptr, nullptr, &status), &std::free);
-  return status == 0 ? name.get() : typeid(*this).name();
-}
+std::string ObjectImpl::ToString() const { return TypeName(typeid(*this)); }
 
 int ObjectImpl::GetRefCount() const noexcept { return _refCount.load(std::memory_order_relaxed); }
 

@@ -47,7 +47,14 @@ class Ref {
   T* operator->() const noexcept { return _object; }
   T& operator*() const noexcept { return *_object; }
   explicit operator bool() const noexcept { return _object != nullptr; }
-  void Reset() noexcept { *this = Ref(); }
+
+  // Lets go of the object. Unlike a destructor it can pass on what a release throws; it is null even then.
+  void Reset() {
+    if (T* const object = std::exchange(_object, nullptr)) {
+      object->DecRef();
+    }
+  }
+
 
   friend bool operator==(const Ref& left, const Ref& right) noexcept { return left._object == right._object; }
   friend bool operator==(const Ref& left, const T* right) noexcept { return left._object == right; }

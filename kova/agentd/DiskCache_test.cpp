@@ -20,6 +20,8 @@ namespace Kovasvc {
 namespace {
 
 using HostCtl::Lib::HostCtlException;
+using Tessa::MakeRef;
+using Tessa::Ref;
 using Tessa::Service::LogLevel;
 using testing::ElementsAre;
 using testing::IsEmpty;
@@ -91,6 +93,23 @@ TEST_F(DiskCache, ForgetsDisksThatHaveGoneSinceTheLastRefresh) {
   EXPECT_EQ(CachedDisks(*manager), 1U);
 }
 
+// Shows the records as they are in memory; a query would refresh them first.
+class OpenManager final : public KovaManagerImpl {
+ public:
+  using KovaManagerImpl::GetDiskCache;
+  using KovaManagerImpl::KovaManagerImpl;
+};
+
+TEST_F(DiskCache, KeepsItsRecordsInMemoryWhenItIsInvalidated) {
+  _kernel.records = {ARecord("naa.1")};
+  Ref<Tessa::Service::Logger> logger = _logger;
+  const auto manager = MakeRef<OpenManager>(logger);
+  EXPECT_THAT(manager->GetDiskCache(), IsEmpty());
+  manager->RefreshKovaDiskCache();
+  manager->InvalidateKovaDiskCache();
+  EXPECT_THAT(manager->GetDiskCache(), ElementsAre(HostCtl::Kova::DiskResult(ARecord("naa.1"))));
+}
+
 struct FailingRefresh {
   const char* operation;
   FakeKernel::When when;
@@ -124,6 +143,20 @@ TEST_P(FailedRefresh, LeavesTheCacheEmpty) {
   EXPECT_EQ(CachedDisks(*manager), 0U);
 }
 
+TEST_P(FailedRefresh, LeavesNoRecordInMemoryWhateverWasThrown) {
+  _kernel.records = {ARecord("naa.1")};
+  Ref<Tessa::Service::Logger> logger = _logger;
+  const auto manager = MakeRef<OpenManager>(logger);
+  manager->RefreshKovaDiskCache();
+  manager->InvalidateKovaDiskCache();
+  _kernel.Fail(GetParam().operation, HostCtlException("the kernel is away"), GetParam().when);
+  manager->RefreshKovaDiskCache();
+  EXPECT_THAT(manager->GetDiskCache(), IsEmpty());
+  _kernel.Fail(GetParam().operation, std::runtime_error("not the kernel's"), GetParam().when);
+  EXPECT_THROW(manager->RefreshKovaDiskCache(), std::runtime_error);
+  EXPECT_THAT(manager->GetDiskCache(), IsEmpty());
+}
+
 TEST_P(FailedRefresh, IsTriedAgainByTheNextOne) {
   SetHost({AScsiDisk("naa.1")}, {ARecord("naa.1")});
   _kernel.Fail(GetParam().operation, HostCtlException("the kernel is away"), GetParam().when);
@@ -150,14 +183,14 @@ TEST_P(FailedRefresh, ByAnyOtherExceptionPassesWithTheLockReleasedAndNoLine) {
   EXPECT_THAT(_logger->Lines(), IsEmpty());
 }
 
-TEST_P(FailedRefresh, ByAnyOtherExceptionLeavesAnEmptyInvalidCacheToo) {
+TEST_P(FailedRefresh, ByAnyOtherExceptionLeavesAnInvalidCacheToo) {
   SetHost({AScsiDisk("naa.1")}, {ARecord("naa.1")});
   const auto manager = MakeManager();
   _kernel.Fail(GetParam().operation, std::runtime_error("not the kernel's"), GetParam().when);
   EXPECT_THROW(manager->RefreshKovaDiskCache(), std::runtime_error);
   _kernel.Heal(GetParam().operation);
   _kernel.ForgetCalls();
-  EXPECT_EQ(CachedDisks(*manager), 1U) << "a record of the failed reading would stand here twice";
+  EXPECT_EQ(CachedDisks(*manager), 1U);
   EXPECT_THAT(_kernel.CallTexts(), ElementsAre("RefreshKovaInfo()", "QueryDisks([], true)"));
 }
 

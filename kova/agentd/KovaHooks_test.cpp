@@ -1,5 +1,7 @@
 // What every hook does with its arguments, and with the exceptions that an operation lets out.
 
+#include "kova/agentd/KovaLibManager.h"
+
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 

@@ -6,6 +6,7 @@
 #include <cstdlib>
 #include <functional>
 #include <new>
+#include <stdexcept>
 #include <string>
 
 #include "kova/agentd/include/HostCtlException.h"
@@ -72,6 +73,32 @@ TEST_F(InitPlugin, SwallowsAFailureOfTheChildLogger) {
     EXPECT_FALSE(_kovaManagerImpl);
     EXPECT_THAT(_logger->Lines(), IsEmpty());
   }
+}
+
+// A logger that cannot be let go of once the manager is made.
+class ClingingLogger final : public Tessa::Service::Logger {
+ public:
+  LogLevel GetLevel() const noexcept override { return LogLevel::Verbose; }
+  void CreateChild(const std::string&, Ref<Logger>& child) override { child = Ref<Logger>(this); }
+  void Write(LogLevel, std::string_view format, std::span<const Tessa::Service::LogArgument>) override {
+    _clings = format == afterProvider;
+  }
+  void DecRef() const override {
+    Logger::DecRef();
+    if (_clings) {
+      _clings = false;
+      throw std::runtime_error("the release of a logger failed");
+    }
+  }
+
+ private:
+  mutable bool _clings = false;
+};
+
+TEST_F(InitPlugin, SwallowsAFailureToReleaseTheChildLogger) {
+  Tessa::Service::SetDefaultLogger(MakeRef<ClingingLogger>());
+  EXPECT_EQ(InitKovaPlugin(), 0);
+  EXPECT_TRUE(_kovaManagerImpl) << "the manager was made before the release";
 }
 
 TEST_F(InitPlugin, SwallowsAFailureOfTheProviderWithoutALine) {

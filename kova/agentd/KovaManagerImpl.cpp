@@ -18,8 +18,7 @@ using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
 using Tessa::System::LockGuard;
 
-KovaManagerImpl::KovaManagerImpl(Ref<Logger>& logger)
-    : LockableObjectImpl("KovaManager"), _logger(logger) {
+KovaManagerImpl::KovaManagerImpl(Ref<Logger>& logger) : LockableObjectImpl("KovaManager"), _logger(logger) {
   // Locals first: what a throw leaves behind goes down in reverse order of building.
   std::unique_ptr<HostCtl::Kova::KovaInfo> provider(OtxCtl::Kova::KovaPluginImpl().GetKovaInfo());
   Tessa::System::SystemFactory& factory = Tessa::System::GetSystemFactory();

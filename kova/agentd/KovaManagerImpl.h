@@ -73,8 +73,8 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   virtual void FormatDiskMapping(const std::string& ssdName, Texts& nonSsdNames,
                                  const std::string& requestTag, int mappingCount, int mappingIndex);
   virtual void RestampDiskMapping(const std::string& ssdName, Texts& capacityNames);
-  virtual void InitializeMapping(Tessa::Ref<Mapping> mapping, const std::string& requestTag,
-                                 int mappingCount, int mappingIndex, Tessa::Ref<MapResult>& result);
+  virtual void InitializeMapping(Tessa::Ref<Mapping> mapping, const std::string& requestTag, int mappingCount,
+                                 int mappingIndex, Tessa::Ref<MapResult>& result);
   virtual void UnmountDiskMappingInt(Tessa::Ref<Mapping>& mapping, const std::string& requestTag,
                                      Tessa::Ref<Orbis::MethodFault>& fault);
 
@@ -93,6 +93,8 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
 
  protected:
   const Tessa::Ref<Tessa::Service::Logger>& GetLogger() const noexcept { return _logger; }
+  // The records as they are in memory, valid or not. The caller sees to it that nobody refreshes them.
+  const std::vector<HostCtl::Kova::DiskResult>& GetDiskCache() const noexcept { return _diskCache; }
 
  private:
   // In reverse, the order in which a manager goes down: the provider first.

@@ -18,6 +18,7 @@ struct RecordingLockFactory::State {
   std::vector<std::string> mistakes;
   std::string failingName;
   std::function<void()> failure;
+  std::function<void(const std::string&)> onRelease;
 
   std::vector<std::string> Held() const {
     const std::lock_guard guard(mutex);
@@ -67,12 +68,17 @@ class RecordingLock final : public Tessa::System::Lock {
       _state->AddMistake(_name + " released by a thread that does not hold it");
       return;
     }
+    std::function<void(const std::string&)> observer;
     {
       const std::lock_guard guard(_state->mutex);
       std::erase(_state->held[std::this_thread::get_id()], _name);
+      observer = _state->onRelease;
     }
     _state->timeline.Note("release " + _name);
     _mutex.unlock();
+    if (observer) {
+      observer(_name);
+    }
   }
 
   bool IsHeld() const noexcept override { return Contains(_state->Held(), _name); }
@@ -104,6 +110,11 @@ void RecordingLockFactory::SetFailure(std::string name, std::function<void()> fa
   const std::lock_guard guard(_state->mutex);
   _state->failingName = std::move(name);
   _state->failure = std::move(failure);
+}
+
+void RecordingLockFactory::SetReleaseObserver(std::function<void(const std::string& name)> observer) {
+  const std::lock_guard guard(_state->mutex);
+  _state->onRelease = std::move(observer);
 }
 
 std::vector<std::string> RecordingLockFactory::HeldHere() const {

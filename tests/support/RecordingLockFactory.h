@@ -30,6 +30,10 @@ class RecordingLockFactory final : public Tessa::System::SystemFactory {
   // Making the lock of that name calls this, which should throw.
   void SetFailure(std::string name, std::function<void()> failure);
 
+  // Called with the lock's name when it has just been released, on the thread that did. For what another
+  // thread could do at that very moment. It may take locks, and replace itself.
+  void SetReleaseObserver(std::function<void(const std::string& name)> observer);
+
   // What the calling thread holds now, in the order of taking.
   std::vector<std::string> HeldHere() const;
 

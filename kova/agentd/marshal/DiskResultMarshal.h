@@ -36,8 +36,8 @@ void CleanUnusedDiskFileds(Nox::Host::ScsiDisk& disk);
 // `result` is left as it was when the disk is not in the inventory, or absent without a UUID.
 // `queryMode`: a flash disk tagged for the capacity tier keeps its `ssd`; for planning it is no cache disk.
 void MarshalHostCtlDiskResult(Tessa::Service::Logger& logger, const HostCtl::Kova::DiskResult& record,
-                              const DiskInventory& inventory,
-                              Tessa::Ref<Nox::Kova::Host::DiskResult>& result, bool queryMode);
+                              const DiskInventory& inventory, Tessa::Ref<Nox::Kova::Host::DiskResult>& result,
+                              bool queryMode);
 
 // All records, in order, against the inventory of this moment; those without a disk are left out. Throws
 // Orbis::Fault::SystemError::Exception when there is no inventory; `results` is then as it was.

@@ -24,8 +24,8 @@ Ref<MethodFault> NotBuilt(const char* operation) {
 
 // For operations that others call and that have no text to answer in.
 [[noreturn]] void ThrowNotBuilt(const char* operation) {
-  throw SystemError::Exception(MakeRef<SystemError>("The operation " + std::string(operation) +
-                                                    " is not built yet."));
+  throw SystemError::Exception(
+      MakeRef<SystemError>("The operation " + std::string(operation) + " is not built yet."));
 }
 
 }  // namespace
@@ -99,13 +99,17 @@ void KovaManagerImpl::ValidateDiskMappings(Orbis::DataArray<Mapping>*) {
   ThrowNotBuilt("ValidateDiskMappings");
 }
 
-bool KovaManagerImpl::DiskMappingExists(Ref<Mapping>) { ThrowNotBuilt("DiskMappingExists"); }
+bool KovaManagerImpl::DiskMappingExists(Ref<Mapping>) {
+  ThrowNotBuilt("DiskMappingExists");
+}
 
 void KovaManagerImpl::FormatDiskMapping(const std::string&, Texts&, const std::string&, int, int) {
   ThrowNotBuilt("FormatDiskMapping");
 }
 
-void KovaManagerImpl::RestampDiskMapping(const std::string&, Texts&) { ThrowNotBuilt("RestampDiskMapping"); }
+void KovaManagerImpl::RestampDiskMapping(const std::string&, Texts&) {
+  ThrowNotBuilt("RestampDiskMapping");
+}
 
 void KovaManagerImpl::InitializeMapping(Ref<Mapping>, const std::string&, int, int, Ref<MapResult>&) {
   ThrowNotBuilt("InitializeMapping");

@@ -206,6 +206,17 @@ TEST_F(Query, ReleasesItsLockWhenAnotherExceptionLeavesTheKernel) {
   EXPECT_EQ(_result, "");
 }
 
+TEST_F(Query, FiltersTheCacheBeforeItReleasesTheLock) {
+  SetHost({AScsiDisk("naa.1")}, {ARecord("naa.1")});
+  _locks.SetReleaseObserver([this](const std::string&) {
+    _locks.SetReleaseObserver({});
+    _kernel.records.clear();
+    _manager->InvalidateKovaDiskCache();
+    _manager->RefreshKovaDiskCache();
+  });
+  EXPECT_THAT(AskForNames({}), ElementsAre("naa.1"));
+}
+
 TEST_F(Query, WorksOnItsOwnCopyWhileTheCacheChanges) {
   SetHost({AScsiDisk("naa.1")}, {ARecord("naa.1")});
   _storage->SetObserver([this] {

@@ -26,8 +26,12 @@ namespace {
 SessionImpl::SessionImpl() : LockableObjectImpl("KovaSession") {}
 SessionImpl::~SessionImpl() = default;
 
-KovaUtil::KovaUtil(Ref<Tessa::Service::Logger>& logger) { _logger = logger; }
-KovaUtil::~KovaUtil() { _logger.Reset(); }
+KovaUtil::KovaUtil(Ref<Tessa::Service::Logger>& logger) {
+  _logger = logger;
+}
+KovaUtil::~KovaUtil() {
+  _logger.Reset();
+}
 
 void KovaUtil::GetSession(Ref<Tessa::Session>& session) {
   if (!_session) {

@@ -9,8 +9,15 @@ for target in "$build"/fuzz/fuzz_*; do
   name=$(basename "$target")
   corpus=$build/fuzz/corpus/$name
   mkdir -p "$corpus"
-  echo "fuzzing $name for $2 s"
+  log=$build/fuzz/$name.log
   # The seed is fixed, so that CI finds today what it found yesterday; the corpus grows between local runs.
-  (cd "$build/fuzz" && "$target" -seed=1 -max_total_time="$2" -rss_limit_mb=4096 -timeout=20 -max_len=65536 \
-    -print_final_stats=0 -verbosity=0 "$corpus" "$here/seeds/$name")
+  if (cd "$build/fuzz" && "$target" -seed=1 -max_total_time="$2" -rss_limit_mb=4096 -timeout=20 -max_len=65536 \
+    -print_final_stats=1 "$corpus" "$here/seeds/$name") >"$log" 2>&1; then
+    runs=$(sed -n 's/^stat::number_of_executed_units: *//p' "$log")
+    echo "$name: $runs inputs in $2 s, nothing found"
+  else
+    tail -n 40 "$log" >&2
+    echo "$name: a finding; the input is in $build/fuzz, the log in $log" >&2
+    exit 1
+  fi
 done

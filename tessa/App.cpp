@@ -8,7 +8,11 @@ std::atomic<App*> installedApp{nullptr};
 }
 
 App::~App() = default;
-App* GetApp() noexcept { return installedApp.load(); }
-App* SetApp(App* app) noexcept { return installedApp.exchange(app); }
+App* GetApp() noexcept {
+  return installedApp.load();
+}
+App* SetApp(App* app) noexcept {
+  return installedApp.exchange(app);
+}
 
 }  // namespace Tessa::Service

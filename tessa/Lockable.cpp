@@ -55,8 +55,14 @@ LockableObjectImpl::LockableObjectImpl(std::string_view lockName)
     : _lock(GetSystemFactory().CreateLock(lockName)) {}
 LockableObjectImpl::~LockableObjectImpl() = default;
 
-void LockableObjectImpl::Lock() { _lock->Acquire(); }
-void LockableObjectImpl::Unlock() { _lock->Release(); }
-bool LockableObjectImpl::IsLocked() const noexcept { return _lock->IsHeld(); }
+void LockableObjectImpl::Lock() {
+  _lock->Acquire();
+}
+void LockableObjectImpl::Unlock() {
+  _lock->Release();
+}
+bool LockableObjectImpl::IsLocked() const noexcept {
+  return _lock->IsHeld();
+}
 
 }  // namespace Tessa::System

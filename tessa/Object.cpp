@@ -7,7 +7,9 @@ namespace Tessa {
 Object::~Object() = default;
 
 ObjectImpl::ObjectImpl(const ObjectImpl& other) : Object(other) {}
-ObjectImpl& ObjectImpl::operator=(const ObjectImpl&) { return *this; }
+ObjectImpl& ObjectImpl::operator=(const ObjectImpl&) {
+  return *this;
+}
 ObjectImpl::~ObjectImpl() = default;
 
 void ObjectImpl::IncRef() const {
@@ -23,11 +25,17 @@ void ObjectImpl::DecRef() const {
   }
 }
 
-std::string ObjectImpl::ToString() const { return TypeName(typeid(*this)); }
+std::string ObjectImpl::ToString() const {
+  return TypeName(typeid(*this));
+}
 
-int ObjectImpl::GetRefCount() const noexcept { return _refCount.load(std::memory_order_relaxed); }
+int ObjectImpl::GetRefCount() const noexcept {
+  return _refCount.load(std::memory_order_relaxed);
+}
 
 void ObjectImpl::FirstIncRef() const {}
-void ObjectImpl::FinalDecRef() const { delete this; }
+void ObjectImpl::FinalDecRef() const {
+  delete this;
+}
 
 }  // namespace Tessa

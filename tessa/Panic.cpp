@@ -30,7 +30,9 @@ std::atomic<PanicHandler> panicHandler{nullptr};
 
 }  // namespace
 
-PanicHandler SetPanicHandler(PanicHandler handler) noexcept { return panicHandler.exchange(handler); }
+PanicHandler SetPanicHandler(PanicHandler handler) noexcept {
+  return panicHandler.exchange(handler);
+}
 
 void PanicVerify(const char* condition, const char* path, int line) {
   char text[longestText];
@@ -38,8 +40,12 @@ void PanicVerify(const char* condition, const char* path, int line) {
   End(text);
 }
 
-void PanicExit(const std::exception& cause) { End(cause.what()); }
-void PanicExit(const char* text) { End(text); }
+void PanicExit(const std::exception& cause) {
+  End(cause.what());
+}
+void PanicExit(const char* text) {
+  End(text);
+}
 
 void Panic(const char* format, ...) {
   char text[longestText];

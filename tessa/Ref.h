@@ -20,13 +20,9 @@ class Ref {
   Ref(Ref&& other) noexcept : _object(std::exchange(other._object, nullptr)) {}
 
   template <class U>
-    requires std::is_convertible_v<U*, T*>
-  Ref(const Ref<U>& other) : _object(other.Get()) {
-    Take();
-  }
+  requires std::is_convertible_v<U*, T*> Ref(const Ref<U>& other) : _object(other.Get()) { Take(); }
   template <class U>
-    requires std::is_convertible_v<U*, T*>
-  Ref(Ref<U>&& other) : _object(other.Get()) {
+  requires std::is_convertible_v<U*, T*> Ref(Ref<U>&& other) : _object(other.Get()) {
     Take();
     other.Reset();
   }
@@ -54,7 +50,6 @@ class Ref {
       object->DecRef();
     }
   }
-
 
   friend bool operator==(const Ref& left, const Ref& right) noexcept { return left._object == right._object; }
   friend bool operator==(const Ref& left, const T* right) noexcept { return left._object == right; }

@@ -111,7 +111,9 @@ void SessionMixin::SetObject(const std::string& name, Ref<Object> object) {
   replaced = std::exchange(_objects[name], std::move(object));
 }
 
-std::string SessionMixin::GetBindingInfo() const { return {}; }
+std::string SessionMixin::GetBindingInfo() const {
+  return {};
+}
 
 std::string SessionMixin::GetUserBinding() const {
   const std::lock_guard guard(_mutex);
@@ -128,7 +130,9 @@ bool SessionMixin::IsAuthenticated() const {
   return !_user.empty();
 }
 
-Session::UtcTime SessionMixin::LastLoginTimeUtc() const { return _loginTime; }
+Session::UtcTime SessionMixin::LastLoginTimeUtc() const {
+  return _loginTime;
+}
 
 Session::MonotonicTime SessionMixin::LastActiveTime() const {
   const std::lock_guard guard(_mutex);
@@ -147,9 +151,15 @@ void SessionMixin::UpdateLastActive() {
   ++_updates;
 }
 
-std::optional<Session::UtcTime> SessionMixin::GetExpirationDate() const { return _lifetime.until; }
-std::optional<std::chrono::seconds> SessionMixin::GetConfiguredIdleTimeout() const { return _lifetime.idle; }
-std::string SessionMixin::GetId() const { return _id; }
+std::optional<Session::UtcTime> SessionMixin::GetExpirationDate() const {
+  return _lifetime.until;
+}
+std::optional<std::chrono::seconds> SessionMixin::GetConfiguredIdleTimeout() const {
+  return _lifetime.idle;
+}
+std::string SessionMixin::GetId() const {
+  return _id;
+}
 
 std::string SessionMixin::GetLocale() const {
   const std::lock_guard guard(_mutex);
@@ -168,6 +178,8 @@ Session::Stats SessionMixin::GetStats() const {
           .updates = _updates};
 }
 
-std::string SessionMixin::GetSessionNonce() const { return _nonce; }
+std::string SessionMixin::GetSessionNonce() const {
+  return _nonce;
+}
 
 }  // namespace Tessa

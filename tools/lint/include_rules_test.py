@@ -35,6 +35,11 @@ class IncludeRules(unittest.TestCase):
         self.assertEqual(len(reasons("kovactl/main.cpp", "#include <boost/asio.hpp>")), 1)
         self.assertEqual(len(reasons("kova/agentd/KovaLibManager.cpp", "#include <unistd.h>")), 1)
 
+    def test_tests_may_use_anything(self):
+        self.assertEqual(reasons("tessa/Ref_test.cpp", '#include "tests/support/Builders.h"'), [])
+        self.assertEqual(reasons("host/testing/Process.h", "#include <gtest/gtest.h>"), [])
+        self.assertEqual(len(reasons("host/Gate.h", "#include <gtest/gtest.h>")), 1)
+
     def test_the_line_is_named(self):
         self.assertEqual([n for n, _ in faults_of("tessa/Ref.h", '#pragma once\n#include "nox/Fwd.h"\n')], [2])
 

@@ -31,6 +31,7 @@ std::shared_ptr<OtxCtl::Fault::CallRecorder> TraceTo(const std::string& path) {
       file->stream << OtxCtl::Fault::ToJsonLine(call) << "\n";
     }
     file->stream.flush();
+    file->stream.clear();  // a full disk may have room again
   });
   return recorder;
 }

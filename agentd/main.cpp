@@ -1,14 +1,17 @@
 // The host agent: loads the plug-in, gives it a host, and answers for it over a socket.
 
+#include <unistd.h>
+
 #include <CLI/CLI.hpp>
+#include <csignal>
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
 #include <iostream>
 
+#include "agentd/Trace.h"
 #include "agentd/http/HttpServer.h"
 #include "agentd/routes/Routes.h"
-#include "agentd/Trace.h"
 #include "host/HostRuntime.h"
 #include "host/KovaService.h"
 #include "host/LogSink.h"
@@ -18,6 +21,7 @@ namespace {
 
 constexpr const char* defaultSocket = "unix:/run/kova/agentd.sock";
 constexpr std::string_view unixScheme = "unix:";
+constexpr int unfinishedStatus = 1;  // stopped while requests were still handled
 
 struct Options {
   Host::RuntimeOptions runtime;
@@ -35,7 +39,8 @@ void AddOptions(CLI::App& cli, Options& options) {
   cli.add_option("--ready-file", options.readyFile, "File to write the address to, once it is answered on");
   cli.add_option("--log-level", options.logLevel, "none, error, warning, info, verbose, trivia")
       ->capture_default_str();
-  cli.add_option("--trace", options.traceFile, "File to append one JSON line per call of the kernel provider to");
+  cli.add_option("--trace", options.traceFile,
+                 "File to append one JSON line per call of the kernel provider to");
   cli.add_option("--plugin", options.runtime.pluginFile, "The plug-in, if it is not beside the program");
 }
 
@@ -84,7 +89,12 @@ void Serve(Options& options) {
   using Tessa::Service::LogInternal;
   using Tessa::Service::LogLevel;
   LogInternal(logger, LogLevel::Info, "Answering on %1", options.listen);
-  server.Run();
+  if (!server.Run()) {
+    // A handler hangs, and may never come back: nothing that it could still use is taken down.
+    LogInternal(logger, LogLevel::Warning, "Stopped with requests unfinished");
+    Host::FlushLogs();
+    _exit(unfinishedStatus);
+  }
   LogInternal(logger, LogLevel::Info, "Stopped");
 }
 
@@ -99,6 +109,7 @@ int main(int argc, char** argv) {
   } catch (const CLI::ParseError& error) {
     return cli.exit(error) == 0 ? 0 : 2;
   }
+  std::signal(SIGPIPE, SIG_IGN);  // whoever read the log may go; the agent stays
   try {
     Serve(options);
     return 0;

@@ -22,7 +22,8 @@ Ref<Orbis::MethodFault> AsFault(const Ref<Orbis::Any>& value) {
 Ref<Orbis::Any> ReadMember(const Value& object, const char* name, const Orbis::TypeDescriptor* type) {
   const Value* const member = object.Find(name);
   if (member == nullptr) {
-    throw Orbis::ParseException("(root)", object.line, "required member '" + std::string(name) + "' is missing");
+    throw Orbis::ParseException("(root)", object.line,
+                                "required member '" + std::string(name) + "' is missing");
   }
   return member->kind == Kind::Null ? nullptr : Orbis::ReadJson(*member, type, name);
 }
@@ -54,7 +55,8 @@ Answer ReadAnswer(const std::string& faultText, const std::string& resultText) {
 Answer ReadJsonAnswer(std::string_view text, const Orbis::TypeDescriptor* resultType) {
   const Value root = Orbis::Json::Parse(text, Orbis::Limits::OwnOutput());
   if (root.kind != Kind::Object) {
-    throw Orbis::ParseException("(root)", root.line, "wanted an object, found " + Orbis::Json::Describe(root));
+    throw Orbis::ParseException("(root)", root.line,
+                                "wanted an object, found " + Orbis::Json::Describe(root));
   }
   return {.result = ReadMember(root, "result", resultType),
           .fault = AsFault(ReadMember(root, "fault", &Orbis::MethodFault::StaticType()))};

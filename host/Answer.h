@@ -10,8 +10,8 @@
 namespace Host {
 
 struct Answer {
-  Tessa::Ref<Orbis::Any> result;           // null: none
-  Tessa::Ref<Orbis::MethodFault> fault;    // null: none
+  Tessa::Ref<Orbis::Any> result;         // null: none
+  Tessa::Ref<Orbis::MethodFault> fault;  // null: none
 };
 
 // Reads what a hook appended to the texts it was given; an empty text is nothing. Throws

@@ -1,0 +1,118 @@
+#include "host/Answer.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "nox/Kova.h"
+#include "orbis/Engine.h"
+#include "orbis/ParseException.h"
+#include "orbis/Soap.h"
+
+namespace Host {
+namespace {
+
+using Nox::Kova::Host::DiskResult;
+using Orbis::DataArray;
+using Orbis::Fault::SystemError;
+using Tessa::MakeRef;
+using Tessa::Ref;
+
+std::string Soap(const Orbis::Any& value) {
+  std::string text;
+  Orbis::SerializeObjectToSoap(value, nullptr, text);
+  return text;
+}
+
+Ref<DataArray<DiskResult>> OneDisk() {
+  const auto disk = MakeRef<DiskResult>();
+  disk->GetDisk()->SetCanonicalName("naa.1");
+  disk->SetState(DiskResult::STATE_ELIGIBLE);
+  const auto disks = MakeRef<DataArray<DiskResult>>();
+  disks->Append(disk);
+  return disks;
+}
+
+const Orbis::TypeDescriptor* DisksType() {
+  return &DataArray<DiskResult>::StaticType();
+}
+
+std::string Json(const Answer& answer) {
+  std::string text;
+  WriteJsonAnswer(answer, text);
+  return text;
+}
+
+TEST(Answer, OfTwoEmptyTextsIsNothing) {
+  const Answer answer = ReadAnswer("", "");
+  EXPECT_FALSE(answer.result);
+  EXPECT_FALSE(answer.fault);
+}
+
+TEST(Answer, ReadsWhatAHookAppended) {
+  const auto disks = OneDisk();
+  const Answer answer = ReadAnswer(Soap(SystemError("no luck")), Soap(*disks));
+  EXPECT_TRUE(Orbis::Equal(answer.result.Get(), disks.Get()));
+  EXPECT_EQ(dynamic_cast<const SystemError&>(*answer.fault).GetReason(), "no luck");
+}
+
+TEST(Answer, ReadsAFaultAlone) {
+  const Answer answer = ReadAnswer(Soap(SystemError("no luck")), "");
+  EXPECT_FALSE(answer.result);
+  EXPECT_TRUE(answer.fault);
+}
+
+TEST(Answer, RefusesAFaultThatIsNone) {
+  EXPECT_THROW(ReadAnswer(Soap(DiskResult()), ""), Orbis::ParseException);
+}
+
+TEST(Answer, RefusesTextsThatHoldNoObject) {
+  EXPECT_THROW(ReadAnswer("", "rubbish"), Orbis::ParseException);
+  EXPECT_THROW(ReadAnswer("<object", ""), Orbis::ParseException);
+}
+
+TEST(Answer, IsTheSameAfterAJourneyAsJson) {
+  const auto disks = OneDisk();
+  const Answer sent{.result = disks, .fault = MakeRef<SystemError>("half of it \"failed\"")};
+  const Answer received = ReadJsonAnswer(Json(sent), DisksType());
+  EXPECT_TRUE(Orbis::Equal(received.result.Get(), sent.result.Get()));
+  EXPECT_TRUE(Orbis::Equal(received.fault.Get(), sent.fault.Get()));
+}
+
+TEST(Answer, KeepsAnEmptyListApartFromNoResult) {
+  const Answer sent{.result = MakeRef<DataArray<DiskResult>>(), .fault = nullptr};
+  EXPECT_EQ(Json(sent), R"({"result":[],"fault":null})");
+  EXPECT_TRUE(ReadJsonAnswer(Json(sent), DisksType()).result);
+  EXPECT_EQ(Json(Answer{}), R"({"result":null,"fault":null})");
+  EXPECT_FALSE(ReadJsonAnswer(Json(Answer{}), DisksType()).result);
+}
+
+TEST(Answer, IsWrittenBehindWhatStandsThere) {
+  std::string text = "before ";
+  WriteJsonAnswer(Answer{}, text);
+  EXPECT_EQ(text, R"(before {"result":null,"fault":null})");
+}
+
+class BrokenJsonAnswer : public testing::TestWithParam<const char*> {};
+
+TEST_P(BrokenJsonAnswer, IsRefused) {
+  EXPECT_THROW(ReadJsonAnswer(GetParam(), DisksType()), Orbis::ParseException);
+}
+
+INSTANTIATE_TEST_SUITE_P(Texts, BrokenJsonAnswer,
+                         testing::Values("", "rubbish", "[]", "null", "{}", R"({"result":[]})",
+                                         R"({"fault":null})", R"({"result":{},"fault":null})",
+                                         R"({"result":[{}],"fault":null})",
+                                         R"({"result":[null],"fault":null})",
+                                         R"({"result":null,"fault":"no"})",
+                                         R"({"result":null,"fault":{"@type":"KovaHostDiskResult"}})",
+                                         R"({"result":null,"fault":{"@type":"NoSuchFault"}})",
+                                         R"({"result":null,"fault":null} rest)"));
+
+TEST(Answer, ThatFailedIsASystemErrorWithTheReason) {
+  const Answer answer = FailedWith("the cable is out");
+  EXPECT_FALSE(answer.result);
+  EXPECT_EQ(dynamic_cast<const SystemError&>(*answer.fault).GetReason(), "the cable is out");
+}
+
+}  // namespace
+}  // namespace Host

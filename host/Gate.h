@@ -13,7 +13,7 @@
 
 namespace Host::Gate {
 
-inline constexpr std::size_t longestName = 1024;    // bytes
+inline constexpr std::size_t longestName = 1024;  // bytes
 inline constexpr std::size_t mostNames = 100'000;
 
 // Null when the names may pass: not empty, not too long, UTF-8 without control characters, not too many.

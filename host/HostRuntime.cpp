@@ -38,16 +38,28 @@ HostRuntime& HostRuntime::Start(const RuntimeOptions& options) {
 HostRuntime::HostRuntime(const RuntimeOptions& options) : _inventory(Tessa::MakeRef<Inventory>()) {
   _hooks = OpenPlugin(options.pluginFile.empty() ? FindPlugin() : options.pluginFile);
   LoadHost(options);
+  Install(options);
+  if (_hooks.init() != 1) {
+    Uninstall();
+    throw HostError("the plug-in could not be initialised");
+  }
+}
+
+void HostRuntime::Install(const RuntimeOptions& options) {
   PublishInventory();
   _host->SetListener([this] { PublishInventory(); });
-
   Tessa::Service::SetApp(&_app);
   Tessa::Authorize::AuthorizeManager::SetInstance(Tessa::MakeRef<LocalAuthorization>());
   OtxCtl::Kova::SetProviderFactory(
       [host = _host, recorder = options.recorder] { return MakeProvider(host, recorder); });
-  if (_hooks.init() != 1) {
-    throw HostError("the plug-in could not be initialised");
-  }
+}
+
+void HostRuntime::Uninstall() noexcept {
+  OtxCtl::Kova::SetProviderFactory({});
+  Tessa::Authorize::AuthorizeManager::SetInstance(nullptr);
+  Tessa::Service::SetApp(nullptr);
+  _host->SetListener({});
+  _host->SetSaver({});
 }
 
 void HostRuntime::LoadHost(const RuntimeOptions& options) {

@@ -31,7 +31,8 @@ struct RuntimeOptions {
 // It lives until the process ends: the plug-in keeps its provider that long.
 class HostRuntime {
  public:
-  // Throws HostError, HostFileError or HostDescriptionError.
+  // Throws HostError, HostFileError or HostDescriptionError; the process is then as it was, and another
+  // start may be tried. Later calls return the first one's runtime.
   static HostRuntime& Start(const RuntimeOptions& options);
 
   const PluginHooks& Hooks() const noexcept { return _hooks; }
@@ -41,6 +42,9 @@ class HostRuntime {
   explicit HostRuntime(const RuntimeOptions& options);
 
   void LoadHost(const RuntimeOptions& options);
+  // Makes this the world that the plug-in finds, and takes it away again.
+  void Install(const RuntimeOptions& options);
+  void Uninstall() noexcept;
   // Brings registry and inventory in line with the host as it is now.
   void PublishInventory();
 

@@ -1,0 +1,256 @@
+// The runtime round the real plug-in. There is one runtime in a process, so every test has a process of its
+// own.
+
+#include "host/HostRuntime.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <cstdio>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <nlohmann/json.hpp>
+
+#include "host/HostError.h"
+#include "host/KovaService.h"
+#include "host/LogSink.h"
+#include "host/testing/OwnProcess.h"
+#include "nox/Kova.h"
+#include "nox/StorageSystem.h"
+#include "otxctl/fault/CallRecorder.h"
+#include "otxctl/sim/HostBuilder.h"
+#include "tessa/Panic.h"
+
+namespace Host {
+namespace {
+
+using Nox::Kova::Host::DiskResult;
+using OtxCtl::Sim::AHost;
+using OtxCtl::Sim::HostBuilder;
+using OtxCtl::Sim::HostDescription;
+using Tessa::Ref;
+using testing::ElementsAre;
+using testing::HasSubstr;
+
+constexpr int panicStatus = 70;
+
+[[noreturn]] void EndOverPanic(const char* text) {
+  std::fprintf(stderr, "panic: %s\n", text);
+  _exit(panicStatus);
+}
+
+// A program's own start, then the body, in a process that nobody shares.
+void InOwnProcess(const std::function<void()>& body, int status = 0,
+                  const std::string& onStandardError = "") {
+  Testing::InOwnProcess(
+      [&body] {
+        Tessa::Service::SetDefaultLogger(MakeConsoleLogger(Tessa::Service::LogLevel::Warning));
+        Tessa::SetPanicHandler(&EndOverPanic);
+        body();
+      },
+      status, onStandardError);
+}
+
+// A host in a file that goes with the test.
+class HostRuntimeTest : public testing::Test {
+ protected:
+  ~HostRuntimeTest() override {
+    for (const char* ending : {"", ".lock"}) {
+      std::remove((_file + ending).c_str());
+    }
+  }
+
+  RuntimeOptions On(const HostBuilder& host) const {
+    std::ofstream(_file) << WriteHostDescription(host.Build());
+    RuntimeOptions options;
+    options.hostFile = _file;
+    options.pluginFile = KOVA_PLUGIN;
+    return options;
+  }
+
+  static RuntimeOptions OnExampleHost() {
+    RuntimeOptions options;
+    options.pluginFile = KOVA_PLUGIN;
+    return options;
+  }
+
+  const std::string _file = testing::TempDir() + "host-runtime-" + std::to_string(getpid()) + ".json";
+};
+
+// "NAME STATE" of each disk of an answer.
+std::vector<std::string> DisksOf(const Answer& answer) {
+  std::vector<std::string> disks;
+  const auto* const results = dynamic_cast<const Orbis::DataArray<DiskResult>*>(answer.result.Get());
+  if (results == nullptr) {
+    return {"no result"};
+  }
+  for (const DiskResult* disk : *results) {
+    disks.push_back(disk->GetDisk()->GetCanonicalName() + " " + disk->GetState());
+  }
+  return disks;
+}
+
+std::vector<std::string> Disks(const HostRuntime& runtime) {
+  return DisksOf(KovaService(runtime.Hooks()).QueryDisksForKova({}));
+}
+
+template <class Error>
+std::string WhyNotStarted(const RuntimeOptions& options) {
+  try {
+    HostRuntime::Start(options);
+    return "it was started";
+  } catch (const Error& refused) {
+    return refused.what();
+  }
+}
+
+TEST_F(HostRuntimeTest, ServesTheExampleHostWhenNoneIsNamed) {
+  InOwnProcess([] {
+    const auto disks = Disks(HostRuntime::Start(OnExampleHost()));
+    EXPECT_EQ(disks.size(), 12u);
+    EXPECT_EQ(disks.front(), "naa.5000c50000000100 eligible");
+  });
+}
+
+TEST_F(HostRuntimeTest, ServesTheHostOfAFile) {
+  const auto options = On(AHost().WithSsd("naa.1").WithDisk(
+      "naa.2", false, [](OtxCtl::Sim::HostDisk& disk) { disk.partitions = 1; }));
+  InOwnProcess([&options] {
+    EXPECT_THAT(Disks(HostRuntime::Start(options)), ElementsAre("naa.1 eligible", "naa.2 ineligible"));
+  });
+}
+
+TEST_F(HostRuntimeTest, IsTheSameWhoeverStartsItLater) {
+  InOwnProcess([] {
+    HostRuntime& first = HostRuntime::Start(OnExampleHost());
+    EXPECT_EQ(&HostRuntime::Start(RuntimeOptions()), &first);
+  });
+}
+
+TEST_F(HostRuntimeTest, RegistersTheInventoryAndKeepsItInLineWithTheHost) {
+  const auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const auto count = [] {
+      Ref<Nox::Host::StorageSystem> storageSystem;
+      Tessa::Service::TryLookupObject("storageSystem", storageSystem);
+      Ref<Nox::Host::StorageDeviceInfo> info;
+      storageSystem->GetStorageDeviceInfo(info);
+      return info->GetScsiLun()->Size();
+    };
+    EXPECT_EQ(count(), 2u);
+    runtime.SimulatedHost().Change([](HostDescription& host) { host.disks[1].absent = true; });
+    EXPECT_EQ(count(), 1u);
+  });
+}
+
+TEST_F(HostRuntimeTest, WithoutAStorageSystemAQueryIsASystemError) {
+  const auto options = On(AHost().WithSsd("naa.1").Edit(
+      [](HostDescription& host) { host.storageSystem = OtxCtl::Sim::StorageSystem::Missing; }));
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const Answer answer = KovaService(runtime.Hooks()).QueryDisksForKova({});
+    EXPECT_FALSE(answer.result);
+    EXPECT_NE(dynamic_cast<const Orbis::Fault::SystemError*>(answer.fault.Get()), nullptr);
+
+    // The object comes, and with it the answer.
+    runtime.SimulatedHost().Change(nlohmann::json{{"storageSystem", "present"}}, nullptr);
+    EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible"));
+  });
+}
+
+HostBuilder AHostWhoseQueryThrows(const std::string& exception, int call) {
+  return AHost().WithSsd("naa.1").Edit([&](HostDescription& host) {
+    host.faults = {
+        {.operation = "QueryDisks", .call = call, .exception = exception, .message = "no luck", .disk = {}}};
+  });
+}
+
+TEST_F(HostRuntimeTest, AProviderThatFailsOnceShowsNoDisksAndThenAll) {
+  const auto options = On(AHostWhoseQueryThrows("HostCtlException", 1));
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    EXPECT_THAT(Disks(runtime), ElementsAre());
+    EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible"));
+  });
+}
+
+TEST_F(HostRuntimeTest, AProviderThatThrowsWhatItMustNotEndsTheProcess) {
+  const auto options = On(AHostWhoseQueryThrows("std::runtime_error", 0));
+  InOwnProcess([&options] { Disks(HostRuntime::Start(options)); }, panicStatus, "panic: no luck");
+}
+
+TEST_F(HostRuntimeTest, RecordsTheCallsOfTheProvider) {
+  auto options = On(AHost().WithSsd("naa.1"));
+  options.recorder = std::make_shared<OtxCtl::Fault::CallRecorder>();
+  InOwnProcess([&options] {
+    Disks(HostRuntime::Start(options));
+    std::vector<std::string> calls;
+    for (const auto& call : options.recorder->Calls()) {
+      calls.push_back(call.operation + call.arguments.dump());
+    }
+    EXPECT_THAT(calls, ElementsAre("RefreshKovaInfo[]", "QueryDisks[[],true]"));
+  });
+}
+
+TEST_F(HostRuntimeTest, SavesEveryChangeIfAskedTo) {
+  auto options = On(AHost().WithSsd("naa.1"));
+  options.save = true;
+  InOwnProcess([&options] {
+    HostRuntime::Start(options).SimulatedHost().Change([](HostDescription& host) { host.name = "changed"; });
+    EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile).name, "changed");
+  });
+}
+
+TEST_F(HostRuntimeTest, LeavesTheFileAloneUnlessAskedTo) {
+  const auto options = On(AHost().WithSsd("naa.1"));
+  InOwnProcess([&options] {
+    HostRuntime::Start(options).SimulatedHost().Change([](HostDescription& host) { host.name = "changed"; });
+    EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile).name, "");
+    EXPECT_FALSE(std::filesystem::exists(options.hostFile + ".lock"));
+  });
+}
+
+TEST_F(HostRuntimeTest, RefusesToSaveAHostThatAnotherProgramSaves) {
+  auto options = On(AHost().WithSsd("naa.1"));
+  options.save = true;
+  const OtxCtl::Sim::HostFileWriter other(options.hostFile);
+  InOwnProcess([&options] {
+    EXPECT_THAT(WhyNotStarted<OtxCtl::Sim::HostFileError>(options), HasSubstr(options.hostFile));
+  });
+}
+
+TEST_F(HostRuntimeTest, RefusesToSaveTheExampleHost) {
+  auto options = OnExampleHost();
+  options.save = true;
+  InOwnProcess([&options] { EXPECT_THAT(WhyNotStarted<HostError>(options), HasSubstr("--save")); });
+}
+
+TEST_F(HostRuntimeTest, NamesAHostFileThatIsMissingOrBroken) {
+  auto options = On(AHost().WithSsd("naa.1"));
+  std::ofstream(_file) << R"({"disks": [{"name": "naa.1", "ssd": 1, "bytes": 1}]})";
+  InOwnProcess([&options] {
+    EXPECT_THAT(WhyNotStarted<OtxCtl::Sim::HostFileError>(options),
+                testing::AllOf(HasSubstr(options.hostFile), HasSubstr("disks[0].ssd")));
+    options.hostFile = "/no/such/host.json";
+    EXPECT_THAT(WhyNotStarted<OtxCtl::Sim::HostFileError>(options), HasSubstr("/no/such/host.json"));
+  });
+}
+
+TEST_F(HostRuntimeTest, APluginThatCannotBeInitialisedLeavesNothingBehind) {
+  auto options = On(AHost().WithSsd("naa.1"));
+  InOwnProcess([&options] {
+    options.pluginFile = KOVA_DEAF_PLUGIN;
+    EXPECT_THAT(WhyNotStarted<HostError>(options), HasSubstr("initialised"));
+    EXPECT_EQ(Tessa::Service::GetApp(), nullptr);
+    EXPECT_FALSE(Tessa::Authorize::AuthorizeManager::GetInstance());
+
+    options.pluginFile = KOVA_PLUGIN;
+    EXPECT_THAT(Disks(HostRuntime::Start(options)), ElementsAre("naa.1 eligible"));
+  });
+}
+
+}  // namespace
+}  // namespace Host

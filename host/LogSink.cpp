@@ -38,8 +38,7 @@ spdlog::sink_ptr StandardError() {
 
 class ConsoleLogger final : public Logger {
  public:
-  ConsoleLogger(LogLevel level, std::string name)
-      : _level(level), _logger(std::move(name), StandardError()) {
+  ConsoleLogger(LogLevel level, std::string name) : _level(level), _logger(std::move(name), StandardError()) {
     _logger.set_level(spdlog::level::trace);
     _logger.set_pattern("%Y-%m-%dT%H:%M:%S.%e %-5l %n: %v");
     _logger.flush_on(spdlog::level::warn);
@@ -67,7 +66,9 @@ class ConsoleLogger final : public Logger {
 
 }  // namespace
 
-Ref<Logger> MakeConsoleLogger(LogLevel level) { return Tessa::MakeRef<ConsoleLogger>(level, "kova"); }
+Ref<Logger> MakeConsoleLogger(LogLevel level) {
+  return Tessa::MakeRef<ConsoleLogger>(level, "kova");
+}
 
 void FlushLogs() noexcept {
   try {

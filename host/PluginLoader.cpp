@@ -24,9 +24,11 @@ void Find(void* library, const std::string& path, const char* name, Function*& f
 
 PluginHooks OpenPlugin(const std::string& path) {
   // Never unloaded: objects that it made may live as long as the process.
-  void* const library = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
+  // A path, whatever it looks like: a bare name would be searched for among the system's libraries.
+  const std::filesystem::path file = std::filesystem::absolute(path);
+  void* const library = dlopen(file.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
   if (library == nullptr) {
-    throw HostError("cannot open the plug-in: " + std::string(dlerror()));
+    throw HostError("cannot open the plug-in " + path + ": " + std::string(dlerror()));
   }
   PluginHooks hooks{};
   Find(library, path, "InitKovaPlugin", hooks.init);

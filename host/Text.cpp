@@ -38,6 +38,8 @@ std::string Printable(std::string_view text) {
   return shown;
 }
 
-bool IsClean(std::string_view text) { return OtxCtl::Sim::IsCleanText(text); }
+bool IsClean(std::string_view text) {
+  return OtxCtl::Sim::IsCleanText(text);
+}
 
 }  // namespace Host

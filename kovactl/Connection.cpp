@@ -65,7 +65,8 @@ std::unique_ptr<Connection> Connect(const GlobalOptions& options) {
 Tessa::Service::LogLevel LevelOf(const std::string& name) {
   Tessa::Service::LogLevel level{};
   if (!Tessa::Service::ParseLevel(name, level)) {
-    throw BadInput("unknown log level '" + name + "'; levels are none, error, warning, info, verbose, trivia");
+    throw BadInput("unknown log level '" + name +
+                   "'; levels are none, error, warning, info, verbose, trivia");
   }
   return level;
 }

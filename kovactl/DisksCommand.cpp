@@ -34,7 +34,7 @@ void PrintSummary(const DiskResults& disks, std::ostream& out) {
   out << disks.Size() << (disks.Size() == 1 ? " disk" : " disks");
   const char* separator = ": ";
   for (const auto& [state, count] : counts) {
-    out << separator << count << " " << state;
+    out << separator << count << " " << Host::Printable(state);
     separator = ", ";
   }
   out << "\n";
@@ -70,8 +70,8 @@ void PrintDisks(const DiskResults& disks, const std::string& output, std::ostrea
 
 }  // namespace
 
-ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>& names, const std::string& output,
-                    std::ostream& out, std::ostream& err) {
+ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>& names,
+                    const std::string& output, std::ostream& out, std::ostream& err) {
   const Host::Answer answer = connection.QueryDisksForKova(names);
   if (answer.fault) {
     err << "kovactl: " << Host::Printable(Explain(*answer.fault)) << "\n";

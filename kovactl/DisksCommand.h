@@ -13,7 +13,7 @@ namespace Kovactl {
 
 // Asks for the named disks, or all, and prints them. A name that the host does not know is an error, told
 // after the disks that it does know.
-ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>& names, const std::string& output,
-                    std::ostream& out, std::ostream& err);
+ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>& names,
+                    const std::string& output, std::ostream& out, std::ostream& err);
 
 }  // namespace Kovactl

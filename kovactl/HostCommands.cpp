@@ -1,7 +1,6 @@
 #include "kovactl/HostCommands.h"
 
-#include <fstream>
-#include <iterator>
+#include <array>
 #include <istream>
 #include <ostream>
 
@@ -19,7 +18,19 @@ std::string ReadInput(const std::string& file, std::istream& in) {
   if (file != standardInput) {
     return OtxCtl::Sim::ReadTextFile(file, longestImport);
   }
-  return {std::istreambuf_iterator<char>(in), {}};
+  std::string text;
+  std::array<char, 64 * 1024> chunk;
+  while (in.read(chunk.data(), chunk.size()), in.gcount() > 0) {
+    text.append(chunk.data(), static_cast<std::size_t>(in.gcount()));
+    if (text.size() > longestImport) {
+      throw BadInput("standard input is larger than " + std::to_string(longestImport) + " bytes");
+    }
+  }
+  return text;
+}
+
+std::string NameOf(const std::string& file) {
+  return file == standardInput ? "standard input" : file;
 }
 
 std::string Count(std::size_t count, const std::string& what) {
@@ -32,8 +43,9 @@ ExitStatus RunHostImport(const ImportOptions& options, std::istream& in, std::os
   using OtxCtl::Sim::HostDescriptionError;
   std::string description;
   try {
-    const OtxCtl::Sim::HostDescription host = OtxCtl::Sim::ImportLsblk(
-        ReadInput(options.file, in), {.hostName = options.name, .minimumDiskBytes = options.minimumDiskBytes});
+    const OtxCtl::Sim::HostDescription host =
+        OtxCtl::Sim::ImportLsblk(ReadInput(options.file, in),
+                                 {.hostName = options.name, .minimumDiskBytes = options.minimumDiskBytes});
     description = OtxCtl::Sim::WriteHostDescription(host);
     if (!options.output.empty()) {
       OtxCtl::Sim::HostFileWriter(options.output).Save(host);
@@ -41,7 +53,7 @@ ExitStatus RunHostImport(const ImportOptions& options, std::istream& in, std::os
       return ExitStatus::Done;
     }
   } catch (const HostDescriptionError& refused) {
-    throw BadInput(options.file + ": " + refused.what());
+    throw BadInput(NameOf(options.file) + ": " + refused.what());
   } catch (const OtxCtl::Sim::HostFileError& failed) {
     throw BadInput(failed.what());
   }

@@ -13,7 +13,7 @@ struct ImportOptions {
   std::string file;  // output of lsblk --json -O -b; "-": standard input
   std::string name = "imported";
   std::int64_t minimumDiskBytes = std::int64_t{1} << 30;
-  std::string output;  // file to write; empty: standard output
+  std::string output = {};  // file to write; empty: standard output
 };
 
 // Prints a host description of the machine that the text was captured on. Throws BadInput that names the

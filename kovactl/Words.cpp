@@ -19,7 +19,7 @@ struct FaultWords {
   std::string_view type;
   std::string_view words;
 };
-constexpr std::array<FaultWords, 13> faultWords = {{
+constexpr std::array<FaultWords, 15> faultWords = {{
     {"DiskHasPartitions", "holds partitions or is in use by others"},
     {"DiskIsUSB", "attached by USB"},
     {"DiskIsNonLocal", "not local: other hosts can reach it"},
@@ -33,6 +33,8 @@ constexpr std::array<FaultWords, 13> faultWords = {{
     {"InvalidArgument", "the request does not fit the host"},
     {"SystemError", "something in the host failed"},
     {"NotPermitted", "the caller's role does not allow this"},
+    {"Busy", "the host is busy; try again later"},
+    {"HostChanged", "the host has changed since it was looked at"},
 }};
 
 std::string WordsFor(const MethodFault& fault) {

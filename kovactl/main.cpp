@@ -24,15 +24,17 @@ using Action = std::function<ExitStatus()>;
 struct Options {
   Kovactl::GlobalOptions global;
   std::vector<std::string> names;
-  Kovactl::ImportOptions import;
+  Kovactl::ImportOptions importing;
   std::string checkFile;
   std::string replayFile;
   std::string replayLevel = "trivia";
 };
 
 void AddGlobalOptions(CLI::App& cli, Kovactl::GlobalOptions& global) {
-  auto* const agent = cli.add_option("--agent", global.agent, "Agent to ask: unix:PATH")->capture_default_str();
-  cli.add_option("--host", global.runtime.hostFile, "Host description to work on in this process, without an agent")
+  auto* const agent =
+      cli.add_option("--agent", global.agent, "Agent to ask: unix:PATH")->capture_default_str();
+  cli.add_option("--host", global.runtime.hostFile,
+                 "Host description to work on in this process, without an agent")
       ->excludes(agent);
   cli.add_flag("--save", global.runtime.save, "Write changes back to the host description");
   cli.add_option("-o,--output", global.output, "How to print: table, json or soap")
@@ -44,7 +46,8 @@ void AddGlobalOptions(CLI::App& cli, Kovactl::GlobalOptions& global) {
 }
 
 void AddDisks(CLI::App& cli, Options& options, Action& action) {
-  auto* const command = cli.add_subcommand("disks", "List disks: kind, size, state, and why one cannot be used");
+  auto* const command =
+      cli.add_subcommand("disks", "List disks: kind, size, state, and why one cannot be used");
   command->add_option("DISK", options.names, "Canonical names; none: every disk");
   command->callback([&] {
     action = [&] {
@@ -57,32 +60,37 @@ void AddDisks(CLI::App& cli, Options& options, Action& action) {
 void AddHost(CLI::App& cli, Options& options, Action& action) {
   auto* const host = cli.add_subcommand("host", "Make and check host descriptions");
   host->require_subcommand(1);
-  auto* const import = host->add_subcommand("import", "Describe the machine that `lsblk --json -O -b` was run on");
-  import->add_option("FILE", options.import.file, "Output of lsblk; - for standard input")->required();
-  import->add_option("--name", options.import.name, "Name of the host")->capture_default_str();
-  import->add_option("--minimum-bytes", options.import.minimumDiskBytes, "Smaller disks are too small")
+  auto* const importer =
+      host->add_subcommand("import", "Describe the machine that `lsblk --json -O -b` was run on");
+  importer->add_option("FILE", options.importing.file, "Output of lsblk; - for standard input")->required();
+  importer->add_option("--name", options.importing.name, "Name of the host")->capture_default_str();
+  importer->add_option("--minimum-bytes", options.importing.minimumDiskBytes, "Smaller disks are too small")
       ->check(CLI::NonNegativeNumber)
       ->capture_default_str();
-  import->add_option("--write", options.import.output, "File to write instead of standard output");
-  import->callback([&] {
-    action = [&] { return Kovactl::RunHostImport(options.import, std::cin, std::cout); };
-  });
+  importer->add_option("--write", options.importing.output, "File to write instead of standard output");
+  importer->callback(
+      [&] { action = [&] { return Kovactl::RunHostImport(options.importing, std::cin, std::cout); }; });
   auto* const check = host->add_subcommand("check", "Check a host description");
   check->add_option("FILE", options.checkFile, "Host description")->required();
-  check->callback([&] {
-    action = [&] { return Kovactl::RunHostCheck(options.checkFile, std::cout); };
-  });
+  check->callback([&] { action = [&] { return Kovactl::RunHostCheck(options.checkFile, std::cout); }; });
 }
 
 void AddReplay(CLI::App& cli, Options& options, Action& action) {
-  auto* const command = cli.add_subcommand("replay", "Run a log of requests through the plug-in, bare (with --host)");
-  command->add_option("REQUESTS", options.replayFile, "One JSON object per line; - for standard input")->required();
+  CLI::App* const command =
+      cli.add_subcommand("replay", "Run a log of requests through the plug-in, bare (with --host)");
+  command->add_option("REQUESTS", options.replayFile, "One JSON object per line; - for standard input")
+      ->required();
   command->add_option("--log-level", options.replayLevel, "What the answers show of the plug-in's log")
       ->capture_default_str();
   command->callback([&] {
-    action = [&] {
-      return Kovactl::RunReplay(options.global.runtime, options.replayFile,
-                                Kovactl::LevelOf(options.replayLevel), std::cin, std::cout);
+    // The common option, before the command's name, means the same.
+    const CLI::Option* const own = command->get_option("--log-level");
+    const CLI::Option* const common = cli.get_option("--log-level");
+    const bool useCommon = own->count() == 0 && common->count() != 0;
+    action = [&options, useCommon] {
+      const std::string& level = useCommon ? options.global.logLevel : options.replayLevel;
+      return Kovactl::RunReplay(options.global.runtime, options.replayFile, Kovactl::LevelOf(level), std::cin,
+                                std::cout);
     };
   });
 }

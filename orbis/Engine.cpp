@@ -139,7 +139,8 @@ bool Equal(const Any* left, const Any* right) {
     case TypeKind::ObjectArray:
       return EqualArray(static_cast<const DataArrayBase&>(*left), static_cast<const DataArrayBase&>(*right));
     case TypeKind::StringArray:
-      return static_cast<const ArrayOfString&>(*left).Items() == static_cast<const ArrayOfString&>(*right).Items();
+      return static_cast<const ArrayOfString&>(*left).Items() ==
+             static_cast<const ArrayOfString&>(*right).Items();
     case TypeKind::Simple:
       break;
   }

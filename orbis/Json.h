@@ -40,7 +40,7 @@ TESSA_API Ref<Any> ReadJson(std::string_view text, const Limits& limits, const T
                             Missing missing = Missing::Refused);
 
 // The same for a value of a text that was read before (orbis/json/JsonText.h). `path` is where it stands.
-TESSA_API Ref<Any> ReadJson(const Json::Value& value, const TypeDescriptor* declared, std::string_view path = {},
-                            Missing missing = Missing::Refused);
+TESSA_API Ref<Any> ReadJson(const Json::Value& value, const TypeDescriptor* declared,
+                            std::string_view path = {}, Missing missing = Missing::Refused);
 
 }  // namespace Orbis

@@ -81,9 +81,11 @@ template class Boxed<std::string>;
 template class Boxed<Bytes>;
 
 const TypeDescriptor& ArrayOfString::StaticType() {
-  static const TypeDescriptor& type = *new TypeDescriptor{
-      .name = "ArrayOfString", .source = "Orbis::ArrayOfString", .kind = TypeKind::StringArray,
-      .create = []() -> Ref<Any> { return new ArrayOfString; }};
+  static const TypeDescriptor& type =
+      *new TypeDescriptor{.name = "ArrayOfString",
+                          .source = "Orbis::ArrayOfString",
+                          .kind = TypeKind::StringArray,
+                          .create = []() -> Ref<Any> { return new ArrayOfString; }};
   return type;
 }
 
@@ -117,15 +119,17 @@ const TypeDescriptor& Complete(TypeDescriptor description, Ref<DataArrayBase> (*
     type->fields.push_back(&field);
   }
   type->array = new TypeDescriptor{.name = std::string(arrayPrefix) + type->name,
-                                         .source = "Orbis::DataArray",
-                                         .kind = TypeKind::ObjectArray,
-                                         .element = type,
-                                         .createArray = createArray,
-                                         .since = type->since};
+                                   .source = "Orbis::DataArray",
+                                   .kind = TypeKind::ObjectArray,
+                                   .element = type,
+                                   .createArray = createArray,
+                                   .since = type->since};
   return *type;
 }
 
-const TypeDescriptor& ArrayTypeOf(const TypeDescriptor& element) { return *element.array; }
+const TypeDescriptor& ArrayTypeOf(const TypeDescriptor& element) {
+  return *element.array;
+}
 
 TypeRegistration::TypeRegistration(std::initializer_list<const TypeDescriptor& (*)()> types) {
   Registry& registry = TheRegistry();

@@ -28,7 +28,9 @@ enum class FieldKind {
   Any,       // Ref<Any>
 };
 
-constexpr bool IsScalar(FieldKind kind) { return kind <= FieldKind::String; }
+constexpr bool IsScalar(FieldKind kind) {
+  return kind <= FieldKind::String;
+}
 
 enum class Presence { Required, Optional, List };
 
@@ -59,13 +61,13 @@ struct TypeDescriptor {
   std::string_view source;  // in the source: "Nox::Host::ScsiDisk"
   TypeKind kind = TypeKind::DataObject;
   const TypeDescriptor* base = nullptr;
-  FieldKind simple = FieldKind::Any;             // Simple: what is boxed
-  const TypeDescriptor* element = nullptr;       // ObjectArray: the type of the elements
-  std::vector<FieldDescriptor> ownFields = {};   // without those of the bases
-  Ref<Any> (*create)() = nullptr;                // null for an abstract type
+  FieldKind simple = FieldKind::Any;                     // Simple: what is boxed
+  const TypeDescriptor* element = nullptr;               // ObjectArray: the type of the elements
+  std::vector<FieldDescriptor> ownFields = {};           // without those of the bases
+  Ref<Any> (*create)() = nullptr;                        // null for an abstract type
   Ref<DataObject> (*copy)(const DataObject&) = nullptr;  // shares the objects that fields hold
-  Ref<DataArrayBase> (*createArray)() = nullptr;  // ObjectArray
-  int since = 0;                                  // order of the first version that has the type
+  Ref<DataArrayBase> (*createArray)() = nullptr;         // ObjectArray
+  int since = 0;                                         // order of the first version that has the type
 
   // Filled by Complete(), for data objects.
   std::vector<const FieldDescriptor*> fields = {};  // all fields, those of the bases first

@@ -6,7 +6,9 @@ namespace Orbis {
 
 Version::Version(std::string_view name, int order) : _name(name), _order(order) {}
 Version::~Version() = default;
-std::string Version::ToString() const { return std::string(_name); }
+std::string Version::ToString() const {
+  return std::string(_name);
+}
 
 Tessa::Ref<Version> FindVersionByTyrlName(std::string_view name) {
   // Holds a reference that is never released: versions outlive everything.

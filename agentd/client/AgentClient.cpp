@@ -6,8 +6,8 @@
 #include "nox/Kova.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
-#include "orbis/json/JsonText.h"
 #include "orbis/TypeDescriptor.h"
+#include "orbis/json/JsonText.h"
 
 namespace Agentd {
 namespace {
@@ -30,17 +30,15 @@ Host::Answer AgentClient::QueryDisksForKova(const std::vector<std::string>& name
     Orbis::Json::AppendString(names[i], body);
   }
   body += "]}";
-  return Call("QueryDisksForKova", body,
-              &Orbis::DataArray<Nox::Kova::Host::DiskResult>::StaticType());
+  return Call("QueryDisksForKova", body, &Orbis::DataArray<Nox::Kova::Host::DiskResult>::StaticType());
 }
 
 Host::Answer AgentClient::Call(const std::string& operation, const std::string& body,
                                const Orbis::TypeDescriptor* resultType) const {
-  const HttpAnswer http =
-      Exchange(_socketPath, {"POST", "/api/v1/" + operation, "application/json", body});
+  const HttpAnswer http = Exchange(_socketPath, {"POST", "/api/v1/" + operation, "application/json", body});
   if (http.contentType != "application/json") {
-    throw ConnectionError("the agent on " + _socketPath + " answered with status " + std::to_string(http.status) +
-                          ": " + http.body.substr(0, 1024));
+    throw ConnectionError("the agent on " + _socketPath + " answered with status " +
+                          std::to_string(http.status) + ": " + http.body.substr(0, 1024));
   }
   try {
     return Host::ReadJsonAnswer(http.body, resultType);

@@ -19,40 +19,48 @@ constexpr std::uint64_t longestAnswer = std::uint64_t{1} << 30;
 // Blocking calls on a stream that knows time limits: each is started and the network run until it is done.
 class Exchanger {
  public:
-  Exchanger(const std::string& socketPath, std::chrono::seconds patience)
+  Exchanger(const std::string& socketPath, std::chrono::milliseconds patience)
       : _path(socketPath), _patience(patience), _stream(_network) {}
 
   void Connect() {
-    Finish("no agent answers on", [&](auto done) { _stream.async_connect(Protocol::endpoint(_path), done); });
+    Demand(Await([&](auto done) { _stream.async_connect(Protocol::endpoint(_path), done); }),
+           "no agent answers on");
   }
 
-  void Send(const http::request<http::string_body>& message) {
-    Finish("cannot send to the agent on", [&](auto done) {
+  // A request that cannot be sent to its end may still have an answer: the reason why it was refused.
+  void Ask(const http::request<http::string_body>& message,
+           http::response_parser<http::string_body>& parser) {
+    const error_code sent = Await([&](auto done) {
       http::async_write(_stream, message, [done](error_code error, std::size_t) { done(error); });
     });
-  }
-
-  void Receive(http::response_parser<http::string_body>& parser) {
-    Finish("no answer from the agent on", [&](auto done) {
+    const error_code received = Await([&](auto done) {
       http::async_read(_stream, _buffer, parser, [done](error_code error, std::size_t) { done(error); });
     });
+    if (received) {
+      Demand(sent, "cannot send to the agent on");
+      Demand(received, "no answer from the agent on");
+    }
   }
 
  private:
   template <class Start>
-  void Finish(const char* failure, Start start) {
+  error_code Await(Start start) {
     error_code result;
     _stream.expires_after(_patience);
     start([&result](error_code error) { result = error; });
     _network.restart();
     _network.run();
+    return result;
+  }
+
+  void Demand(error_code result, const char* failure) const {
     if (result) {
       throw ConnectionError(std::string(failure) + " " + _path + ": " + result.message());
     }
   }
 
   std::string _path;
-  std::chrono::seconds _patience;
+  std::chrono::milliseconds _patience;
   asio::io_context _network;
   beast::basic_stream<Protocol> _stream;
   beast::flat_buffer _buffer;
@@ -60,7 +68,8 @@ class Exchanger {
 
 }  // namespace
 
-HttpAnswer Exchange(const std::string& socketPath, const HttpRequest& request, std::chrono::seconds patience) {
+HttpAnswer Exchange(const std::string& socketPath, const HttpRequest& request,
+                    std::chrono::milliseconds patience) {
   if (socketPath.empty() || socketPath.size() > sizeof(sockaddr_un::sun_path) - 1) {
     throw ConnectionError("'" + socketPath + "' cannot be the path of a socket: it must have 1 to " +
                           std::to_string(sizeof(sockaddr_un::sun_path) - 1) + " bytes");
@@ -75,13 +84,13 @@ HttpAnswer Exchange(const std::string& socketPath, const HttpRequest& request, s
   }
   message.body() = request.body;
   message.prepare_payload();
-  exchanger.Send(message);
 
   http::response_parser<http::string_body> parser;
   parser.body_limit(longestAnswer);
-  exchanger.Receive(parser);
+  exchanger.Ask(message, parser);
   http::response<http::string_body> response = parser.release();
-  return {response.result_int(), std::string(response[http::field::content_type]), std::move(response.body())};
+  return {response.result_int(), std::string(response[http::field::content_type]),
+          std::move(response.body())};
 }
 
 }  // namespace Agentd

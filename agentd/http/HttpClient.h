@@ -18,6 +18,6 @@ class ConnectionError : public std::runtime_error {
 // Connects, asks, reads the whole answer (at most 1 GiB) and closes. `request.contentType` goes with a
 // body. Throws ConnectionError. Blocks; without an answer for `patience`, it gives up.
 HttpAnswer Exchange(const std::string& socketPath, const HttpRequest& request,
-                    std::chrono::seconds patience = std::chrono::seconds(600));
+                    std::chrono::milliseconds patience = std::chrono::seconds(600));
 
 }  // namespace Agentd

@@ -18,14 +18,16 @@ using HttpHandler = std::function<HttpAnswer(const HttpRequest&)>;
 
 class HttpServer {
  public:
-  // Binds the socket (mode 0660) and listens. Throws std::runtime_error that names the path.
+  // Binds the socket (mode 0660) and listens; from here on SIGTERM and SIGINT are the server's. Throws
+  // std::runtime_error that names the path.
   HttpServer(const std::string& socketPath, const HttpLimits& limits, HttpHandler handler);
-  // Removes the socket.
+  // Waits for handlers that still run.
   ~HttpServer();
 
-  // Serves until Stop or one of SIGTERM and SIGINT; then accepts nothing more, finishes what is in flight
-  // within the drain time, and returns.
-  void Run();
+  // Serves until Stop or one of SIGTERM and SIGINT; then removes the socket, accepts nothing more, finishes
+  // what is in flight within the drain time, and returns. False when the time was too short for that: a
+  // handler may still run.
+  bool Run();
 
   // From any thread.
   void Stop();

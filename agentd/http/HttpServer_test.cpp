@@ -1,0 +1,249 @@
+#include "agentd/http/HttpServer.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <csignal>
+#include <filesystem>
+#include <stdexcept>
+
+#include "agentd/testing/RawClient.h"
+#include "agentd/testing/RunningServer.h"
+
+namespace Agentd {
+namespace {
+
+using testing::AllOf;
+using Testing::Gate;
+using testing::HasSubstr;
+using Testing::RawAnswer;
+using Testing::RawClient;
+using Testing::RunningServer;
+
+constexpr std::string_view get = "GET /a HTTP/1.1\r\nHost: x\r\n\r\n";
+
+// Stands between "the server was told to stop" and "it accepts no more".
+void WaitUntilNobodyAnswers(const std::string& path) {
+  try {
+    for (;;) {
+      const RawClient client(path);
+      std::this_thread::yield();
+    }
+  } catch (const std::runtime_error&) {
+  }
+}
+
+TEST(HttpServer, HandsMethodTargetTypeAndBodyToTheHandler) {
+  HttpRequest seen;
+  RunningServer server([&seen](const HttpRequest& request) {
+    seen = request;
+    return HttpAnswer{201, "text/x", "made"};
+  });
+  RawClient client(server.Path());
+  client.Send("POST /a?b=%20c HTTP/1.1\r\nHost: x\r\nContent-Type: text/y\r\nContent-Length: 4\r\n\r\nbody");
+  const RawAnswer answer = client.Receive();
+  EXPECT_EQ(seen.method, "POST");
+  EXPECT_EQ(seen.target, "/a?b=%20c");
+  EXPECT_EQ(seen.contentType, "text/y");
+  EXPECT_EQ(seen.body, "body");
+  EXPECT_EQ(answer.status, 201u);
+  EXPECT_THAT(answer.header, HasSubstr("content-type: text/x"));
+  EXPECT_EQ(answer.body, "made");
+}
+
+TEST(HttpServer, ReadsABodyInChunksAndInPieces) {
+  RunningServer server;
+  RawClient client(server.Path());
+  client.Send("POST / HTTP/1.1\r\nHost: x\r\nTransfer-En");
+  client.Send("coding: chunked\r\n\r\n4\r\nbo");
+  client.Send("dy\r\n0\r\n\r\n");
+  EXPECT_EQ(client.Receive().body, "POST / body");
+}
+
+TEST(HttpServer, ServesOneRequestAfterAnotherOnAConnection) {
+  RunningServer server;
+  RawClient client(server.Path());
+  for (int i = 0; i < 3; ++i) {
+    client.Send(get);
+    EXPECT_EQ(client.Receive().body, "GET /a ");
+  }
+}
+
+TEST(HttpServer, ServesRequestsThatWereSentTogetherInOrder) {
+  RunningServer server;
+  RawClient client(server.Path());
+  client.Send("GET /1 HTTP/1.1\r\nHost: x\r\n\r\nGET /2 HTTP/1.1\r\nHost: x\r\n\r\n");
+  EXPECT_EQ(client.Receive().body, "GET /1 ");
+  EXPECT_EQ(client.Receive().body, "GET /2 ");
+}
+
+TEST(HttpServer, ClosesTheConnectionWhenTheClientAsksForIt) {
+  RunningServer server;
+  RawClient client(server.Path());
+  client.Send("GET / HTTP/1.1\r\nHost: x\r\nConnection: close\r\n\r\n");
+  EXPECT_EQ(client.Receive().status, 200u);
+  EXPECT_TRUE(client.IsClosed());
+
+  RawClient old(server.Path());
+  old.Send("GET / HTTP/1.0\r\n\r\n");
+  EXPECT_EQ(old.Receive().status, 200u);
+  EXPECT_TRUE(old.IsClosed());
+}
+
+TEST(HttpServer, SendsNoBodyToHead) {
+  RunningServer server;
+  RawClient client(server.Path());
+  client.Send("HEAD /a HTTP/1.1\r\nHost: x\r\n\r\n");
+  EXPECT_THAT(client.ReceiveHeader(), AllOf(HasSubstr(" 200 "), HasSubstr("content-length: 8")));
+  client.Send(get);
+  EXPECT_EQ(client.Receive().body, "GET /a ") << "the next answer begins where it should";
+}
+
+TEST(HttpServer, AnswersWhatAHandlerThrowsWith500AndItsText) {
+  RunningServer server([](const HttpRequest& request) -> HttpAnswer {
+    if (request.target == "/int") {
+      throw 1;
+    }
+    throw std::runtime_error("out of luck");
+  });
+  RawClient client(server.Path());
+  client.Send(get);
+  const RawAnswer answer = client.Receive();
+  EXPECT_EQ(answer.status, 500u);
+  EXPECT_EQ(answer.body, "out of luck\n");
+  client.Send("GET /int HTTP/1.1\r\nHost: x\r\n\r\n");
+  EXPECT_EQ(client.Receive().status, 500u);
+}
+
+TEST(HttpServer, ASlowRequestHoldsUpNobodyElse) {
+  Gate gate;
+  RunningServer server([&gate](const HttpRequest& request) {
+    if (request.target == "/slow") {
+      gate.Enter();
+    }
+    return Testing::Echo(request);
+  });
+  RawClient slow(server.Path());
+  slow.Send("GET /slow HTTP/1.1\r\nHost: x\r\n\r\n");
+  gate.WaitUntilEntered();
+  RawClient quick(server.Path());
+  quick.Send(get);
+  EXPECT_EQ(quick.Receive().body, "GET /a ");
+  gate.Open();
+  EXPECT_EQ(slow.Receive().body, "GET /slow ");
+}
+
+TEST(HttpServer, GoesOnAfterAClientThatLeftInTheMiddle) {
+  RunningServer server;
+  { RawClient(server.Path()).Send("POST / HTTP/1.1\r\nContent-Length: 10\r\n\r\nhalf"); }
+  { RawClient(server.Path()).Send(get); }  // left before its answer
+  RawClient client(server.Path());
+  client.Send(get);
+  EXPECT_EQ(client.Receive().status, 200u);
+}
+
+TEST(HttpServer, ServesManyClientsAtOnce) {
+  RunningServer server;
+  std::vector<std::future<int>> clients;
+  for (int i = 0; i < 8; ++i) {
+    clients.push_back(std::async(std::launch::async, [&server] {
+      int good = 0;
+      RawClient client(server.Path());
+      for (int round = 0; round < 50; ++round) {
+        client.Send(get);
+        good += client.Receive().status == 200u ? 1 : 0;
+      }
+      return good;
+    }));
+  }
+  for (auto& client : clients) {
+    EXPECT_EQ(client.get(), 50);
+  }
+}
+
+TEST(HttpServer, StoppedWhileNobodyIsConnectedReturnsAndRemovesTheSocket) {
+  RunningServer server;
+  { RawClient client(server.Path()); }
+  EXPECT_TRUE(server.Stop());
+  EXPECT_FALSE(std::filesystem::exists(server.Path()));
+}
+
+TEST(HttpServer, StoppedBeforeItRunsReturnsAtOnce) {
+  const std::string path = Testing::FreshSocketPath();
+  HttpServer server(path, {}, &Testing::Echo);
+  server.Stop();
+  EXPECT_TRUE(server.Run());
+}
+
+TEST(HttpServer, ThatNeverRanRemovesItsSocket) {
+  const std::string path = Testing::FreshSocketPath();
+  { HttpServer server(path, {}, &Testing::Echo); }
+  EXPECT_FALSE(std::filesystem::exists(path));
+}
+
+TEST(HttpServer, StoppedClosesConnectionsThatOnlyWait) {
+  RunningServer server;
+  RawClient client(server.Path());
+  client.Send(get);
+  EXPECT_EQ(client.Receive().status, 200u);
+  EXPECT_TRUE(server.Stop());
+  EXPECT_TRUE(client.IsClosed());
+}
+
+TEST(HttpServer, ASignalEndsItAfterTheRequestsInFlight) {
+  Gate gate;
+  RunningServer server([&gate](const HttpRequest& request) {
+    gate.Enter();
+    return Testing::Echo(request);
+  });
+  RawClient client(server.Path());
+  client.Send(get);
+  gate.WaitUntilEntered();
+  kill(getpid(), SIGTERM);
+  WaitUntilNobodyAnswers(server.Path());
+  EXPECT_FALSE(std::filesystem::exists(server.Path())) << "a new agent can start meanwhile";
+  gate.Open();
+  const RawAnswer answer = client.Receive();
+  EXPECT_EQ(answer.body, "GET /a ");
+  EXPECT_THAT(answer.header, HasSubstr("connection: close"));
+  EXPECT_TRUE(client.IsClosed());
+  EXPECT_TRUE(server.Wait());
+}
+
+TEST(HttpServer, LeavesASuccessorsSocketAlone) {
+  Gate gate;
+  auto server = std::make_unique<RunningServer>([&gate](const HttpRequest& request) {
+    gate.Enter();
+    return Testing::Echo(request);
+  });
+  const std::string path = server->Path();
+  RawClient client(path);
+  client.Send(get);
+  gate.WaitUntilEntered();
+  server->Server().Stop();
+  WaitUntilNobodyAnswers(path);
+  const HttpServer successor(path, {}, &Testing::Echo);
+  gate.Open();
+  server.reset();
+  EXPECT_TRUE(std::filesystem::exists(path));
+}
+
+TEST(HttpServer, GivesUpOnRequestsThatTakeLongerThanTheDrainTime) {
+  Gate gate;
+  HttpLimits limits;
+  limits.drainTime = std::chrono::milliseconds(20);
+  RunningServer server(
+      [&gate](const HttpRequest& request) {
+        gate.Enter();
+        return Testing::Echo(request);
+      },
+      limits);
+  RawClient client(server.Path());
+  client.Send(get);
+  gate.WaitUntilEntered();
+  EXPECT_FALSE(server.Stop());
+  gate.Open();
+}
+
+}  // namespace
+}  // namespace Agentd

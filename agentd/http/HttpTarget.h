@@ -10,7 +10,7 @@
 namespace Agentd {
 
 struct HttpTarget {
-  std::string path;                                            // "/api/v1/disks"
+  std::string path;                                             // "/api/v1/disks"
   std::vector<std::pair<std::string, std::string>> parameters;  // decoded, in order
 
   // Every value given for the name.

@@ -22,13 +22,14 @@ struct HttpAnswer {
 
 // What a connection may cost before it is refused.
 struct HttpLimits {
-  std::size_t headerBytes = 16 << 10;                   // beyond: 431
-  std::size_t bodyBytes = 16 << 20;                     // beyond: 413
-  std::size_t connections = 256;                        // beyond: 503
-  std::chrono::seconds readTime = std::chrono::seconds(30);   // for one whole request; beyond: 408
-  std::chrono::seconds writeTime = std::chrono::seconds(60);  // for one whole answer; beyond: closed
-  std::chrono::seconds drainTime = std::chrono::seconds(60);  // for what is in flight when stopping
-  unsigned workers = 4;                                 // requests handled at the same time
+  std::size_t headerBytes = 16 << 10;  // beyond: 431
+  std::size_t bodyBytes = 16 << 20;    // beyond: 413
+  std::size_t connections = 256;       // beyond: 503
+  // For one whole request. Beyond: 408, or closed when nothing of a request has come.
+  std::chrono::milliseconds readTime = std::chrono::seconds(30);
+  std::chrono::milliseconds writeTime = std::chrono::seconds(60);  // for one whole answer; beyond: closed
+  std::chrono::milliseconds drainTime = std::chrono::seconds(60);  // for what is in flight when stopping
+  unsigned workers = 4;                                            // requests handled at the same time
 };
 
 }  // namespace Agentd

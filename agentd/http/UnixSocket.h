@@ -5,9 +5,21 @@
 
 namespace Agentd {
 
-// Makes the place ready for a socket to be bound: creates a missing folder (0750), and removes a socket
-// that nobody answers on. Throws std::runtime_error that names the path when another program answers there,
-// when something else stands there, or when the path is too long.
-void PrepareSocketPath(const std::string& path);
+// The place of a socket, free to be bound. Until this goes, no other SocketPlace in that folder can be made,
+// by this process or another: of two agents that start together, the second one finds the first one
+// answering.
+class SocketPlace {
+ public:
+  // Creates a missing folder (0750), and removes a socket that nobody answers on. Throws std::runtime_error
+  // that names the path when another program answers there, when something else stands there, or when the
+  // path is too long.
+  explicit SocketPlace(const std::string& path);
+  ~SocketPlace();
+  SocketPlace(const SocketPlace&) = delete;
+  SocketPlace& operator=(const SocketPlace&) = delete;
+
+ private:
+  int _folder = -1;  // locked
+};
 
 }  // namespace Agentd

@@ -1,5 +1,6 @@
 #include "agentd/routes/Routes.h"
 
+#include <algorithm>
 #include <array>
 #include <optional>
 #include <string>
@@ -18,7 +19,9 @@ using Host::KovaService;
 
 constexpr std::string_view jsonType = "application/json";
 
-HttpAnswer PlainText(unsigned status, const std::string& text) { return {status, "text/plain", text + "\n"}; }
+HttpAnswer PlainText(unsigned status, const std::string& text) {
+  return {status, "text/plain", text + "\n"};
+}
 
 HttpAnswer ToJson(const Answer& answer) {
   HttpAnswer http;
@@ -30,8 +33,10 @@ HttpAnswer ToJson(const Answer& answer) {
   return http;
 }
 
-[[noreturn]] void Refuse(const Orbis::Json::Value& value, const std::string& path, const std::string& wanted) {
-  throw Orbis::ParseException(path, value.line, "wanted " + wanted + ", found " + Orbis::Json::Describe(value));
+[[noreturn]] void Refuse(const Orbis::Json::Value& value, const std::string& path,
+                         const std::string& wanted) {
+  throw Orbis::ParseException(path, value.line,
+                              "wanted " + wanted + ", found " + Orbis::Json::Describe(value));
 }
 
 // The body {"names": [..]}, or {}.
@@ -59,7 +64,9 @@ std::vector<std::string> ReadNames(const std::string& body) {
   return names;
 }
 
-HttpAnswer Health(const KovaService&, const HttpTarget&, const HttpRequest&) { return PlainText(200, "ok"); }
+HttpAnswer Health(const KovaService&, const HttpTarget&, const HttpRequest&) {
+  return PlainText(200, "ok");
+}
 
 HttpAnswer GetDisks(const KovaService& service, const HttpTarget& target, const HttpRequest&) {
   for (const auto& [name, value] : target.parameters) {
@@ -87,7 +94,14 @@ constexpr std::array<Entry, 3> entries = {{
 }};
 
 // A content type is demanded of every body: a form of a stranger's page cannot send this one.
-bool IsJson(std::string_view contentType) { return contentType.substr(0, contentType.find(';')) == jsonType; }
+bool IsJson(std::string_view contentType) {
+  std::string type(contentType.substr(0, contentType.find(';')));
+  type.erase(type.find_last_not_of(" \t") + 1);
+  std::transform(type.begin(), type.end(), type.begin(), [](char byte) {
+    return byte >= 'A' && byte <= 'Z' ? static_cast<char>(byte - 'A' + 'a') : byte;
+  });
+  return type == jsonType;
+}
 
 }  // namespace
 
@@ -111,7 +125,8 @@ HttpAnswer Route(const KovaService& service, const HttpRequest& request) {
       return PlainText(400, refused.what());
     }
   }
-  return pathKnown ? PlainText(405, "that method is not served here") : PlainText(404, "nothing is served here");
+  return pathKnown ? PlainText(405, "that method is not served here")
+                   : PlainText(404, "nothing is served here");
 }
 
 }  // namespace Agentd

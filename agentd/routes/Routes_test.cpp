@@ -1,0 +1,163 @@
+#include "agentd/routes/Routes.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "agentd/testing/FakeService.h"
+#include "orbis/Types.h"
+
+namespace Agentd {
+namespace {
+
+using testing::AllOf;
+using testing::ElementsAre;
+using Testing::FakeHooks;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+class Routes : public testing::Test {
+ protected:
+  HttpAnswer Get(const std::string& target) const { return Route(_service, {"GET", target, "", ""}); }
+  HttpAnswer Post(const std::string& target, const std::string& body,
+                  const std::string& type = "application/json") const {
+    return Route(_service, {"POST", target, type, body});
+  }
+  HttpAnswer Query(const std::string& body) const { return Post("/api/v1/QueryDisksForKova", body); }
+
+  const Host::KovaService _service = Testing::AFakeService();
+};
+
+TEST_F(Routes, HealthIsOk) {
+  const HttpAnswer answer = Get("/healthz");
+  EXPECT_EQ(answer.status, 200u);
+  EXPECT_EQ(answer.contentType, "text/plain");
+  EXPECT_EQ(answer.body, "ok\n");
+  EXPECT_EQ(FakeHooks::calls, 0);
+}
+
+TEST_F(Routes, DisksAreAnsweredAsJson) {
+  FakeHooks::AnswerWithDisk("naa.1");
+  const HttpAnswer answer = Get("/api/v1/disks");
+  EXPECT_EQ(answer.status, 200u);
+  EXPECT_EQ(answer.contentType, "application/json");
+  EXPECT_THAT(answer.body,
+              AllOf(testing::StartsWith(R"({"result":[{"@type":"KovaHostDiskResult")"),
+                    HasSubstr(R"("canonicalName":"naa.1")"), testing::EndsWith("\"fault\":null}\n")));
+  EXPECT_THAT(FakeHooks::names, IsEmpty());
+}
+
+TEST_F(Routes, DisksAreChosenByNamesInTheTarget) {
+  FakeHooks::AnswerWithDisk("naa.1");
+  EXPECT_EQ(Get("/api/v1/disks?names=naa.1&names=t10.A%20B+C").status, 200u);
+  EXPECT_THAT(FakeHooks::names, ElementsAre("naa.1", "t10.A B+C"));
+}
+
+TEST_F(Routes, DisksAreChosenByNamesInTheBody) {
+  FakeHooks::AnswerWithDisk("naa.1");
+  EXPECT_EQ(Query(R"({"names": ["naa.1", "naa.2"]})").status, 200u);
+  EXPECT_THAT(FakeHooks::names, ElementsAre("naa.1", "naa.2"));
+  EXPECT_EQ(Query("{}").status, 200u);
+  EXPECT_THAT(FakeHooks::names, IsEmpty());
+}
+
+TEST_F(Routes, AnUnknownParameterIsRefusedByName) {
+  const HttpAnswer inTarget = Get("/api/v1/disks?name=naa.1");
+  EXPECT_EQ(inTarget.status, 400u);
+  EXPECT_THAT(inTarget.body, HasSubstr("'name'"));
+  const HttpAnswer inBody = Query(R"({"name": []})");
+  EXPECT_EQ(inBody.status, 400u);
+  EXPECT_THAT(inBody.body, HasSubstr("name"));
+  EXPECT_EQ(FakeHooks::calls, 0);
+}
+
+TEST_F(Routes, ARefusedRequestIs400WithTheFault) {
+  const HttpAnswer answer = Query(R"({"names": [""]})");
+  EXPECT_EQ(answer.status, 400u);
+  EXPECT_EQ(answer.contentType, "application/json");
+  EXPECT_THAT(answer.body, AllOf(HasSubstr(R"("result":null)"), HasSubstr(R"("@type":"InvalidArgument")"),
+                                 HasSubstr(R"("invalidProperty":"names[0]")")));
+  EXPECT_EQ(FakeHooks::calls, 0);
+}
+
+TEST_F(Routes, AFaultOfTheHostIs500WithTheFault) {
+  const HttpAnswer answer = Get("/api/v1/disks");
+  EXPECT_EQ(answer.status, 500u);
+  EXPECT_EQ(answer.contentType, "application/json");
+  EXPECT_THAT(answer.body, HasSubstr(R"("@type":"SystemError")"));
+}
+
+TEST_F(Routes, AResultBesideAFaultIs200) {
+  FakeHooks::AnswerWithDisk("naa.1");
+  FakeHooks::AnswerWithFault(Orbis::Fault::SystemError("half of it failed"));
+  const HttpAnswer answer = Get("/api/v1/disks");
+  EXPECT_EQ(answer.status, 200u);
+  EXPECT_THAT(answer.body, AllOf(HasSubstr("naa.1"), HasSubstr("half of it failed")));
+}
+
+TEST_F(Routes, AnUnknownPathIs404AndAnotherMethod405) {
+  EXPECT_EQ(Get("/").status, 404u);
+  EXPECT_EQ(Get("/api/v1/disks/").status, 404u);
+  EXPECT_EQ(Get("/api/v1/querydisksforkova").status, 404u);
+  EXPECT_EQ(Get("/api/v1/QueryDisksForKova").status, 405u);
+  EXPECT_EQ(Post("/healthz", "{}").status, 405u);
+  EXPECT_EQ(Route(_service, {"DELETE", "/api/v1/disks", "", ""}).status, 405u);
+  EXPECT_EQ(FakeHooks::calls, 0);
+}
+
+TEST_F(Routes, AnEscapedPathIsTheSamePath) {
+  EXPECT_EQ(Get("/%68ealthz").status, 200u);
+}
+
+TEST_F(Routes, ABrokenEscapeIs400) {
+  EXPECT_EQ(Get("/api/v1/disks?names=%4").status, 400u);
+  EXPECT_EQ(Get("/%").status, 400u);
+}
+
+TEST_F(Routes, ABodyMustBeJsonByItsType) {
+  FakeHooks::AnswerWithDisk("naa.1");
+  const std::string path = "/api/v1/QueryDisksForKova";
+  EXPECT_EQ(Post(path, "{}", "application/x-www-form-urlencoded").status, 415u);
+  EXPECT_EQ(Post(path, "{}", "").status, 415u);
+  EXPECT_EQ(Post(path, "{}", "text/plain").status, 415u);
+  EXPECT_EQ(Post(path, "{}", "application/jsonp").status, 415u);
+  EXPECT_EQ(FakeHooks::calls, 0);
+  EXPECT_EQ(Post(path, "{}", "application/json; charset=utf-8").status, 200u);
+  EXPECT_EQ(Post(path, "{}", "Application/JSON ;x").status, 200u);
+}
+
+struct Broken {
+  std::string body;
+  std::string told;
+};
+
+class BrokenBody : public Routes, public testing::WithParamInterface<Broken> {};
+
+TEST_P(BrokenBody, Is400AndSaysWhere) {
+  const HttpAnswer answer = Query(GetParam().body);
+  EXPECT_EQ(answer.status, 400u);
+  EXPECT_THAT(answer.body, HasSubstr(GetParam().told));
+  EXPECT_EQ(FakeHooks::calls, 0);
+}
+
+INSTANTIATE_TEST_SUITE_P(
+    Bodies, BrokenBody,
+    testing::Values(Broken{"", ""}, Broken{"{", ""}, Broken{"[]", "an object"}, Broken{"null", "an object"},
+                    Broken{R"({"names": null})", "names"}, Broken{R"({"names": "naa.1"})", "names"},
+                    Broken{R"({"names": ["a", 1]})", "names[1]"},
+                    Broken{R"({"names": [], "names": []})", "names"}, Broken{R"({"names": []} {})", ""},
+                    Broken{"{\"names\": [\"\xff\"]}", ""}, Broken{R"({"names": ["\ud800"]})", ""}));
+
+TEST_F(Routes, AJsonTextBeyondItsLimitsIs400) {
+  const std::string deep = "{\"names\": " + std::string(100, '[') + std::string(100, ']') + "}";
+  EXPECT_EQ(Query(deep).status, 400u);
+  std::string many = "{\"names\": [\"a\"";
+  for (int i = 0; i < 600'000; ++i) {
+    many += ",\"a\"";
+  }
+  EXPECT_EQ(Query(many + "]}").status, 400u);
+  EXPECT_EQ(Query("{\"names\": [\"" + std::string(std::size_t{2} << 20, 'a') + "\"]}").status, 400u);
+  EXPECT_EQ(FakeHooks::calls, 0);
+}
+
+}  // namespace
+}  // namespace Agentd

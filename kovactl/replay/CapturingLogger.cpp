@@ -34,7 +34,9 @@ std::vector<CapturedLine> CapturingLogger::Take() {
   return std::exchange(_lines, {});
 }
 
-void CapturingLogger::CreateChild(const std::string&, Ref<Logger>& child) { child = Ref<Logger>(this); }
+void CapturingLogger::CreateChild(const std::string&, Ref<Logger>& child) {
+  child = Ref<Logger>(this);
+}
 
 void CapturingLogger::Write(LogLevel level, std::string_view format, std::span<const LogArgument> arguments) {
   CapturedLine line{level, std::string(format), {}};

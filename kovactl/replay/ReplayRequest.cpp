@@ -52,7 +52,8 @@ DiskArgument ReadDisk(const Value& value, const std::string& path) {
   if (value.kind == Kind::String) {
     return value.text;
   }
-  const auto object = Orbis::ReadJson(value, &Nox::Host::ScsiDisk::StaticType(), path, Orbis::Missing::Default);
+  const auto object =
+      Orbis::ReadJson(value, &Nox::Host::ScsiDisk::StaticType(), path, Orbis::Missing::Default);
   return Tessa::Ref<Nox::Host::ScsiDisk>(static_cast<Nox::Host::ScsiDisk*>(object.Get()));
 }
 
@@ -89,7 +90,9 @@ const std::vector<Operation>& Operations() {
       {"QueryDisksForKova", "QueryDisksForKovaHookFn", {"names"}},
       {"AddDisks", "AddDisksHookFn", {"disks", "requestTag"}},
       {"InitializeDisks", "InitializeDisksHookFn", {"mappings", "requestTag"}},
-      {"RemoveDisk", "RemoveDisksHookFn", {"disk", "passThrough", "optionText", "optionFirst", "optionSecond"}},
+      {"RemoveDisk",
+       "RemoveDisksHookFn",
+       {"disk", "passThrough", "optionText", "optionFirst", "optionSecond"}},
       {"RemoveDiskMapping",
        "RemoveDiskMappingHookFn",
        {"mapping", "passThrough", "optionText", "optionFirst", "optionSecond"}},

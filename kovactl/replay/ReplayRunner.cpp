@@ -3,6 +3,7 @@
 #include <cxxabi.h>
 #include <unistd.h>
 
+#include <cstdio>
 #include <cstdlib>
 #include <fstream>
 #include <istream>
@@ -15,35 +16,29 @@
 #include "host/LogSink.h"
 #include "kovactl/replay/CapturingLogger.h"
 #include "kovactl/replay/ReplayRequest.h"
+#include "kovactl/replay/ReplayTexts.h"
 #include "nox/Host.h"
-#include "nox/Kova.h"
-#include "nox/StorageSystem.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
-#include "orbis/Soap.h"
 #include "orbis/json/JsonText.h"
 #include "otxctl/fault/CallRecorder.h"
 #include "otxctl/sim/HostDescriptionError.h"
-#include "tessa/App.h"
 #include "tessa/Panic.h"
 
 namespace Kovactl {
 namespace {
 
-using Nox::Host::ScsiDisk;
-using Nox::Kova::Host::DiskMapping;
-using Orbis::DataArray;
 using Tessa::MakeRef;
 using Tessa::Ref;
 using Tessa::Service::LogLevel;
 using Texts = std::vector<std::string>;
 
 // The class of an exception as the source names it.
-std::string TypeName(const std::exception& exception) {
+std::string TypeName(const std::type_info& type) {
   int status = 0;
   const std::unique_ptr<char, decltype(&std::free)> demangled(
-      abi::__cxa_demangle(typeid(exception).name(), nullptr, nullptr, &status), &std::free);
-  std::string name = status == 0 ? demangled.get() : typeid(exception).name();
+      abi::__cxa_demangle(type.name(), nullptr, nullptr, &status), &std::free);
+  std::string name = status == 0 ? demangled.get() : type.name();
   for (const std::string_view noise : {"__cxx11::", "__1::"}) {
     for (std::size_t at = name.find(noise); at != std::string::npos; at = name.find(noise)) {
       name.erase(at, noise.size());
@@ -52,64 +47,9 @@ std::string TypeName(const std::exception& exception) {
   return name.substr(0, name.find('<'));
 }
 
-std::string ToSoap(const Orbis::Any& object) {
-  std::string text;
-  Orbis::SerializeObjectToSoap(object, nullptr, text);
-  return text;
-}
-
-// The inventory's disk of that name, or a disk that has only the name.
-Ref<ScsiDisk> LookUpDisk(const std::string& name) {
-  Ref<Nox::Host::StorageSystem> storageSystem;
-  Tessa::Service::TryLookupObject("storageSystem", storageSystem);
-  Ref<Nox::Host::StorageDeviceInfo> info;
-  if (storageSystem) {
-    storageSystem->GetStorageDeviceInfo(info);
-  }
-  if (info && info->GetScsiLun()) {
-    for (Nox::Host::ScsiLun* unit : *info->GetScsiLun()) {
-      auto* const disk = dynamic_cast<ScsiDisk*>(unit);
-      if (disk != nullptr && disk->HasCanonicalName() && disk->GetCanonicalName() == name) {
-        return Ref<ScsiDisk>(disk);
-      }
-    }
-  }
-  const auto unknown = MakeRef<ScsiDisk>();
-  unknown->SetCanonicalName(name);
-  return unknown;
-}
-
-Ref<ScsiDisk> Resolve(const DiskArgument& disk) {
-  const auto* const name = std::get_if<std::string>(&disk);
-  return name != nullptr ? LookUpDisk(*name) : std::get<Ref<ScsiDisk>>(disk);
-}
-
-std::string MappingText(const MappingArgument& argument) {
-  const auto mapping = MakeRef<DiskMapping>();
-  mapping->SetSsd(Resolve(argument.ssd));
-  const auto disks = MakeRef<DataArray<ScsiDisk>>();
-  for (const DiskArgument& disk : argument.nonSsd) {
-    disks->Append(Resolve(disk));
-  }
-  mapping->SetNonSsd(disks);
-  return ToSoap(*mapping);
-}
-
-// The texts that the hook of the request takes: those of a raw request as they are, else made from its
-// objects.
-Texts HookTexts(const ReplayRequest& request) {
-  Texts texts = request.texts;
-  for (const DiskArgument& disk : request.disks) {
-    texts.push_back(ToSoap(*Resolve(disk)));
-  }
-  for (const MappingArgument& mapping : request.mappings) {
-    texts.push_back(MappingText(mapping));
-  }
-  return texts;
-}
-
 using Hooks = Host::PluginHooks;
-using HookCall = void (*)(const Hooks&, ReplayRequest&, const Texts&, std::string& fault, std::string& result);
+using HookCall = void (*)(const Hooks&, ReplayRequest&, const Texts&, std::string& fault,
+                          std::string& result);
 
 struct HookRow {
   std::string_view hook;
@@ -121,14 +61,11 @@ const HookRow hookRows[] = {
      [](const Hooks& hooks, ReplayRequest& request, const Texts&, std::string& fault, std::string& result) {
        hooks.queryDisksForKova(request.names, fault, result);
      }},
-    {"AddDisksHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault, std::string& result) {
-       hooks.addDisks(texts, request.requestTag, fault, result);
-     }},
+    {"AddDisksHookFn", [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault,
+                          std::string& result) { hooks.addDisks(texts, request.requestTag, fault, result); }},
     {"InitializeDisksHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault, std::string& result) {
-       hooks.initializeDisks(texts, request.requestTag, fault, result);
-     }},
+     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault,
+        std::string& result) { hooks.initializeDisks(texts, request.requestTag, fault, result); }},
     {"RemoveDisksHookFn",
      [](const Hooks& hooks, ReplayRequest& request, const Texts&, std::string& fault, std::string&) {
        hooks.removeDisks(request.disk, request.passThrough, request.optionText, request.optionFirst,
@@ -144,9 +81,8 @@ const HookRow hookRows[] = {
        hooks.addAllEligibleDisks(request.requestTag, fault, result);
      }},
     {"UnmountDiskMappingHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault, std::string& result) {
-       hooks.unmountDiskMapping(texts, request.requestTag, fault, result);
-     }},
+     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault,
+        std::string& result) { hooks.unmountDiskMapping(texts, request.requestTag, fault, result); }},
     {"GetStorageInfoHookFn", [](const Hooks& hooks, ReplayRequest&, const Texts&, std::string&,
                                 std::string& result) { hooks.getStorageInfo(result); }},
     {"GetConfigInfoHookFn", [](const Hooks& hooks, ReplayRequest&, const Texts&, std::string&,
@@ -209,20 +145,23 @@ class Replay {
     }
     const Texts texts = HookTexts(request);
     TakeNoise();
-    try {
-      Call(request, texts);
-      Answer({});
-    } catch (const std::exception& exception) {
-      Answer("exception: " + TypeName(exception) + ": " + exception.what());
-    }
+    Answer(Call(request, texts));
   }
 
  private:
-  void Call(ReplayRequest& request, const Texts& texts) {
-    for (const HookRow& row : hookRows) {
-      if (row.hook == request.hook) {
-        row.call(_runtime->Hooks(), request, texts, _faultText, _resultText);
+  // How the hook ended; empty: as it should.
+  std::string Call(ReplayRequest& request, const Texts& texts) {
+    try {
+      for (const HookRow& row : hookRows) {
+        if (row.hook == request.hook) {
+          row.call(_runtime->Hooks(), request, texts, _faultText, _resultText);
+        }
       }
+      return "";
+    } catch (const std::exception& exception) {
+      return "exception: " + TypeName(typeid(exception)) + ": " + exception.what();
+    } catch (...) {
+      return "exception: " + TypeName(*abi::__cxa_current_exception_type()) + ": ";
     }
   }
 
@@ -232,7 +171,7 @@ class Replay {
     _recorder->TakeEnded();
   }
 
-  // `ended`: how the hook ended; empty: as it should.
+  // Throws Orbis::ParseException when what the hook appended cannot be read, a mistake of the plug-in.
   void Answer(const std::string& ended) {
     const Host::Answer answer = Host::ReadAnswer(_faultText, _resultText);
     std::string line = "{\"operation\":";
@@ -261,8 +200,13 @@ class Replay {
 
   static void AnswerPanic(const char* text) {
     Host::FlushLogs();
-    if (_running != nullptr) {
-      _running->Answer(std::string("panic: ") + text);
+    std::fprintf(stderr, "kovactl: the plug-in panicked: %s\n", text);
+    try {
+      if (_running != nullptr) {
+        _running->Answer(std::string("panic: ") + text);
+      }
+    } catch (const std::exception& exception) {
+      std::fprintf(stderr, "kovactl: no answer tells of it: %s\n", exception.what());
     }
     _exit(static_cast<int>(ExitStatus::Panic));
   }

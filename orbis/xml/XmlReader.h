@@ -40,8 +40,8 @@ struct Element {
 
 // What to make of attributes in no namespace or another than xsi. Data objects have none.
 enum class Attributes {
-  Refuse,       // data objects: an error that names the attribute
-  Ignore,       // envelopes, whose attributes other software chooses
+  Refuse,  // data objects: an error that names the attribute
+  Ignore,  // envelopes, whose attributes other software chooses
 };
 
 class Document {

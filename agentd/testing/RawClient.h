@@ -1,0 +1,108 @@
+// A client for tests of the server: it sends exactly the bytes it is given.
+#pragma once
+
+#include <sys/socket.h>
+#include <sys/un.h>
+#include <unistd.h>
+
+#include <cstring>
+#include <stdexcept>
+#include <string>
+#include <string_view>
+
+namespace Agentd::Testing {
+
+struct RawAnswer {
+  unsigned status = 0;  // 0: the connection ended without an answer
+  std::string header;   // with the status line, in lower case
+  std::string body;
+};
+
+// Blocks; for one thread.
+class RawClient {
+ public:
+  // Throws std::runtime_error when nobody answers.
+  explicit RawClient(const std::string& path) : _socket(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+    sockaddr_un address{};
+    address.sun_family = AF_UNIX;
+    std::memcpy(address.sun_path, path.data(), path.size());
+    if (connect(_socket, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+      close(_socket);
+      throw std::runtime_error("nobody answers on " + path);
+    }
+  }
+  ~RawClient() { close(_socket); }
+  RawClient(const RawClient&) = delete;
+  RawClient& operator=(const RawClient&) = delete;
+
+  // Stops quietly when the other side has gone.
+  void Send(std::string_view text) const {
+    while (!text.empty()) {
+      const ssize_t sent = send(_socket, text.data(), text.size(), MSG_NOSIGNAL);
+      if (sent <= 0) {
+        return;
+      }
+      text.remove_prefix(static_cast<std::size_t>(sent));
+    }
+  }
+
+  void EndSending() const { shutdown(_socket, SHUT_WR); }
+
+  // The next answer; its body as long as the header says.
+  RawAnswer Receive() {
+    std::size_t end = 0;
+    while ((end = _buffer.find("\r\n\r\n")) == std::string::npos) {
+      if (!ReadMore()) {
+        return {};
+      }
+    }
+    RawAnswer answer;
+    answer.header = Lower(_buffer.substr(0, end));
+    answer.status = static_cast<unsigned>(std::stoul(answer.header.substr(answer.header.find(' '))));
+    _buffer.erase(0, end + 4);
+    const std::string field = "content-length: ";
+    const std::size_t at = answer.header.find(field);
+    const std::size_t length =
+        at == std::string::npos ? 0 : std::stoul(answer.header.substr(at + field.size()));
+    while (_buffer.size() < length && ReadMore()) {
+    }
+    answer.body = _buffer.substr(0, length);
+    _buffer.erase(0, length);
+    return answer;
+  }
+
+  // The header alone, of an answer that has no body whatever its length says.
+  std::string ReceiveHeader() {
+    std::size_t end = 0;
+    while ((end = _buffer.find("\r\n\r\n")) == std::string::npos && ReadMore()) {
+    }
+    const std::string header = Lower(_buffer.substr(0, end));
+    _buffer.erase(0, end == std::string::npos ? end : end + 4);
+    return header;
+  }
+
+  // Whether the other side ends the connection without another byte.
+  bool IsClosed() { return _buffer.empty() && !ReadMore(); }
+
+ private:
+  bool ReadMore() {
+    char chunk[4096];
+    const ssize_t count = recv(_socket, chunk, sizeof chunk, 0);
+    if (count > 0) {
+      _buffer.append(chunk, static_cast<std::size_t>(count));
+    }
+    return count > 0;
+  }
+
+  static std::string Lower(std::string text) {
+    for (char& byte : text) {
+      byte = byte >= 'A' && byte <= 'Z' ? static_cast<char>(byte - 'A' + 'a') : byte;
+    }
+    return text;
+  }
+
+  int _socket;
+  std::string _buffer;
+};
+
+}  // namespace Agentd::Testing

@@ -1,0 +1,71 @@
+// A server that runs for as long as a test needs it.
+#pragma once
+
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <future>
+#include <string>
+#include <thread>
+
+#include "agentd/http/HttpServer.h"
+
+namespace Agentd::Testing {
+
+// A socket path that no other test uses.
+inline std::string FreshSocketPath() {
+  static std::atomic<int> count{0};
+  return testing::TempDir() + "kova-" + std::to_string(getpid()) + "-" + std::to_string(++count) + ".sock";
+}
+
+// Answers what it is asked for: the method, the target and the body.
+inline HttpAnswer Echo(const HttpRequest& request) {
+  return {200, "text/plain", request.method + " " + request.target + " " + request.body};
+}
+
+class RunningServer {
+ public:
+  explicit RunningServer(HttpHandler handler = &Echo, const HttpLimits& limits = {})
+      : _server(_path, limits, std::move(handler)),
+        _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
+  ~RunningServer() { Stop(); }
+  RunningServer(const RunningServer&) = delete;
+  RunningServer& operator=(const RunningServer&) = delete;
+
+  const std::string& Path() const { return _path; }
+  HttpServer& Server() { return _server; }
+
+  // Waits for Run to return; what it returned.
+  bool Wait() { return _run.valid() ? _run.get() : true; }
+  bool Stop() {
+    _server.Stop();
+    return Wait();
+  }
+
+ private:
+  const std::string _path = FreshSocketPath();
+  HttpServer _server;
+  std::future<bool> _run;
+};
+
+// A handler's way to wait for its test, and the test's way to wait for the handler.
+class Gate {
+ public:
+  void Enter() {
+    if (!_entered.exchange(true)) {
+      _hasEntered.set_value();
+    }
+    _opened.wait();
+  }
+  void WaitUntilEntered() { _hasEntered.get_future().wait(); }
+  void Open() { _opening.set_value(); }
+
+ private:
+  std::atomic<bool> _entered{false};
+  std::promise<void> _hasEntered;
+  std::promise<void> _opening;
+  std::shared_future<void> _opened = _opening.get_future().share();
+};
+
+}  // namespace Agentd::Testing

@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test check bench build format-check format asan tsan clang fuzz clean
+.PHONY: help demo test check bench build format-check format asan tsan clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -9,7 +9,7 @@ CTEST := ctest --output-on-failure --no-tests=error -j $(JOBS)
 help:
 	@echo "make demo    build, start the agent on an example host and look at its disks"
 	@echo "make test    build and run every test that needs no virtual machine"
-	@echo "make check   sanitizers, second compiler, fuzzing, format"
+	@echo "make check   format, second compiler, clang-tidy on what changed, sanitizers, fuzzing"
 	@echo "make bench   benchmarks"
 	@echo "make build   the release build only: build/release"
 
@@ -30,7 +30,7 @@ test:
 	@cmake --build --preset dev -j $(JOBS)
 	@cd build/dev && $(CTEST)
 
-check: format-check clang asan tsan fuzz
+check: format-check clang tidy asan tsan fuzz
 
 format-check:
 	@$(SETUP) check
@@ -45,6 +45,13 @@ clang:
 	@cmake --preset dev >/dev/null
 	@cmake --build --preset dev -j $(JOBS)
 	@tools/lint/clang_syntax.py build/dev $(JOBS)
+
+# clang-tidy on what changed since BASE (the origin's main branch, if there is one).
+tidy:
+	@$(SETUP) build test check
+	@cmake --preset dev >/dev/null
+	@cmake --build --preset dev -j $(JOBS)
+	@tools/lint/tidy_changed.sh build/dev $(BASE)
 
 asan tsan:
 	@$(SETUP) build test

@@ -75,6 +75,7 @@ void QueryAll(benchmark::State& state) {
 void QueryByName(benchmark::State& state) {
   Fixture fixture(static_cast<int>(state.range(0)));
   std::vector<std::string> names;
+  names.reserve(static_cast<std::size_t>(state.range(0)));
   for (int i = 0; i < state.range(0); ++i) {
     names.push_back(Bench::DiskName(i));
   }

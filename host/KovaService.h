@@ -21,6 +21,10 @@ class KovaService {
 
   // No names: every disk. The result is a list of KovaHostDiskResult.
   Answer QueryDisksForKova(const std::vector<std::string>& names) const;
+  // The host's disk groups: a KovaHostConfigInfoStorageInfo.
+  Answer GetStorageInfo() const;
+  // Cluster, network and fault domain: a KovaHostConfigInfo.
+  Answer GetConfigInfo() const;
 
  private:
   PluginHooks _hooks;

@@ -20,6 +20,8 @@ class OwnHost final : public Connection {
   Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
     return _service.QueryDisksForKova(names);
   }
+  Host::Answer GetStorageInfo() const override { return _service.GetStorageInfo(); }
+  Host::Answer GetConfigInfo() const override { return _service.GetConfigInfo(); }
 
  private:
   Host::KovaService _service;
@@ -31,6 +33,8 @@ class AgentsHost final : public Connection {
   Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
     return _client.QueryDisksForKova(names);
   }
+  Host::Answer GetStorageInfo() const override { return _client.GetStorageInfo(); }
+  Host::Answer GetConfigInfo() const override { return _client.GetConfigInfo(); }
 
  private:
   Agentd::AgentClient _client;

@@ -16,6 +16,8 @@ class Connection {
   virtual ~Connection();
   // As Host::KovaService::QueryDisksForKova.
   virtual Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const = 0;
+  virtual Host::Answer GetStorageInfo() const = 0;
+  virtual Host::Answer GetConfigInfo() const = 0;
 };
 
 // What all commands share.

@@ -5,11 +5,10 @@
 #include <set>
 
 #include "host/Text.h"
+#include "kovactl/Print.h"
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
 #include "nox/Kova.h"
-#include "orbis/Json.h"
-#include "orbis/Soap.h"
 
 namespace Kovactl {
 namespace {
@@ -54,34 +53,16 @@ void PrintTable(const DiskResults& disks, std::ostream& out) {
   PrintSummary(disks, out);
 }
 
-void PrintDisks(const DiskResults& disks, const std::string& output, std::ostream& out) {
-  if (output == "table") {
-    PrintTable(disks, out);
-    return;
-  }
-  std::string text;
-  if (output == "json") {
-    Orbis::WriteJson(disks, text);
-  } else {
-    Orbis::SerializeObjectToSoap(disks, nullptr, text);
-  }
-  out << text << "\n";
-}
-
 }  // namespace
 
 ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>& names,
                     const std::string& output, std::ostream& out, std::ostream& err) {
   const Host::Answer answer = connection.QueryDisksForKova(names);
-  if (answer.fault) {
-    err << "kovactl: " << Host::Printable(Explain(*answer.fault)) << "\n";
-  }
+  const ExitStatus status = PrintAnswer<DiskResults>(answer, output, out, err, &PrintTable);
   const auto* const disks = dynamic_cast<const DiskResults*>(answer.result.Get());
   if (disks == nullptr) {
-    return ExitStatus::Fault;
+    return status;
   }
-  PrintDisks(*disks, output, out);
-
   std::set<std::string> unknown(names.begin(), names.end());
   for (const DiskResult* disk : *disks) {
     unknown.erase(NameOf(*disk));
@@ -89,10 +70,7 @@ ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>
   for (const std::string& name : unknown) {
     err << "kovactl: this host has no disk '" << Host::Printable(name) << "'\n";
   }
-  if (answer.fault) {
-    return ExitStatus::Fault;
-  }
-  return unknown.empty() ? ExitStatus::Done : ExitStatus::BadInput;
+  return status == ExitStatus::Done && !unknown.empty() ? ExitStatus::BadInput : status;
 }
 
 }  // namespace Kovactl

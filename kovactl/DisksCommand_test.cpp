@@ -5,6 +5,7 @@
 
 #include <sstream>
 
+#include "kovactl/testing/FakeConnection.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
@@ -20,17 +21,7 @@ using Orbis::Fault::SystemError;
 using Tessa::MakeRef;
 using Tessa::Ref;
 using testing::ElementsAre;
-
-class FakeConnection final : public Connection {
- public:
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
-    asked = names;
-    return answer;
-  }
-
-  Host::Answer answer;
-  mutable std::vector<std::string> asked;
-};
+using Testing::FakeConnection;
 
 Ref<DiskResult> ADisk(const std::string& name, bool ssd, std::int64_t bytes, const std::string& state) {
   const auto result = MakeRef<DiskResult>();

@@ -7,9 +7,11 @@
 #include "agentd/http/HttpClient.h"
 #include "host/HostError.h"
 #include "host/Text.h"
+#include "kovactl/ConfigCommand.h"
 #include "kovactl/Connection.h"
 #include "kovactl/DisksCommand.h"
 #include "kovactl/ExitStatus.h"
+#include "kovactl/GroupsCommand.h"
 #include "kovactl/HostCommands.h"
 #include "kovactl/replay/ReplayRunner.h"
 #include "otxctl/sim/HostDescriptionError.h"
@@ -57,6 +59,19 @@ void AddDisks(CLI::App& cli, Options& options, Action& action) {
   });
 }
 
+using Report = ExitStatus (*)(const Kovactl::Connection&, const std::string& output, std::ostream& out,
+                              std::ostream& err);
+
+// A command that asks for one thing and prints it.
+void AddReport(CLI::App& cli, const char* name, const char* what, Report report, Options& options,
+               Action& action) {
+  cli.add_subcommand(name, what)->callback([&options, &action, report] {
+    action = [&options, report] {
+      return report(*Kovactl::Connect(options.global), options.global.output, std::cout, std::cerr);
+    };
+  });
+}
+
 void AddHost(CLI::App& cli, Options& options, Action& action) {
   auto* const host = cli.add_subcommand("host", "Make and check host descriptions");
   host->require_subcommand(1);
@@ -82,7 +97,7 @@ void AddReplay(CLI::App& cli, Options& options, Action& action) {
       ->required();
   command->add_option("--log-level", options.replayLevel, "What the answers show of the plug-in's log")
       ->capture_default_str();
-  command->callback([&] {
+  command->callback([&, command] {
     // The common option, before the command's name, means the same.
     const CLI::Option* const own = command->get_option("--log-level");
     const CLI::Option* const common = cli.get_option("--log-level");
@@ -119,6 +134,9 @@ int main(int argc, char** argv) {
   Action action;
   AddGlobalOptions(cli, options.global);
   AddDisks(cli, options, action);
+  AddReport(cli, "groups", "List disk groups: disks, kind, size, mounted or not", &Kovactl::RunGroups,
+            options, action);
+  AddReport(cli, "config", "Show cluster, network and fault domain", &Kovactl::RunConfig, options, action);
   AddHost(cli, options, action);
   AddReplay(cli, options, action);
   try {

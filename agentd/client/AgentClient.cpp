@@ -33,6 +33,14 @@ Host::Answer AgentClient::QueryDisksForKova(const std::vector<std::string>& name
   return Call("QueryDisksForKova", body, &Orbis::DataArray<Nox::Kova::Host::DiskResult>::StaticType());
 }
 
+Host::Answer AgentClient::GetStorageInfo() const {
+  return Call("GetStorageInfo", "{}", &Nox::Kova::Host::ConfigInfo::StorageInfo::StaticType());
+}
+
+Host::Answer AgentClient::GetConfigInfo() const {
+  return Call("GetConfigInfo", "{}", &Nox::Kova::Host::ConfigInfo::StaticType());
+}
+
 Host::Answer AgentClient::Call(const std::string& operation, const std::string& body,
                                const Orbis::TypeDescriptor* resultType) const {
   const HttpAnswer http = Exchange(_socketPath, {"POST", "/api/v1/" + operation, "application/json", body});

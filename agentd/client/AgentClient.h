@@ -16,6 +16,8 @@ class AgentClient {
   // As Host::KovaService. Throws ConnectionError when the agent cannot be reached or does not answer in the
   // form it should.
   Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const;
+  Host::Answer GetStorageInfo() const;
+  Host::Answer GetConfigInfo() const;
 
  private:
   Host::Answer Call(const std::string& operation, const std::string& body,

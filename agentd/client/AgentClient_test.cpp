@@ -47,6 +47,22 @@ TEST(AgentClient, AsksAnAgentAsAProgramAsksTheServiceItself) {
   EXPECT_EQ(dynamic_cast<const Orbis::Fault::SystemError&>(*answer.fault).GetReason(), "half of it failed");
 }
 
+TEST(AgentClient, AsksForGroupsAndConfiguration) {
+  using Nox::Kova::Host::ConfigInfo;
+  const Host::KovaService service = Testing::AFakeService();
+  RunningServer server([&service](const HttpRequest& request) { return Route(service, request); });
+  const AgentClient client("unix:" + server.Path());
+  ConfigInfo::StorageInfo storage;
+  storage.SetAutoClaim(true);
+  Orbis::SerializeObjectToSoap(storage, nullptr, FakeHooks::resultText);
+  EXPECT_TRUE(dynamic_cast<const ConfigInfo::StorageInfo&>(*client.GetStorageInfo().result).GetAutoClaim());
+  FakeHooks::Reset();
+  ConfigInfo config;
+  config.SetEnabled(true);
+  Orbis::SerializeObjectToSoap(config, nullptr, FakeHooks::resultText);
+  EXPECT_TRUE(dynamic_cast<const ConfigInfo&>(*client.GetConfigInfo().result).GetEnabled());
+}
+
 TEST(AgentClient, GivesAFaultOfTheAgentAsAFault) {
   const Host::KovaService service = Testing::AFakeService();
   RunningServer server([&service](const HttpRequest& request) { return Route(service, request); });

@@ -53,6 +53,11 @@ TEST(HttpServerLimits, AClientThatIsStillSendingLearnsWhyItIsRefused) {
   const HttpAnswer answer =
       Exchange(server.Path(), {"POST", "/", "text/plain", std::string(std::size_t{4} << 20, 'b')});
   EXPECT_EQ(answer.status, 413u);
+
+  RawClient stubborn(server.Path());
+  EXPECT_TRUE(stubborn.Send(Post(std::size_t{4} << 20)))
+      << "one that reads only after it has sent everything";
+  EXPECT_EQ(stubborn.Receive().status, 413u);
 }
 
 TEST(HttpServerLimits, ALongHeaderIsRefused) {

@@ -68,17 +68,49 @@ HttpAnswer Health(const KovaService&, const HttpTarget&, const HttpRequest&) {
   return PlainText(200, "ok");
 }
 
-HttpAnswer GetDisks(const KovaService& service, const HttpTarget& target, const HttpRequest&) {
+std::optional<HttpAnswer> RefuseParameters(const HttpTarget& target, std::string_view known) {
   for (const auto& [name, value] : target.parameters) {
-    if (name != "names") {
-      return PlainText(400, "unknown parameter '" + name + "'; the disks are chosen by 'names'");
+    if (name != known) {
+      return PlainText(
+          400, "unknown parameter '" + name + "'" +
+                   (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'"));
     }
   }
-  return ToJson(service.QueryDisksForKova(target.ValuesOf("names")));
+  return std::nullopt;
+}
+
+// The body of an operation without parameters: {}.
+void DemandNoParameters(const std::string& body) {
+  const Orbis::Json::Value root = Orbis::Json::Parse(body, Orbis::Limits::Untrusted());
+  if (root.kind != Orbis::Json::Kind::Object) {
+    Refuse(root, "(root)", "an object");
+  }
+  for (const auto& [key, value] : root.members) {
+    throw Orbis::ParseException(key, value.line, "unknown parameter; the operation takes none");
+  }
+}
+
+HttpAnswer GetDisks(const KovaService& service, const HttpTarget& target, const HttpRequest&) {
+  const auto refused = RefuseParameters(target, "names");
+  return refused ? *refused : ToJson(service.QueryDisksForKova(target.ValuesOf("names")));
 }
 
 HttpAnswer PostQueryDisks(const KovaService& service, const HttpTarget&, const HttpRequest& request) {
   return ToJson(service.QueryDisksForKova(ReadNames(request.body)));
+}
+
+using Operation = Answer (KovaService::*)() const;
+
+template <Operation operation>
+HttpAnswer GetPlain(const KovaService& service, const HttpTarget& target, const HttpRequest&) {
+  const auto refused = RefuseParameters(target, "");
+  return refused ? *refused : ToJson((service.*operation)());
+}
+
+template <Operation operation>
+HttpAnswer PostPlain(const KovaService& service, const HttpTarget&, const HttpRequest& request) {
+  DemandNoParameters(request.body);
+  return ToJson((service.*operation)());
 }
 
 struct Entry {
@@ -87,10 +119,14 @@ struct Entry {
   HttpAnswer (*serve)(const KovaService&, const HttpTarget&, const HttpRequest&);
 };
 
-constexpr std::array<Entry, 3> entries = {{
+constexpr std::array<Entry, 7> entries = {{
     {"GET", "/healthz", &Health},
     {"GET", "/api/v1/disks", &GetDisks},
     {"POST", "/api/v1/QueryDisksForKova", &PostQueryDisks},
+    {"GET", "/api/v1/groups", &GetPlain<&KovaService::GetStorageInfo>},
+    {"POST", "/api/v1/GetStorageInfo", &PostPlain<&KovaService::GetStorageInfo>},
+    {"GET", "/api/v1/config", &GetPlain<&KovaService::GetConfigInfo>},
+    {"POST", "/api/v1/GetConfigInfo", &PostPlain<&KovaService::GetConfigInfo>},
 }};
 
 // A content type is demanded of every body: a form of a stranger's page cannot send this one.

@@ -60,6 +60,36 @@ TEST_F(Routes, DisksAreChosenByNamesInTheBody) {
   EXPECT_THAT(FakeHooks::names, IsEmpty());
 }
 
+TEST_F(Routes, GroupsAndConfigurationAreAnsweredByBothTheirRoutes) {
+  Orbis::SerializeObjectToSoap(*Tessa::MakeRef<Nox::Kova::Host::ConfigInfo>(), nullptr,
+                               FakeHooks::resultText);
+  const HttpAnswer answers[] = {Get("/api/v1/groups"), Post("/api/v1/GetStorageInfo", "{}"),
+                                Get("/api/v1/config"), Post("/api/v1/GetConfigInfo", "{}")};
+  for (const HttpAnswer& answer : answers) {
+    EXPECT_EQ(answer.status, 200u);
+    EXPECT_EQ(answer.body, "{\"result\":{\"@type\":\"KovaHostConfigInfo\"},\"fault\":null}\n");
+  }
+  EXPECT_EQ(FakeHooks::calls, 4);
+}
+
+TEST_F(Routes, AReportThatHoldsNothingIsAFault) {
+  const HttpAnswer answer = Get("/api/v1/groups");
+  EXPECT_EQ(answer.status, 500u);
+  EXPECT_THAT(answer.body, HasSubstr("disk groups of the host could not be read"));
+  EXPECT_THAT(Get("/api/v1/config").body, HasSubstr("configuration of the host could not be read"));
+}
+
+TEST_F(Routes, AReportTakesNoParameters) {
+  for (const HttpAnswer& answer :
+       {Get("/api/v1/groups?names=a"), Get("/api/v1/config?names=a"),
+        Post("/api/v1/GetStorageInfo", "{\"names\":[]}"), Post("/api/v1/GetConfigInfo", "{\"names\":[]}")}) {
+    EXPECT_EQ(answer.status, 400u);
+    EXPECT_THAT(answer.body, HasSubstr("names"));
+  }
+  EXPECT_EQ(Post("/api/v1/GetStorageInfo", "[]").status, 400u);
+  EXPECT_EQ(FakeHooks::calls, 0);
+}
+
 TEST_F(Routes, AnUnknownParameterIsRefusedByName) {
   const HttpAnswer inTarget = Get("/api/v1/disks?name=naa.1");
   EXPECT_EQ(inTarget.status, 400u);

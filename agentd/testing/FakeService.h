@@ -31,6 +31,11 @@ struct FakeHooks {
     result += resultText;
   }
 
+  static void Report(std::string& result) {
+    ++calls;
+    result += resultText;
+  }
+
   // One eligible disk of that name.
   static void AnswerWithDisk(const std::string& name) {
     Orbis::DataArray<Nox::Kova::Host::DiskResult> disks;
@@ -50,6 +55,8 @@ inline Host::KovaService AFakeService() {
   FakeHooks::Reset();
   Host::PluginHooks hooks{};
   hooks.queryDisksForKova = &FakeHooks::QueryDisks;
+  hooks.getStorageInfo = &FakeHooks::Report;
+  hooks.getConfigInfo = &FakeHooks::Report;
   return Host::KovaService(hooks);
 }
 

@@ -35,15 +35,16 @@ class RawClient {
   RawClient(const RawClient&) = delete;
   RawClient& operator=(const RawClient&) = delete;
 
-  // Stops quietly when the other side has gone.
-  void Send(std::string_view text) const {
+  // False when the other side had gone before all was sent.
+  bool Send(std::string_view text) const {
     while (!text.empty()) {
       const ssize_t sent = send(_socket, text.data(), text.size(), MSG_NOSIGNAL);
       if (sent <= 0) {
-        return;
+        return false;
       }
       text.remove_prefix(static_cast<std::size_t>(sent));
     }
+    return true;
   }
 
   void EndSending() const { shutdown(_socket, SHUT_WR); }

@@ -8,6 +8,7 @@
 #include <new>
 #include <stdexcept>
 #include <string>
+#include <utility>
 
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaConstants.h"
@@ -84,9 +85,9 @@ class ClingingLogger final : public Tessa::Service::Logger {
     _clings = format == afterProvider;
   }
   void DecRef() const override {
-    Logger::DecRef();
-    if (_clings) {
-      _clings = false;
+    const bool clings = std::exchange(_clings, false);
+    Logger::DecRef();  // may delete the logger
+    if (clings) {
       throw std::runtime_error("the release of a logger failed");
     }
   }

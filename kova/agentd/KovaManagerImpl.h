@@ -11,6 +11,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -78,6 +79,28 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   virtual void UnmountDiskMappingInt(Tessa::Ref<Mapping>& mapping, const std::string& requestTag,
                                      Tessa::Ref<Orbis::MethodFault>& fault);
 
+  // Plans hybrid groups (or, for `allFlash`, all-flash ones) from the disks: new groups round the flash disks
+  // among them, or, without a flash disk that may head a group, more disks for the kernel's groups of that
+  // kind. `mappings` is replaced; `limitReached` says whether nothing could be planned because of a limit. A
+  // throw leaves both as they were. Lets go of the object's own lock, if held, while it asks the agent.
+  void ComputeDiskMappings(Orbis::DataArray<Nox::Host::ScsiDisk>* candidates, bool allFlash,
+                           Tessa::Ref<Orbis::DataArray<Mapping>>& mappings, bool& limitReached);
+  // Plans all-flash groups from the eligible flash disks among the candidates. Appends the names of the disks
+  // it takes: every capacity flash disk, and the cache disks of planned groups. Without any, `mappings` is
+  // null and `limitReached` stays as it was.
+  void ComputeAllFlashDiskMappings(Orbis::DataArray<Nox::Host::ScsiDisk>* candidates,
+                                   Tessa::Ref<Orbis::DataArray<Mapping>>& mappings, Texts& takenNames,
+                                   bool& limitReached);
+  // The same, and the candidates that are left for hybrid groups, in order.
+  void AllFlashDiskMappingSwitch(Orbis::DataArray<Nox::Host::ScsiDisk>* candidates,
+                                 Tessa::Ref<Orbis::DataArray<Mapping>>& mappings,
+                                 Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>>& remaining,
+                                 bool& limitReached);
+  // Appends the kernel's groups that are not mounted and whose cache disk is among the candidates. Disks that
+  // the inventory lacks are null in them.
+  void ComputeNotMountedDiskMappings(Orbis::DataArray<Nox::Host::ScsiDisk>* candidates,
+                                     Tessa::Ref<Orbis::DataArray<Mapping>>& mappings);
+
   // Makes the cache valid, if it is not, by asking the kernel for every disk's record. A failing kernel is
   // a warning and an empty, invalid cache, not an error. Takes the disk-cache lock.
   void RefreshKovaDiskCache();
@@ -97,6 +120,17 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   const std::vector<HostCtl::Kova::DiskResult>& GetDiskCache() const noexcept { return _diskCache; }
 
  private:
+  // The kernel's groups, unmounted ones too; a failing kernel is a warning and none.
+  std::vector<HostCtl::Kova::DiskMapping> KernelGroupsOrNone();
+  // The inventory's disks; without an inventory, a warning and null.
+  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> InventoryOrNone();
+  // The candidates that the kernel calls eligible flash disks, as planning sees them.
+  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> QueryEligibleFlash(
+      const Orbis::DataArray<Nox::Host::ScsiDisk>* candidates);
+  // The kernel's mounted groups, and whether it claims disks on its own; a failing kernel is a warning and no
+  // groups.
+  std::vector<HostCtl::Kova::DiskMapping> ReadStorage(std::optional<bool>& autoClaim);
+
   // In reverse, the order in which a manager goes down: the provider first.
   Tessa::Ref<Tessa::Service::Logger> _logger;
   Tessa::Ref<Util::KovaUtil> _util;

@@ -28,6 +28,23 @@ class AgentAnswers(ProgramTest):
                     self.assertEqual(asked.out, alone.out)
                     self.assertIn("naa.1", asked.out)
 
+    def test_groups_and_configuration_as_a_command_that_hosts_the_plug_in_itself(self):
+        host = self.write("host.json", {
+            **HOST, "faultDomain": "rack-1", "cluster": {"enabled": True, "clusterUuid": "c-1", "nodeUuid": "n-1"},
+            "networks": [{"interface": "otx1", "masterMulticastGroup": "224.1.2.3",
+                          "agentMulticastGroup": "FF19:0:0:0:0:2:3:4"}],
+            "groups": [{"ssd": "naa.1", "capacity": ["naa.2"]}]})
+        self.start_agent("--host", host)
+        for command, texts in (("groups", ("naa.1", "naa.2", "mounted")),
+                               ("config", ("c-1", "n-1", "rack-1", "otx1", "FF19:0:0:0:0:2:3:4"))):
+            for output in ("table", "json", "soap"):
+                with self.subTest(command=command, output=output):
+                    asked = self.ask_agent("-o", output, command)
+                    self.assert_ended(asked, 0)
+                    self.assertEqual(asked.out, self.kovactl("--host", host, "-o", output, command).out)
+                    for text in texts if output == "table" else texts[:1]:
+                        self.assertIn(text, asked.out)
+
     def test_for_the_example_host_when_none_is_named(self):
         self.start_agent()
         self.assertEqual(len(self.ask_agent("-o", "json", "disks").json()), 12)

@@ -73,6 +73,9 @@ class Replay(ProgramTest):
         found = self.answers(QUERY, change, QUERY)
         self.assertEqual(self.states(found[2]), {"naa.1": "eligible", "naa.2": "eligible"})
         self.assertEqual(found[2]["calls"], [])
+        found = self.answers(QUERY, change, {"operation": "GetStorageInfo"}, QUERY)
+        self.assertEqual(self.states(found[3]), {"naa.1": "eligible", "naa.2": "ineligible"})
+        self.assertEqual(found[3]["calls"], [REFRESH, QUERY_DISKS])
 
     def test_asks_again_after_a_refresh_that_failed(self):
         host = {**TWO_DISKS, "faults": [{"operation": "RefreshKovaInfo", "call": 1,

@@ -74,14 +74,6 @@ void KovaManagerImpl::UnmountDiskMapping(const Texts&, const std::string&, std::
   SerializeKovaResultAndFault(resultText, faultText, noResult, fault);
 }
 
-void KovaManagerImpl::GetStorageInfo(std::string&) {
-  LogInternal(_logger, LogLevel::Error, "The operation %1 is not built yet.", "GetStorageInfo");
-}
-
-void KovaManagerImpl::GetConfigInfo(std::string&) {
-  LogInternal(_logger, LogLevel::Error, "The operation %1 is not built yet.", "GetConfigInfo");
-}
-
 void KovaManagerImpl::ClaimUnmountedDiskgroup() {
   LogInternal(_logger, LogLevel::Error, "The operation %1 is not built yet.", "ClaimUnmountedDiskgroup");
 }
@@ -89,18 +81,6 @@ void KovaManagerImpl::ClaimUnmountedDiskgroup() {
 void KovaManagerImpl::InitializeDisksInt(Orbis::DataArray<Mapping>*, const std::string&, Ref<Orbis::Any>&,
                                          Ref<MethodFault>& fault) {
   fault = NotBuilt("InitializeDisksInt");
-}
-
-void KovaManagerImpl::ValidateDiskMapping(Ref<Mapping>, Ref<MapResult>&) {
-  ThrowNotBuilt("ValidateDiskMapping");
-}
-
-void KovaManagerImpl::ValidateDiskMappings(Orbis::DataArray<Mapping>*) {
-  ThrowNotBuilt("ValidateDiskMappings");
-}
-
-bool KovaManagerImpl::DiskMappingExists(Ref<Mapping>) {
-  ThrowNotBuilt("DiskMappingExists");
 }
 
 void KovaManagerImpl::FormatDiskMapping(const std::string&, Texts&, const std::string&, int, int) {

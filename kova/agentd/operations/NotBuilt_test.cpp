@@ -95,13 +95,11 @@ TEST_P(AnswersWithAFaultText, ThatNamesTheOperationBehindWhatTheTextHolds) {
 
 class WritesAnErrorLine : public NotBuilt {};
 
-INSTANTIATE_TEST_SUITE_P(
-    Operations, WritesAnErrorLine,
-    testing::Values(
-        Operation{"GetStorageInfo", [](KovaManagerImpl& m, Desk& d) { m.GetStorageInfo(d.result); }},
-        Operation{"GetConfigInfo", [](KovaManagerImpl& m, Desk& d) { m.GetConfigInfo(d.result); }},
-        Operation{"ClaimUnmountedDiskgroup", [](KovaManagerImpl& m, Desk&) { m.ClaimUnmountedDiskgroup(); }}),
-    NameOf);
+INSTANTIATE_TEST_SUITE_P(Operations, WritesAnErrorLine,
+                         testing::Values(Operation{
+                             "ClaimUnmountedDiskgroup",
+                             [](KovaManagerImpl& m, Desk&) { m.ClaimUnmountedDiskgroup(); }}),
+                         NameOf);
 
 TEST_P(WritesAnErrorLine, ThatNamesTheOperationAndAnswersNothing) {
   _desk.result = "result before";
@@ -136,18 +134,16 @@ class ThrowsAFault : public NotBuilt {};
 
 INSTANTIATE_TEST_SUITE_P(
     Operations, ThrowsAFault,
-    testing::Values(
-        Operation{"ValidateDiskMapping",
-                  [](KovaManagerImpl& m, Desk& d) { m.ValidateDiskMapping(d.mapping, d.mapResult); }},
-        Operation{"ValidateDiskMappings", [](KovaManagerImpl& m, Desk&) { m.ValidateDiskMappings(nullptr); }},
-        Operation{"DiskMappingExists", [](KovaManagerImpl& m, Desk& d) { m.DiskMappingExists(d.mapping); }},
-        Operation{"FormatDiskMapping",
-                  [](KovaManagerImpl& m, Desk& d) { m.FormatDiskMapping(d.text, d.texts, d.text, 1, 0); }},
-        Operation{"RestampDiskMapping",
-                  [](KovaManagerImpl& m, Desk& d) { m.RestampDiskMapping(d.text, d.texts); }},
-        Operation{
-            "InitializeMapping",
-            [](KovaManagerImpl& m, Desk& d) { m.InitializeMapping(d.mapping, d.text, 1, 0, d.mapResult); }}),
+    testing::Values(Operation{"FormatDiskMapping",
+                              [](KovaManagerImpl& m, Desk& d) {
+                                m.FormatDiskMapping(d.text, d.texts, d.text, 1, 0);
+                              }},
+                    Operation{"RestampDiskMapping",
+                              [](KovaManagerImpl& m, Desk& d) { m.RestampDiskMapping(d.text, d.texts); }},
+                    Operation{"InitializeMapping",
+                              [](KovaManagerImpl& m, Desk& d) {
+                                m.InitializeMapping(d.mapping, d.text, 1, 0, d.mapResult);
+                              }}),
     NameOf);
 
 TEST_P(ThrowsAFault, ThatNamesTheOperation) {

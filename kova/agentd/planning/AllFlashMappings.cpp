@@ -1,0 +1,117 @@
+// Plans all-flash groups first, and says which disks are left for hybrid ones.
+//
+// The kernel tags flash disks that are meant for capacity; marshalled for planning they are no cache disks,
+// so the planner of hybrid groups deals them out like hard disks.
+
+#include <string_view>
+#include <unordered_set>
+
+#include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/marshal/DiskResultMarshal.h"
+#include "kova/agentd/planning/DiskMappings.h"
+#include "kova/agentd/query/DiskQuery.h"
+#include "nox/Kova.h"
+#include "orbis/Types.h"
+
+namespace Kovasvc {
+
+using HostCtl::Kova::DiskResult;
+using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapping;
+using Orbis::DataArray;
+using Orbis::MethodFault;
+using Tessa::MakeRef;
+using Tessa::Ref;
+using Tessa::Service::LogInternal;
+using Tessa::Service::LogLevel;
+using Tessa::System::LockGuard;
+
+namespace {
+
+constexpr DiskQueryLimit eligible = {.byState = true,
+                                     .state = HostCtl::Kova::DiskState::Eligible,
+                                     .byReason = false,
+                                     .reason = HostCtl::Kova::DiskReason::None,
+                                     .fifthFlag = false};
+
+}  // namespace
+
+Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryEligibleFlash(const DataArray<ScsiDisk>* candidates) {
+  const auto flash = MakeRef<DataArray<ScsiDisk>>();
+  Ref<DataArray<Nox::Kova::Host::DiskResult>> results;
+  {
+    const LockGuard guard(*_diskCacheLock);
+    const Texts names = NamesOf(candidates);
+    if (names.empty()) {
+      return flash;  // a query without names would answer for every disk of the host
+    }
+    std::vector<DiskResult> records;
+    LimitQueryDisksForKova(*_logger, names, eligible, _diskCache, records);
+    std::erase_if(records, [](const DiskResult& record) { return !record.isSsd && !record.capacityFlash; });
+    MarshalHostCtlDiskResults(*_logger, records, results, false);
+  }
+  for (const Nox::Kova::Host::DiskResult* result : *results) {
+    flash->Append(result->GetDisk());
+  }
+  return flash;
+}
+
+void KovaManagerImpl::ComputeAllFlashDiskMappings(DataArray<ScsiDisk>* candidates,
+                                                  Ref<DataArray<DiskMapping>>& mappings, Texts& takenNames,
+                                                  bool& limitReached) {
+  Ref<DataArray<DiskMapping>> planned;
+  try {
+    const Ref<DataArray<ScsiDisk>> flash = QueryEligibleFlash(candidates);
+    if (flash->IsEmpty()) {
+      mappings = nullptr;
+      return;
+    }
+    LogInternal(_logger, LogLevel::Verbose, "Queried %1 All-Flash eligible disks to be added to KOVA",
+                flash->Size());
+    for (const ScsiDisk* disk : *flash) {
+      if (!IsSsd(disk)) {
+        takenNames.push_back(NameOf(disk));
+      }
+    }
+    ComputeDiskMappings(flash.Get(), true, planned, limitReached);
+    LogInternal(_logger, LogLevel::Verbose,
+                "Computed %1 All-Flash mappings from the queried %2 disks for KOVA", planned->Size(),
+                flash->Size());
+    LogDiskMappings(*_logger, planned.Get());
+    for (const DiskMapping* mapping : *planned) {
+      takenNames.push_back(NameOf(mapping->GetSsd().Get()));
+    }
+  } catch (const MethodFault::Exception& exception) {
+    LogInternal(_logger, LogLevel::Verbose, "Got fault %1", exception.what());
+  }
+  mappings = planned;
+}
+
+void KovaManagerImpl::AllFlashDiskMappingSwitch(DataArray<ScsiDisk>* candidates,
+                                                Ref<DataArray<DiskMapping>>& mappings,
+                                                Ref<DataArray<ScsiDisk>>& remaining, bool& limitReached) {
+  const auto left = MakeRef<DataArray<ScsiDisk>>();
+  Ref<DataArray<DiskMapping>> planned;
+  Texts takenNames;
+  try {
+    ComputeAllFlashDiskMappings(candidates, planned, takenNames, limitReached);
+  } catch (const MethodFault::Exception& exception) {
+    LogInternal(_logger, LogLevel::Verbose, "Got fault %1", exception.what());
+    remaining = Ref<DataArray<ScsiDisk>>(candidates);
+    mappings = nullptr;
+    return;
+  }
+  const std::unordered_set<std::string_view> taken(takenNames.begin(), takenNames.end());
+  if (candidates != nullptr) {
+    for (ScsiDisk* disk : *candidates) {
+      if (!taken.contains(NameOf(disk))) {
+        left->Append(disk);
+      }
+    }
+  }
+  mappings = planned;
+  remaining = left;
+}
+
+}  // namespace Kovasvc

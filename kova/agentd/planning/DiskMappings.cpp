@@ -1,0 +1,88 @@
+#include "kova/agentd/planning/DiskMappings.h"
+
+#include <algorithm>
+
+#include "nox/Kova.h"
+#include "tessa/Throwable.h"
+
+namespace Kovasvc {
+
+using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapping;
+using Orbis::DataArray;
+using Tessa::NotInitializedException;
+using Tessa::Service::LogInternal;
+using Tessa::Service::LogLevel;
+
+const std::string& NameOf(const ScsiDisk* disk) {
+  if (disk == nullptr) {
+    NotInitializedException::ThrowNotInitialized();
+  }
+  return disk->GetCanonicalName();
+}
+
+bool IsSsd(const ScsiDisk* disk) {
+  if (disk == nullptr) {
+    NotInitializedException::ThrowOptionalNotSet();
+  }
+  return disk->GetSsd();
+}
+
+std::string NameForLog(const ScsiDisk* disk) {
+  return disk != nullptr && disk->HasCanonicalName() ? disk->GetCanonicalName() : "<unset>";
+}
+
+std::vector<std::string> NamesOf(const DataArray<ScsiDisk>* disks) {
+  std::vector<std::string> names;
+  if (disks != nullptr) {
+    names.reserve(disks->Size());
+    for (const ScsiDisk* disk : *disks) {
+      names.push_back(NameOf(disk));
+    }
+  }
+  return names;
+}
+
+std::string JoinNames(const std::vector<std::string>& names) {
+  std::string joined;
+  for (const std::string& name : names) {
+    joined += (&name == &names.front() ? "" : ", ") + name;
+  }
+  return joined;
+}
+
+void AppendDeviceNames(const DiskMapping& mapping, std::vector<std::string>& names) {
+  const auto appendNameOf = [&names](const ScsiDisk* disk) {
+    const std::string& name = NameOf(disk);
+    if (!name.empty()) {
+      names.push_back(name);
+    }
+  };
+  appendNameOf(mapping.GetSsd().Get());
+  if (mapping.GetNonSsd()) {
+    for (const ScsiDisk* disk : *mapping.GetNonSsd()) {
+      appendNameOf(disk);
+    }
+  }
+}
+
+void DiskMappingToDeviceNames(const Tessa::Ref<DiskMapping>& mapping, std::vector<std::string>& names) {
+  AppendDeviceNames(*mapping, names);
+  std::sort(names.begin(), names.end());
+}
+
+void LogDiskMappings(Tessa::Service::Logger& logger, const DataArray<DiskMapping>* mappings) {
+  if (mappings == nullptr) {
+    return;
+  }
+  std::size_t index = 0;
+  for (const DiskMapping* mapping : *mappings) {
+    const std::string& ssd = NameOf(mapping->GetSsd().Get());
+    const std::string disks = JoinNames(NamesOf(mapping->GetNonSsd().Get()));
+    LogInternal(logger, LogLevel::Verbose, "%1: Mapping[%2]: { SSD: %3, MDs: %4 }", "LogDiskMappings", index,
+                ssd, disks);
+    ++index;
+  }
+}
+
+}  // namespace Kovasvc

@@ -1,0 +1,122 @@
+// Requested disk groups beside those that the kernel already has.
+
+#include <algorithm>
+#include <string_view>
+#include <unordered_set>
+
+#include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/include/HostCtlException.h"
+#include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/marshal/DiskInventory.h"
+#include "kova/agentd/planning/DiskMappings.h"
+#include "kova/agentd/query/DiskQuery.h"
+#include "nox/Kova.h"
+
+namespace Kovasvc {
+
+using HostCtl::Kova::DiskName;
+using HostCtl::Kova::DiskReason;
+using HostCtl::Kova::DiskResult;
+using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapping;
+using Orbis::DataArray;
+using Tessa::MakeRef;
+using Tessa::Ref;
+using Tessa::Service::LogInternal;
+using Tessa::Service::LogLevel;
+using Tessa::System::LockGuard;
+
+namespace {
+
+// How a request names one of the kernel's disks, also one that has left.
+std::string RequestNameOf(const DiskName& disk) {
+  return disk.deviceName.empty() ? "kova:" + disk.kovaUuid : disk.deviceName;
+}
+
+// Whether the kernel's group is the requested one. One-sided on purpose: as many disks, and each of the
+// kernel's among the requested; a request that names one disk twice and omits another can match.
+bool IsRequested(const HostCtl::Kova::DiskMapping& group, const std::string& ssd,
+                 const std::unordered_set<std::string_view>& requested, std::size_t requestedCount) {
+  return group.ssd.deviceName == ssd && group.capacityDisks.size() == requestedCount &&
+         std::all_of(group.capacityDisks.begin(), group.capacityDisks.end(),
+                     [&](const DiskName& disk) { return requested.contains(RequestNameOf(disk)); });
+}
+
+// The group with the inventory's disks; null where the inventory has none.
+Ref<DiskMapping> FromInventory(const HostCtl::Kova::DiskMapping& group, const DiskInventory& inventory) {
+  const auto mapping = MakeRef<DiskMapping>();
+  Ref<ScsiDisk> ssd;
+  inventory.Find(group.ssd.deviceName, ssd);
+  mapping->SetSsd(ssd);
+  const auto disks = MakeRef<DataArray<ScsiDisk>>();
+  for (const DiskName& name : group.capacityDisks) {
+    Ref<ScsiDisk> disk;
+    inventory.Find(name.deviceName, disk);
+    disks->Append(disk);
+  }
+  mapping->SetNonSsd(disks);
+  return mapping;
+}
+
+}  // namespace
+
+bool KovaManagerImpl::DiskMappingExists(Ref<DiskMapping> mapping) {
+  const std::string ssd = NameOf(mapping->GetSsd().Get());
+  const Texts names = NamesOf(mapping->GetNonSsd().Get());
+  if (names.empty()) {
+    return false;
+  }
+  try {
+    std::vector<HostCtl::Kova::DiskMapping> groups;
+    _provider->GetDiskMappings(groups, false);
+    const std::unordered_set<std::string_view> requested(names.begin(), names.end());
+    return std::any_of(groups.begin(), groups.end(), [&](const HostCtl::Kova::DiskMapping& group) {
+      return IsRequested(group, ssd, requested, names.size());
+    });
+  } catch (const HostCtl::Lib::HostCtlException& exception) {
+    LogInternal(_logger, LogLevel::Warning, "Failed to validate disk mapping: %1", exception.Describe());
+    return false;
+  }
+}
+
+void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candidates,
+                                                    Ref<DataArray<DiskMapping>>& mappings) {
+  Texts ssdNames;
+  if (candidates != nullptr) {
+    for (const ScsiDisk* disk : *candidates) {
+      if (IsSsd(disk)) {
+        ssdNames.push_back(NameOf(disk));
+      }
+    }
+  }
+  if (ssdNames.empty()) {
+    return;  // a query without names would answer for every disk of the host
+  }
+  std::vector<DiskResult> records;
+  {
+    const LockGuard guard(*_diskCacheLock);
+    LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), _diskCache, records);
+  }
+  std::unordered_set<std::string_view> notMounted;
+  for (const DiskResult& record : records) {
+    if (record.isSsd && record.reason == DiskReason::GroupNotMounted) {
+      notMounted.insert(record.name);
+    }
+  }
+  if (notMounted.empty()) {
+    return;
+  }
+  const std::vector<HostCtl::Kova::DiskMapping> groups = KernelGroupsOrNone();
+  const Ref<DataArray<ScsiDisk>> disks = InventoryOrNone();
+  if (!disks) {
+    return;
+  }
+  const DiskInventory inventory(disks);
+  for (const HostCtl::Kova::DiskMapping& group : groups) {
+    if (notMounted.contains(group.ssd.deviceName)) {
+      mappings->Append(FromInventory(group, inventory));
+    }
+  }
+}
+
+}  // namespace Kovasvc

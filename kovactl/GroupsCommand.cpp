@@ -1,0 +1,69 @@
+#include "kovactl/GroupsCommand.h"
+
+#include <ostream>
+
+#include "kovactl/Print.h"
+#include "kovactl/Table.h"
+#include "kovactl/Words.h"
+#include "nox/Kova.h"
+
+namespace Kovactl {
+namespace {
+
+using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapInfo;
+using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
+
+void AddDisk(Table& table, const std::string& group, const std::string& role, const ScsiDisk* disk,
+             const std::string& state) {
+  if (disk == nullptr) {
+    table.AddRow({group, role, "(missing)", "", "", state, ""});
+    return;
+  }
+  table.AddRow({group, role, disk->HasCanonicalName() ? disk->GetCanonicalName() : "", KindOf(*disk),
+                SizeOf(*disk), state, disk->HasDisplayName() ? disk->GetDisplayName() : ""});
+}
+
+void PrintTable(const StorageInfo& info, std::ostream& out) {
+  using Align = Table::Align;
+  Table table({{"GROUP", Align::Right},
+               {"ROLE"},
+               {"DISK"},
+               {"KIND"},
+               {"SIZE", Align::Right},
+               {"STATE"},
+               {"DESCRIPTION"}});
+  std::size_t number = 0;
+  const auto& groups = info.GetDiskMapInfo();
+  if (groups) {
+    for (const DiskMapInfo* group : *groups) {
+      const auto& mapping = group->GetMapping();
+      AddDisk(table, std::to_string(++number), "cache", mapping->GetSsd().Get(),
+              group->GetMounted() ? "mounted" : "not mounted");
+      if (mapping->GetNonSsd()) {
+        for (const ScsiDisk* disk : *mapping->GetNonSsd()) {
+          AddDisk(table, "", "capacity", disk, "");
+        }
+      }
+    }
+  }
+  if (number > 0) {
+    table.Print(out);
+    out << "\n";
+  }
+  out << number << (number == 1 ? " disk group" : " disk groups");
+  if (info.HasAutoClaim()) {
+    out << "; the host "
+        << (info.GetAutoClaim() ? "claims disks on its own" : "waits to be told which disks to claim");
+  }
+  out << "\n";
+}
+
+}  // namespace
+
+ExitStatus RunGroups(const Connection& connection, const std::string& output, std::ostream& out,
+                     std::ostream& err) {
+  return PrintAnswer<StorageInfo>(connection.GetStorageInfo(), output, out, err, &PrintTable);
+}
+
+}  // namespace Kovactl

@@ -1,0 +1,100 @@
+#include "kovactl/GroupsCommand.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+#include "kovactl/testing/FakeConnection.h"
+#include "nox/Kova.h"
+#include "orbis/Engine.h"
+#include "orbis/Json.h"
+
+namespace Kovactl {
+namespace {
+
+using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapInfo;
+using Orbis::DataArray;
+using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
+using Tessa::MakeRef;
+using Tessa::Ref;
+
+Ref<ScsiDisk> ADisk(const std::string& name, bool ssd) {
+  const auto disk = MakeRef<ScsiDisk>();
+  disk->SetCanonicalName(name);
+  disk->SetSsd(ssd);
+  disk->GetCapacity()->SetBlockSize(512);
+  disk->GetCapacity()->SetBlock(std::int64_t{1} << 21);
+  return disk;
+}
+
+Ref<DiskMapInfo> AGroup(const std::string& ssd, const std::vector<std::string>& capacity, bool mounted) {
+  const auto disks = MakeRef<DataArray<ScsiDisk>>();
+  for (const std::string& name : capacity) {
+    disks->Append(ADisk(name, false));
+  }
+  const auto group = MakeRef<DiskMapInfo>();
+  group->GetMapping()->SetSsd(ADisk(ssd, true));
+  group->GetMapping()->SetNonSsd(disks);
+  group->SetMounted(mounted);
+  return group;
+}
+
+class GroupsCommand : public testing::Test {
+ protected:
+  GroupsCommand() : _info(MakeRef<StorageInfo>()) { _connection.answer.result = _info; }
+
+  ExitStatus Run(const std::string& output = "table") { return RunGroups(_connection, output, _out, _err); }
+
+  Testing::FakeConnection _connection;
+  Ref<StorageInfo> _info;
+  std::ostringstream _out;
+  std::ostringstream _err;
+};
+
+TEST_F(GroupsCommand, PrintsEachGroupWithItsDisks) {
+  const auto groups = MakeRef<DataArray<DiskMapInfo>>();
+  groups->Append(AGroup("naa.1", {"naa.2", "naa.3"}, true));
+  groups->Append(AGroup("naa.4", {"naa.5"}, false));
+  _info->SetDiskMapInfo(groups);
+  _info->SetAutoClaim(false);
+  EXPECT_EQ(Run(), ExitStatus::Done);
+  EXPECT_EQ(_out.str(),
+            "GROUP  ROLE      DISK   KIND          SIZE  STATE\n"
+            "    1  cache     naa.1  flash      1.0 GiB  mounted\n"
+            "       capacity  naa.2  hard disk  1.0 GiB\n"
+            "       capacity  naa.3  hard disk  1.0 GiB\n"
+            "    2  cache     naa.4  flash      1.0 GiB  not mounted\n"
+            "       capacity  naa.5  hard disk  1.0 GiB\n"
+            "\n"
+            "2 disk groups; the host waits to be told which disks to claim\n");
+}
+
+TEST_F(GroupsCommand, SaysThatThereAreNone) {
+  _info->SetAutoClaim(true);
+  EXPECT_EQ(Run(), ExitStatus::Done);
+  EXPECT_EQ(_out.str(), "0 disk groups; the host claims disks on its own\n");
+}
+
+TEST_F(GroupsCommand, LeavesOutWhatTheHostDidNotSay) {
+  EXPECT_EQ(Run(), ExitStatus::Done);
+  EXPECT_EQ(_out.str(), "0 disk groups\n");
+}
+
+TEST_F(GroupsCommand, PrintsTheObjectForScripts) {
+  _info->SetAutoClaim(true);
+  EXPECT_EQ(Run("json"), ExitStatus::Done);
+  const auto read = Orbis::ReadJson(_out.str(), Orbis::Limits::OwnOutput(), &StorageInfo::StaticType());
+  EXPECT_TRUE(Orbis::Equal(read.Get(), _info.Get()));
+}
+
+TEST_F(GroupsCommand, ExplainsAFault) {
+  _connection.answer = Host::FailedWith("no host");
+  EXPECT_EQ(Run(), ExitStatus::Fault);
+  EXPECT_EQ(_out.str(), "");
+  EXPECT_THAT(_err.str(), testing::HasSubstr("no host"));
+}
+
+}  // namespace
+}  // namespace Kovactl

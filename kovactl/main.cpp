@@ -128,7 +128,7 @@ ExitStatus Run(const Action& action) {
 
 int main(int argc, char** argv) {
   CLI::App cli("Look at a KOVA host and change it", "kovactl");
-  cli.require_subcommand(1);
+  cli.require_subcommand(0, 1);  // a word that is no command is then named in the refusal
   cli.fallthrough();
   Options options;
   Action action;
@@ -143,6 +143,10 @@ int main(int argc, char** argv) {
     cli.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
     return static_cast<int>(cli.exit(error) == 0 ? ExitStatus::Done : ExitStatus::BadInput);
+  }
+  if (!action) {
+    std::cerr << cli.help();
+    return static_cast<int>(ExitStatus::BadInput);
   }
   const ExitStatus status = Run(action);
   std::cout.flush();

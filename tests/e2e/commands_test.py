@@ -59,8 +59,9 @@ class OneProcess(ProgramTest):
                 "unix:PATH": ("--agent", "http://localhost", "disks"),
                 "--agent": ("--agent", "unix:/a", "--host", host, "disks"),
                 "xml": ("--host", host, "-o", "xml", "disks"),
-                "A subcommand is required": (),
-                "Run with --help": ("fly",),
+                "Subcommands:": (),
+                "A subcommand is required": ("host",),
+                "not expected: fly": ("fly",),
         }.items():
             with self.subTest(told):
                 outcome = self.kovactl(*arguments)

@@ -4,64 +4,31 @@
 
 #include <benchmark/benchmark.h>
 
-#include <memory>
+#include <string>
+#include <vector>
 
-#include "bench/Hosts.h"
-#include "host/AgentApp.h"
-#include "host/Inventory.h"
-#include "host/LogSink.h"
-#include "kova/agentd/KovaLibManager.h"
-#include "kova/agentd/KovaManagerImpl.h"
-#include "nox/Host.h"
+#include "bench/ManagerFixture.h"
 #include "nox/Kova.h"
 #include "orbis/Soap.h"
-#include "otxctl/ProviderFactory.h"
-#include "otxctl/sim/SimProvider.h"
-#include "tessa/App.h"
 
 namespace {
 
+using Bench::CountDisks;
+
 // A manager over a host of so many disks.
-class Fixture {
+class Fixture : public Bench::ManagerFixture {
  public:
-  explicit Fixture(int disks) {
-    const OtxCtl::Sim::HostDescription description = Bench::HostWithDisks(disks);
-    const auto host = std::make_shared<OtxCtl::Sim::SimHost>(description);
-    const auto inventory = Tessa::MakeRef<Host::Inventory>();
-    inventory->Replace(Host::DescribeInventory(description));
-    _app.SetObject("storageSystem", inventory);
-    Tessa::Service::SetApp(&_app);
-    OtxCtl::Kova::SetProviderFactory([host] { return std::make_unique<OtxCtl::Sim::SimProvider>(host); });
-    auto logger = Host::MakeConsoleLogger(Tessa::Service::LogLevel::Warning);
-    _manager = Tessa::MakeRef<Kovasvc::KovaManagerImpl>(logger);
-  }
-  ~Fixture() {
-    _manager.Reset();
-    OtxCtl::Kova::SetProviderFactory({});
-    Tessa::Service::SetApp(nullptr);
-  }
-  Fixture(const Fixture&) = delete;
-  Fixture& operator=(const Fixture&) = delete;
+  explicit Fixture(int disks) : ManagerFixture(Bench::HostWithDisks(disks)) {}
 
   // The cache is invalidated first, as it is after every change of the host.
   std::string Query(std::vector<std::string>& names) {
     std::string fault;
     std::string result;
-    _manager->InvalidateKovaDiskCache();
-    _manager->QueryDisksForKova(names, fault, result);
+    Manager().InvalidateKovaDiskCache();
+    Manager().QueryDisksForKova(names, fault, result);
     return result;
   }
-
- private:
-  Host::AgentApp _app;
-  Tessa::Ref<Kovasvc::KovaManagerImpl> _manager;
 };
-
-void CountDisks(benchmark::State& state) {
-  state.counters["per disk"] =
-      benchmark::Counter(static_cast<double>(state.range(0)) * static_cast<double>(state.iterations()),
-                         benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
-}
 
 void QueryAll(benchmark::State& state) {
   Fixture fixture(static_cast<int>(state.range(0)));

@@ -61,15 +61,26 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
                                    std::string& resultText);
   virtual void UnmountDiskMapping(const Texts& mappings, const std::string& requestTag,
                                   std::string& faultText, std::string& resultText);
+  // The mounted disk groups, of which disks, and whether disks are claimed automatically. What cannot be read
+  // is a warning and missing, never a fault. The disk cache is invalid afterwards.
   virtual void GetStorageInfo(std::string& resultText);
+  // Cluster, network and fault domain, each missing by itself when it cannot be read; never a fault.
   virtual void GetConfigInfo(std::string& resultText);
   virtual void ClaimUnmountedDiskgroup();
   // The kernel's mounted disk groups, appended. Provider exceptions pass.
   virtual void GetKovaDiskMapping(std::vector<HostCtl::Kova::DiskMapping>& mappings);
   virtual void InitializeDisksInt(Orbis::DataArray<Mapping>* mappings, const std::string& requestTag,
                                   Tessa::Ref<Orbis::Any>& result, Tessa::Ref<Orbis::MethodFault>& fault);
+  // Checks one group of a request. `result` holds an object, whose fields are filled: the group, the results
+  // of its disks as far as the kernel knows them, and the first fault found, or null. Throws
+  // Tessa::NotInitializedException for a disk without a name or an SSD without its flag, and
+  // Orbis::Fault::SystemError::Exception without an inventory; `result` is then as it was. Takes the
+  // disk-cache lock.
   virtual void ValidateDiskMapping(Tessa::Ref<Mapping> mapping, Tessa::Ref<MapResult>& result);
+  // Checks a request as a whole. Throws Nox::Fault::InsufficientDisks::Exception when it names fewer than two
+  // disks, Nox::Fault::DuplicateDisks::Exception when it names one twice.
   virtual void ValidateDiskMappings(Orbis::DataArray<Mapping>* mappings);
+  // Whether the kernel has that mounted group already; false, with a warning, when it cannot say.
   virtual bool DiskMappingExists(Tessa::Ref<Mapping> mapping);
   virtual void FormatDiskMapping(const std::string& ssdName, Texts& nonSsdNames,
                                  const std::string& requestTag, int mappingCount, int mappingIndex);

@@ -1,0 +1,55 @@
+// The plug-in's manager over a simulated host, for benchmarks.
+#pragma once
+
+#include <benchmark/benchmark.h>
+
+#include <memory>
+
+#include "bench/Hosts.h"
+#include "host/AgentApp.h"
+#include "host/Inventory.h"
+#include "host/LogSink.h"
+#include "kova/agentd/KovaManagerImpl.h"
+#include "nox/Host.h"
+#include "otxctl/ProviderFactory.h"
+#include "otxctl/sim/SimProvider.h"
+#include "tessa/App.h"
+
+namespace Bench {
+
+// One at a time: it installs itself as the process's application and provider.
+class ManagerFixture {
+ public:
+  explicit ManagerFixture(const OtxCtl::Sim::HostDescription& description) {
+    const auto host = std::make_shared<OtxCtl::Sim::SimHost>(description);
+    const auto inventory = Tessa::MakeRef<Host::Inventory>();
+    inventory->Replace(Host::DescribeInventory(description));
+    _app.SetObject("storageSystem", inventory);
+    Tessa::Service::SetApp(&_app);
+    OtxCtl::Kova::SetProviderFactory([host] { return std::make_unique<OtxCtl::Sim::SimProvider>(host); });
+    auto logger = Host::MakeConsoleLogger(Tessa::Service::LogLevel::Warning);
+    _manager = Tessa::MakeRef<Kovasvc::KovaManagerImpl>(logger);
+  }
+  ~ManagerFixture() {
+    _manager.Reset();
+    OtxCtl::Kova::SetProviderFactory({});
+    Tessa::Service::SetApp(nullptr);
+  }
+  ManagerFixture(const ManagerFixture&) = delete;
+  ManagerFixture& operator=(const ManagerFixture&) = delete;
+
+  Kovasvc::KovaManagerImpl& Manager() { return *_manager; }
+
+ private:
+  Host::AgentApp _app;
+  Tessa::Ref<Kovasvc::KovaManagerImpl> _manager;
+};
+
+// Reports the time per disk; the benchmark's first argument is their number.
+inline void CountDisks(benchmark::State& state) {
+  state.counters["per disk"] =
+      benchmark::Counter(static_cast<double>(state.range(0)) * static_cast<double>(state.iterations()),
+                         benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
+}
+
+}  // namespace Bench

@@ -10,6 +10,7 @@
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "kova/agentd/planning/DiskMappings.h"
+#include "kova/agentd/planning/pure/AllFlashPlan.h"
 #include "kova/agentd/query/DiskQuery.h"
 #include "nox/Kova.h"
 #include "orbis/Types.h"
@@ -48,7 +49,9 @@ Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryEligibleFlash(const DataArray<Scs
     }
     std::vector<DiskResult> records;
     LimitQueryDisksForKova(*_logger, names, eligible, _diskCache, records);
-    std::erase_if(records, [](const DiskResult& record) { return !record.isSsd && !record.capacityFlash; });
+    std::erase_if(records, [](const DiskResult& record) {
+      return !Planning::IsFlash(record.isSsd, record.capacityFlash);
+    });
     MarshalHostCtlDiskResults(*_logger, records, results, false);
   }
   for (const Nox::Kova::Host::DiskResult* result : *results) {
@@ -69,10 +72,12 @@ void KovaManagerImpl::ComputeAllFlashDiskMappings(DataArray<ScsiDisk>* candidate
     }
     LogInternal(_logger, LogLevel::Verbose, "Queried %1 All-Flash eligible disks to be added to KOVA",
                 flash->Size());
+    std::vector<bool> flashIsCache;
     for (const ScsiDisk* disk : *flash) {
-      if (!IsSsd(disk)) {
-        takenNames.push_back(NameOf(disk));
-      }
+      flashIsCache.push_back(IsSsd(disk));
+    }
+    for (const std::size_t position : Planning::TakenForCapacity(flashIsCache)) {
+      takenNames.push_back(NameOf((*flash)[position]));
     }
     ComputeDiskMappings(flash.Get(), true, planned, limitReached);
     LogInternal(_logger, LogLevel::Verbose,

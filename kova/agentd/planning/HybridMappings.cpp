@@ -50,16 +50,18 @@ struct Tally {
   std::vector<std::size_t> counts;
 };
 
-// The kernel's groups that may be extended: of the wanted kind, not held back by the kernel, and with their
-// cache disk in the inventory.
+// The kernel's groups that may be extended and whose cache disk is in the inventory.
 Tally ExtendableGroups(const std::vector<HostCtl::Kova::DiskMapping>& groups, bool allFlash,
                        const DiskInventory& inventory) {
-  Tally tally;
+  std::vector<Planning::ExistingGroup> existing;
   for (const HostCtl::Kova::DiskMapping& group : groups) {
+    existing.push_back({.allFlash = group.allFlash, .heldBack = group.thirdFlag});
+  }
+  Tally tally;
+  for (const std::size_t position : Planning::ExtendableGroups(existing, allFlash)) {
+    const HostCtl::Kova::DiskMapping& group = groups[position];
     Ref<ScsiDisk> ssd;
-    if (group.allFlash == allFlash && !group.thirdFlag) {
-      inventory.Find(group.ssd.deviceName, ssd);
-    }
+    inventory.Find(group.ssd.deviceName, ssd);
     if (ssd) {
       tally.ssds.push_back(ssd);
       tally.counts.push_back(group.capacityDisks.size());

@@ -18,6 +18,16 @@ Roles AssignRoles(const std::vector<bool>& candidateIsSsd, std::size_t existingG
   return roles;
 }
 
+std::vector<std::size_t> ExtendableGroups(const std::vector<ExistingGroup>& groups, bool allFlash) {
+  std::vector<std::size_t> extendable;
+  for (std::size_t i = 0; i < groups.size(); ++i) {
+    if (groups[i].allFlash == allFlash && !groups[i].heldBack) {
+      extendable.push_back(i);
+    }
+  }
+  return extendable;
+}
+
 Deal DealCapacityDisks(std::vector<std::size_t> counts, std::size_t disks) {
   constexpr std::size_t none = static_cast<std::size_t>(-1);
   Deal deal;

@@ -21,6 +21,15 @@ struct Roles {
 // Takes flash disks in order as long as their groups and the existing ones are not too many.
 Roles AssignRoles(const std::vector<bool>& candidateIsSsd, std::size_t existingGroups);
 
+// A group that the kernel already has, as far as planning asks.
+struct ExistingGroup {
+  bool allFlash = false;
+  bool heldBack = false;  // the kernel does not want it to be extended
+};
+
+// Which of the groups may be given more disks: those of the wanted kind that are not held back, in order.
+std::vector<std::size_t> ExtendableGroups(const std::vector<ExistingGroup>& groups, bool allFlash);
+
 // Which capacity disk goes to which entry.
 struct Deal {
   struct Share {

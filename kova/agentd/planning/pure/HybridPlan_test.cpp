@@ -35,6 +35,14 @@ TEST(AssignRoles, TakesTheFirstFlashDisksUpToFiveGroupsAltogether) {
   EXPECT_THAT(AssignRoles(Ssds(1, 0), 6).ssds, IsEmpty());
 }
 
+TEST(ExtendableGroups, AreThoseOfTheKindThatAreNotHeldBack) {
+  const std::vector<ExistingGroup> groups = {
+      {.allFlash = false}, {.allFlash = true}, {.allFlash = false, .heldBack = true}, {.allFlash = false}};
+  EXPECT_THAT(ExtendableGroups(groups, false), ElementsAre(0, 3));
+  EXPECT_THAT(ExtendableGroups(groups, true), ElementsAre(1));
+  EXPECT_THAT(ExtendableGroups({}, false), IsEmpty());
+}
+
 TEST(DealCapacityDisks, GoesRoundTheEntriesInOrder) {
   const Deal deal = DealCapacityDisks({0, 0}, 5);
   ASSERT_EQ(deal.shares.size(), 2u);

@@ -53,11 +53,21 @@ tidy:
 	@cmake --build --preset dev -j $(JOBS)
 	@tools/lint/tidy_changed.sh build/dev $(BASE)
 
-asan tsan:
+asan:
 	@$(SETUP) build test
-	@cmake --preset $@ >/dev/null
-	@cmake --build --preset $@ -j $(JOBS)
-	@cd build/$@ && $(CTEST)
+	@cmake --preset asan >/dev/null
+	@cmake --build --preset asan -j $(JOBS)
+	@cd build/asan && $(CTEST)
+
+# The thread sanitizer, on the tests in which threads meet.
+TSAN_TESTS := tessa_test otxctl_test otxctl_fault_test otxctl_contract_test kova_agentd_test kova_module_test agentd_test
+
+tsan:
+	@$(SETUP) build test
+	@cmake --preset tsan >/dev/null
+	@cmake --build --preset tsan -j $(JOBS) --target $(TSAN_TESTS)
+	@set -e; for test in $(TSAN_TESTS); do echo "$$test under the thread sanitizer"; \
+	  build/tsan/test/$$test --gtest_brief=1; done
 
 # A short run of every fuzz target; a finding is a failure.
 fuzz:

@@ -20,13 +20,14 @@ namespace Bench {
 // One at a time: it installs itself as the process's application and provider.
 class ManagerFixture {
  public:
-  explicit ManagerFixture(const OtxCtl::Sim::HostDescription& description) {
-    const auto host = std::make_shared<OtxCtl::Sim::SimHost>(description);
+  explicit ManagerFixture(const OtxCtl::Sim::HostDescription& description)
+      : _host(std::make_shared<OtxCtl::Sim::SimHost>(description)) {
     const auto inventory = Tessa::MakeRef<Host::Inventory>();
     inventory->Replace(Host::DescribeInventory(description));
     _app.SetObject("storageSystem", inventory);
     Tessa::Service::SetApp(&_app);
-    OtxCtl::Kova::SetProviderFactory([host] { return std::make_unique<OtxCtl::Sim::SimProvider>(host); });
+    OtxCtl::Kova::SetProviderFactory(
+        [host = _host] { return std::make_unique<OtxCtl::Sim::SimProvider>(host); });
     auto logger = Host::MakeConsoleLogger(Tessa::Service::LogLevel::Warning);
     _manager = Tessa::MakeRef<Kovasvc::KovaManagerImpl>(logger);
   }
@@ -39,8 +40,11 @@ class ManagerFixture {
   ManagerFixture& operator=(const ManagerFixture&) = delete;
 
   Kovasvc::KovaManagerImpl& Manager() { return *_manager; }
+  // The kernel, past the manager.
+  OtxCtl::Sim::SimHost& Kernel() { return *_host; }
 
  private:
+  std::shared_ptr<OtxCtl::Sim::SimHost> _host;
   Host::AgentApp _app;
   Tessa::Ref<Kovasvc::KovaManagerImpl> _manager;
 };

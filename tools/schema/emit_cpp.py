@@ -2,6 +2,8 @@
 
 import os
 
+from schema import Field, Type
+
 BANNER = "// Generated from {origin}. Changes here are lost; change the schema.\n"
 
 SCALARS = {
@@ -264,14 +266,30 @@ def header(schema, module, file_, types, needs):
     return lines + ["}  // namespace Orbis"]
 
 
-def source(schema, module, file_, types):
+def source(schema, module, file_, types, registered=True):
     lines = [BANNER.format(origin=types[0].origin_name), f'#include "{module}/{file_}.h"', "", "#include <utility>", ""]
     lines += ['#include "orbis/FaultText.h"', '#include "orbis/FieldAccess.h"', '#include "tessa/Throwable.h"', ""]
     lines += ["namespace Orbis {"] + [f"template class DataArray<::{t.cpp}>;" for t in types] + ["}  // namespace Orbis", ""]
     lines += wrapped(schema, in_order(schema, types), lambda t: define_class(schema, t))
+    if not registered:
+        return lines
     names = ",\n    ".join(f"&::{t.cpp}::StaticType" for t in types)
     lines += ["", "namespace {", f"const ::Orbis::TypeRegistration registration({{\n    {names}}});", "}  // namespace"]
     return lines
+
+
+def messages(schema, origin):
+    """The elements that carry an operation's parameters and answers, as types that no text can name."""
+    types = []
+    for o in schema.operations:
+        request = Type(o.name, f"Nox::Operation::{o.name}", "DataObject", False, False, "Operations", origin, o.doc)
+        request.fields = o.parameters
+        answer = Type(f"{o.name}Response", f"{request.cpp}Response", "DataObject", False, False, "Operations", origin)
+        if o.returns:
+            answer.fields.append(Field("returnval", o.returns, not o.returns_list, o.returns_list))
+        answer.fields.append(Field("fault", "MethodFault", True, False))
+        types += [request, answer]
+    return types
 
 
 def write(path, lines):
@@ -301,6 +319,11 @@ def emit(schema, origin, module, out_dir):
         write(f"{out_dir}/{module}/{file_}.h", header(schema, module, file_, types, needs))
         write(f"{out_dir}/{module}/{file_}.cpp", source(schema, module, file_, types))
         needs = needs + [f"{module}/{file_}.h"]
+    if wrappers := messages(schema, origin):
+        for type_ in wrappers:
+            type_.origin_name = f"{module}/schema/{os.path.basename(origin)}"
+        write(f"{out_dir}/{module}/Operations.h", header(schema, module, "Operations", wrappers, needs))
+        write(f"{out_dir}/{module}/Operations.cpp", source(schema, module, "Operations", wrappers, registered=False))
     if module != "orbis":
         lines = [BANNER.format(origin=mine[0].origin_name), "#pragma once", ""] + forward_declarations(schema, mine)
         write(f"{out_dir}/{module}/Fwd.h", lines)

@@ -5,6 +5,9 @@
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/include/KovaPlugin.h"
+#include "kova/agentd/marshal/DiskResultMarshal.h"
+#include "kova/agentd/query/DiskQuery.h"
+#include "nox/Kova.h"
 #include "orbis/Soap.h"
 #include "orbis/Types.h"
 #include "orbis/Version.h"
@@ -63,6 +66,13 @@ void KovaManagerImpl::RefreshKovaDiskCacheLocked() {
 void KovaManagerImpl::InvalidateKovaDiskCache() {
   const LockGuard guard(*_diskCacheLock);
   _diskCacheValid = false;
+}
+
+void KovaManagerImpl::QueryDiskCacheLocked(const Texts& names, const DiskQueryLimit& limit,
+                                           Ref<DiskResults>& results) {
+  std::vector<HostCtl::Kova::DiskResult> records;
+  LimitQueryDisksForKova(*_logger, names, limit, _diskCache, records);
+  MarshalHostCtlDiskResults(*_logger, records, results, false);
 }
 
 void KovaManagerImpl::SerializeKovaResultAndFault(std::string& resultText, std::string& faultText,

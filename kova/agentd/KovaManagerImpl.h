@@ -32,33 +32,49 @@ class MethodFault;
 
 namespace Kovasvc {
 
+struct DiskQueryLimit;
+
 class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
  public:
   using Texts = std::vector<std::string>;
   using Mapping = Nox::Kova::Host::DiskMapping;
   using MapResult = Nox::Kova::Host::DiskMapResult;
+  using DiskResults = Orbis::DataArray<Nox::Kova::Host::DiskResult>;
 
   // Throws HostCtl::Lib::HostCtlException when there is no provider, and whatever making the locks throws.
   explicit KovaManagerImpl(Tessa::Ref<Tessa::Service::Logger>& logger);
   ~KovaManagerImpl() override;
 
-  // The order of these operations is that of the operation table and must not change.
+  // The order of these operations is that of the operation table and must not change. A text of a request
+  // that is not of the wanted type ends the process; one that cannot be read throws Orbis::ParseException. A
+  // disk without a name throws Tessa::NotInitializedException. `requestTag` goes down to the kernel unread.
 
+  // Plans disk groups from the disks and makes them, and mounts the groups that the disks already form. The
+  // result is a list of KovaHostDiskMapResult, one per group; the fault tells what failed of it, or why
+  // nothing was planned.
   virtual void AddDisks(const Texts& disks, const std::string& requestTag, std::string& faultText,
                         std::string& resultText);
+  // Makes exactly these groups. Result and fault as above.
   virtual void InitializeDisks(const Texts& mappings, const std::string& requestTag, std::string& faultText,
                                std::string& resultText);
+  // Takes one disk out of the service; one that has left the host is named "kova:UUID". What is behind
+  // `disk` is the kernel's to understand.
   virtual void RemoveDisk(const std::string& disk, const std::string& passThrough,
                           const std::string& optionText, int optionFirst, int optionSecond,
                           std::string& faultText);
+  // Takes a whole group out of the service, if the kernel has it.
   virtual void RemoveDiskMapping(const std::string& mapping, const std::string& passThrough,
                                  const std::string& optionText, int optionFirst, int optionSecond,
                                  std::string& faultText);
   // Which disks the service could use. No names: every disk that the kernel and the agent both know.
   // Names that match no disk are passed over. Without an inventory there is no answer at all.
   virtual void QueryDisksForKova(Texts& names, std::string& faultText, std::string& resultText);
+  // Plans disk groups from every disk that the kernel offers and makes them. Neither result nor fault: there
+  // was nothing to make.
   virtual void AddAllEligibleDisks(const std::string& requestTag, std::string& faultText,
                                    std::string& resultText);
+  // Takes groups out of use without erasing them. The result is a list of KovaHostDiskMapResult, one per
+  // group, each with its fault if it has one.
   virtual void UnmountDiskMapping(const Texts& mappings, const std::string& requestTag,
                                   std::string& faultText, std::string& resultText);
   // The mounted disk groups, of which disks, and whether disks are claimed automatically. What cannot be read
@@ -66,9 +82,12 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   virtual void GetStorageInfo(std::string& resultText);
   // Cluster, network and fault domain, each missing by itself when it cannot be read; never a fault.
   virtual void GetConfigInfo(std::string& resultText);
+  // Brings every group that is there but not mounted back into use. A failure is only logged.
   virtual void ClaimUnmountedDiskgroup();
   // The kernel's mounted disk groups, appended. Provider exceptions pass.
   virtual void GetKovaDiskMapping(std::vector<HostCtl::Kova::DiskMapping>& mappings);
+  // Makes the groups one by one. `result` and `fault` are replaced: the results of the groups that were
+  // worked on, and null or what went wrong.
   virtual void InitializeDisksInt(Orbis::DataArray<Mapping>* mappings, const std::string& requestTag,
                                   Tessa::Ref<Orbis::Any>& result, Tessa::Ref<Orbis::MethodFault>& fault);
   // Checks one group of a request. `result` holds an object, whose fields are filled: the group, the results
@@ -82,11 +101,17 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   virtual void ValidateDiskMappings(Orbis::DataArray<Mapping>* mappings);
   // Whether the kernel has that mounted group already; false, with a warning, when it cannot say.
   virtual bool DiskMappingExists(Tessa::Ref<Mapping> mapping);
+  // The kernel's format of one group, which is number `mappingIndex`, from 0, of a request of
+  // `mappingCount`. Provider exceptions pass.
   virtual void FormatDiskMapping(const std::string& ssdName, Texts& nonSsdNames,
                                  const std::string& requestTag, int mappingCount, int mappingIndex);
+  // Gives a group that is off-line new stamps and mounts it. Provider exceptions pass.
   virtual void RestampDiskMapping(const std::string& ssdName, Texts& capacityNames);
+  // Checks, makes and reports one group. `result` holds an object, whose fields are filled. Throws as
+  // ValidateDiskMapping does.
   virtual void InitializeMapping(Tessa::Ref<Mapping> mapping, const std::string& requestTag, int mappingCount,
                                  int mappingIndex, Tessa::Ref<MapResult>& result);
+  // Takes one group out of use; `fault` is set when that fails.
   virtual void UnmountDiskMappingInt(Tessa::Ref<Mapping>& mapping, const std::string& requestTag,
                                      Tessa::Ref<Orbis::MethodFault>& fault);
 
@@ -138,6 +163,31 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   // The candidates that the kernel calls eligible flash disks, as planning sees them.
   Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> QueryEligibleFlash(
       const Orbis::DataArray<Nox::Host::ScsiDisk>* candidates);
+  // The cached records of these disks, or of all without names, that pass the limit, as disk results for
+  // planning. Replaces `results`. The caller holds the disk-cache lock. Throws
+  // Orbis::Fault::SystemError::Exception without an inventory.
+  void QueryDiskCacheLocked(const Texts& names, const DiskQueryLimit& limit,
+                            Tessa::Ref<DiskResults>& results);
+  // The groups that an addition of these disks makes: hybrid ones, those that are there but not mounted, and
+  // all-flash ones. The flags say which planner stopped at a limit.
+  Tessa::Ref<Orbis::DataArray<Mapping>> PlanGroups(Orbis::DataArray<Nox::Host::ScsiDisk>& disks,
+                                                   bool& allFlashExceeded, bool& hybridExceeded);
+  // Those of the disks that the kernel calls eligible, as planning sees them. Throws
+  // Nox::Fault::DuplicateDisks::Exception.
+  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> EligibleOf(
+      const Orbis::DataArray<Nox::Host::ScsiDisk>& disks);
+  // Every disk that the kernel offers without a reason against it, as it is now.
+  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> QueryOfferedDisks();
+  // The groups that these make: hybrid ones, then all-flash ones.
+  Tessa::Ref<Orbis::DataArray<Mapping>> PlanOfferedDisks(Orbis::DataArray<Nox::Host::ScsiDisk>& candidates);
+  // Whether the kernel knows exactly one disk of that name, and as part of a group that is not mounted.
+  bool IsOffline(const std::string& ssdName);
+  // The results of the group's disks, as the kernel knows them now.
+  Tessa::Ref<DiskResults> QueryGroupAfresh(const Tessa::Ref<Mapping>& mapping);
+  // The UUID in the name of a disk that has left, also told to the log.
+  std::string UuidOfAbsentDisk(const std::string& disk);
+  // How an operation ends that answers with a fault or nothing.
+  void FinishWithoutResult(std::string& faultText, Tessa::Ref<Orbis::MethodFault>& fault);
   // The kernel's mounted groups, and whether it claims disks on its own; a failing kernel is a warning and no
   // groups.
   std::vector<HostCtl::Kova::DiskMapping> ReadStorage(std::optional<bool>& autoClaim);

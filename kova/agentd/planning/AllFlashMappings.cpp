@@ -54,9 +54,7 @@ Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryEligibleFlash(const DataArray<Scs
     });
     MarshalHostCtlDiskResults(*_logger, records, results, false);
   }
-  for (const Nox::Kova::Host::DiskResult* result : *results) {
-    flash->Append(result->GetDisk());
-  }
+  AppendDisks(*results, *flash);
   return flash;
 }
 

@@ -85,4 +85,24 @@ void LogDiskMappings(Tessa::Service::Logger& logger, const DataArray<DiskMapping
   }
 }
 
+void LogDiskMapping(Tessa::Service::Logger& logger, const Tessa::Ref<DiskMapping>& mapping) {
+  DataArray<DiskMapping> one;
+  one.Append(mapping);
+  LogDiskMappings(logger, &one);
+}
+
+void AppendDisks(const DataArray<Nox::Kova::Host::DiskResult>& results, DataArray<ScsiDisk>& disks) {
+  for (const Nox::Kova::Host::DiskResult* result : results) {
+    disks.Append(result->GetDisk());
+  }
+}
+
+void AppendMappings(const DataArray<DiskMapping>* more, DataArray<DiskMapping>& mappings) {
+  if (more != nullptr) {
+    for (DiskMapping* const mapping : *more) {
+      mappings.Append(Tessa::Ref<DiskMapping>(mapping));
+    }
+  }
+}
+
 }  // namespace Kovasvc

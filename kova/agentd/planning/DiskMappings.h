@@ -35,5 +35,14 @@ void DiskMappingToDeviceNames(const Tessa::Ref<Nox::Kova::Host::DiskMapping>& ma
 // One verbose line per group. The names are read whatever the level.
 void LogDiskMappings(Tessa::Service::Logger& logger,
                      const Orbis::DataArray<Nox::Kova::Host::DiskMapping>* mappings);
+// The same for one group.
+void LogDiskMapping(Tessa::Service::Logger& logger, const Tessa::Ref<Nox::Kova::Host::DiskMapping>& mapping);
+
+// Appends the disk of each result, in order.
+void AppendDisks(const Orbis::DataArray<Nox::Kova::Host::DiskResult>& results,
+                 Orbis::DataArray<Nox::Host::ScsiDisk>& disks);
+// Appends each group, in order. A null array has none.
+void AppendMappings(const Orbis::DataArray<Nox::Kova::Host::DiskMapping>* more,
+                    Orbis::DataArray<Nox::Kova::Host::DiskMapping>& mappings);
 
 }  // namespace Kovasvc

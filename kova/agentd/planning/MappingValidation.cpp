@@ -4,7 +4,6 @@
 
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/include/KovaInfo.h"
-#include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/query/DiskQuery.h"
 #include "nox/Faults.h"
@@ -24,7 +23,6 @@ using Tessa::Service::Logger;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
 using Tessa::System::LockGuard;
-using DiskResults = DataArray<Nox::Kova::Host::DiskResult>;
 
 namespace {
 
@@ -72,7 +70,7 @@ Ref<MethodFault> CheckShape(Logger& logger, const DiskMapping& mapping,
 }
 
 // The fault of the first disk that the kernel calls ineligible and says why, shared; or null.
-Ref<MethodFault> CheckEligibility(Logger& logger, const DiskResults& results) {
+Ref<MethodFault> CheckEligibility(Logger& logger, const KovaManagerImpl::DiskResults& results) {
   Ref<MethodFault> fault;
   for (const Nox::Kova::Host::DiskResult* result : results) {
     if (result->GetState() == Nox::Kova::Host::DiskResult::STATE_INELIGIBLE && result->GetError()) {
@@ -116,9 +114,7 @@ void KovaManagerImpl::ValidateDiskMapping(Ref<DiskMapping> mapping, Ref<DiskMapR
   if (!fault) {
     {
       const LockGuard guard(*_diskCacheLock);
-      std::vector<HostCtl::Kova::DiskResult> records;
-      LimitQueryDisksForKova(*_logger, names, DiskQueryLimit(), _diskCache, records);
-      MarshalHostCtlDiskResults(*_logger, records, results, false);
+      QueryDiskCacheLocked(names, DiskQueryLimit(), results);
     }
     fault = CheckEligibility(*_logger, *results);
   }

@@ -1,0 +1,86 @@
+// Plans disk groups from every disk that the kernel offers and makes them.
+//
+// Unlike an addition of named disks it looks for no groups that are not mounted, says nothing when a limit
+// leaves nothing to plan, and invalidates the disk cache on every path.
+
+#include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/operations/OperationSteps.h"
+#include "kova/agentd/planning/DiskMappings.h"
+#include "kova/agentd/query/DiskQuery.h"
+#include "nox/Kova.h"
+
+namespace Kovasvc {
+
+using HostCtl::Kova::DiskReason;
+using HostCtl::Kova::DiskState;
+using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapping;
+using Orbis::DataArray;
+using Orbis::MethodFault;
+using Tessa::MakeRef;
+using Tessa::Ref;
+using Tessa::Service::LogInternal;
+using Tessa::Service::LogLevel;
+using Tessa::System::LockGuard;
+
+namespace {
+
+constexpr DiskQueryLimit offered = {.byState = true,
+                                    .state = DiskState::Eligible,
+                                    .byReason = true,
+                                    .reason = DiskReason::None,
+                                    .fifthFlag = false};
+
+}  // namespace
+
+Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryOfferedDisks() {
+  Ref<DiskResults> results;
+  {
+    const LockGuard operationGuard(*_operationLock);
+    const LockGuard cacheGuard(*_diskCacheLock);
+    RefreshKovaDiskCacheLocked();
+    QueryDiskCacheLocked({}, offered, results);
+  }
+  LogInternal(_logger, LogLevel::Verbose, "Queried %1 eligible disks to be added to KOVA", results->Size());
+  const auto disks = MakeRef<DataArray<ScsiDisk>>();
+  AppendDisks(*results, *disks);
+  return disks;
+}
+
+Ref<DataArray<DiskMapping>> KovaManagerImpl::PlanOfferedDisks(DataArray<ScsiDisk>& candidates) {
+  bool limitReached = false;  // one flag for both planners, and nobody asks for it
+  Ref<DataArray<DiskMapping>> allFlash;
+  Ref<DataArray<ScsiDisk>> remaining;
+  AllFlashDiskMappingSwitch(&candidates, allFlash, remaining, limitReached);
+  Ref<DataArray<DiskMapping>> planned;
+  ComputeDiskMappings(remaining.Get(), false, planned, limitReached);
+  AppendMappings(allFlash.Get(), *planned);
+  LogInternal(_logger, LogLevel::Verbose, "Computed %1 mappings from the queried %2 disks for KOVA",
+              planned->Size(), candidates.Size());
+  LogDiskMappings(*_logger, planned.Get());
+  return planned;
+}
+
+void KovaManagerImpl::AddAllEligibleDisks(const std::string& requestTag, std::string& faultText,
+                                          std::string& resultText) {
+  Ref<Orbis::Any> result;
+  Ref<MethodFault> fault;
+  const bool cameThrough = RunIntoFault(*_logger, fault, [&] {
+    const Ref<DataArray<ScsiDisk>> candidates = QueryOfferedDisks();
+    if (candidates->IsEmpty()) {
+      return;
+    }
+    const Ref<DataArray<DiskMapping>> planned = PlanOfferedDisks(*candidates);
+    if (!planned->IsEmpty()) {
+      InitializeDisksInt(planned.Get(), requestTag, result, fault);
+    }
+  });
+  if (cameThrough) {
+    LogInternal(_logger, LogLevel::Verbose, "DONE");
+  }
+  InvalidateKovaDiskCache();
+  SerializeKovaResultAndFault(resultText, faultText, result, fault);
+}
+
+}  // namespace Kovasvc

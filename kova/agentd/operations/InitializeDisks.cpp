@@ -1,0 +1,124 @@
+// Makes disk groups: each is checked, formatted by the kernel and reported, disk by disk.
+//
+// No lock is held across a request, so another may run between two of its groups.
+
+#include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/marshal/AbsentDisk.h"
+#include "kova/agentd/operations/OperationSteps.h"
+#include "kova/agentd/planning/DiskMappings.h"
+#include "kova/agentd/query/DiskQuery.h"
+#include "nox/Kova.h"
+#include "tessa/Formatter.h"
+
+namespace Kovasvc {
+
+using HostCtl::Kova::DiskReason;
+using Nox::Kova::Host::DiskMapping;
+using Nox::Kova::Host::DiskMapResult;
+using Orbis::DataArray;
+using Orbis::MethodFault;
+using Tessa::MakeRef;
+using Tessa::Ref;
+using Tessa::Service::LogInternal;
+using Tessa::Service::LogLevel;
+using Tessa::System::LockGuard;
+
+namespace {
+
+constexpr int wrongTypeLine = 2070;
+
+}  // namespace
+
+void KovaManagerImpl::InitializeDisks(const Texts& mappings, const std::string& requestTag,
+                                      std::string& faultText, std::string& resultText) {
+  const Ref<DataArray<DiskMapping>> requested = ReadObjects<DiskMapping>(mappings, wrongTypeLine);
+  Ref<Orbis::Any> result;
+  Ref<MethodFault> fault;
+  RunIntoFault(*_logger, fault, [&] {
+    {
+      const LockGuard guard(*_operationLock);
+      RefreshKovaDiskCache();
+    }
+    InitializeDisksInt(requested.Get(), requestTag, result, fault);
+  });
+  InvalidateKovaDiskCache();
+  SerializeKovaResultAndFault(resultText, faultText, result, fault);
+}
+
+void KovaManagerImpl::InitializeDisksInt(DataArray<DiskMapping>* mappings, const std::string& requestTag,
+                                         Ref<Orbis::Any>& result, Ref<MethodFault>& fault) {
+  const auto results = MakeRef<DataArray<DiskMapResult>>();
+  Ref<MethodFault> combined;
+  try {
+    ValidateDiskMappings(mappings);
+    const int count = static_cast<int>(mappings->Size());
+    for (int index = 0; index < count; ++index) {
+      auto mapResult = MakeRef<DiskMapResult>();
+      InitializeMapping(Ref<DiskMapping>((*mappings)[index]), requestTag, count, index, mapResult);
+      results->Append(mapResult);
+      PrepareKovaDiskFault(mapResult->GetError(), combined);
+    }
+  } catch (const MethodFault::Exception& exception) {
+    combined = exception.GetFault();
+  }
+  result = results;
+  fault = combined;
+}
+
+void KovaManagerImpl::InitializeMapping(Ref<DiskMapping> mapping, const std::string& requestTag,
+                                        int mappingCount, int mappingIndex, Ref<DiskMapResult>& result) {
+  ValidateDiskMapping(mapping, result);
+  if (result->GetError()) {
+    LogInternal(_logger, LogLevel::Warning, "Given mapping is invalid: %1",
+                Tessa::PrintFormatter::FormatObject(result->GetError()));
+    return;
+  }
+  Ref<MethodFault> refused;
+  AskKernel(*_logger, "Error formatting KOVA disks: %1", refused, [&] {
+    const std::string ssdName = NameOf(mapping->GetSsd().Get());
+    Texts capacityNames = NamesOf(mapping->GetNonSsd().Get());
+    if (IsPDLDiskInput(ssdName) || IsOffline(ssdName)) {
+      RestampDiskMapping(ssdName, capacityNames);  // what is there is never formatted
+    } else {
+      FormatDiskMapping(ssdName, capacityNames, requestTag, mappingCount, mappingIndex);
+    }
+  });
+  if (refused) {
+    result->SetError(refused);
+  }
+  InvalidateKovaDiskCache();  // whatever the kernel did, its records are others now
+  result->SetDiskResult(QueryGroupAfresh(mapping));
+}
+
+bool KovaManagerImpl::IsOffline(const std::string& ssdName) {
+  std::vector<HostCtl::Kova::DiskResult> records;
+  const LockGuard guard(*_diskCacheLock);
+  LimitQueryDisksForKova(*_logger, {ssdName}, DiskQueryLimit(), _diskCache, records);
+  return records.size() == 1 && records.front().reason == DiskReason::GroupNotMounted;
+}
+
+Ref<KovaManagerImpl::DiskResults> KovaManagerImpl::QueryGroupAfresh(const Ref<DiskMapping>& mapping) {
+  Texts names;
+  DiskMappingToDeviceNames(mapping, names);
+  Ref<DiskResults> results;
+  const LockGuard operationGuard(*_operationLock);
+  const LockGuard cacheGuard(*_diskCacheLock);
+  RefreshKovaDiskCacheLocked();
+  QueryDiskCacheLocked(names, DiskQueryLimit(), results);
+  return results;
+}
+
+void KovaManagerImpl::FormatDiskMapping(const std::string& ssdName, Texts& nonSsdNames,
+                                        const std::string& requestTag, int mappingCount, int mappingIndex) {
+  LogInternal(_logger, LogLevel::Verbose, "Formatting KOVA disks");
+  {
+    const LockGuard guard(*_operationLock);
+    _provider->FormatDiskMapping(
+        ssdName, nonSsdNames,
+        {.requestTag = requestTag, .mappingCount = mappingCount, .mappingIndex = mappingIndex});
+  }
+  LogInternal(_logger, LogLevel::Verbose, "Done formatting KOVA disks");
+}
+
+}  // namespace Kovasvc

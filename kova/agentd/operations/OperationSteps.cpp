@@ -1,0 +1,12 @@
+#include "kova/agentd/operations/OperationSteps.h"
+
+#include "kova/agentd/KovaLibManager.h"
+#include "tessa/Panic.h"
+
+namespace Kovasvc {
+
+void PanicOverWrongType(int line) {
+  Tessa::Panic("NOT_REACHED %s:%d\n", sourcePath, line);
+}
+
+}  // namespace Kovasvc

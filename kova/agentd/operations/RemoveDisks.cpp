@@ -1,0 +1,100 @@
+// Takes disks and whole disk groups out of the service.
+
+#include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/marshal/AbsentDisk.h"
+#include "kova/agentd/operations/OperationSteps.h"
+#include "kova/agentd/planning/DiskMappings.h"
+#include "nox/Kova.h"
+#include "orbis/Any.h"
+
+namespace Kovasvc {
+
+using HostCtl::Kova::RemovalOptions;
+using Nox::Kova::Host::DiskMapping;
+using Orbis::MethodFault;
+using Tessa::MakeRef;
+using Tessa::Ref;
+using Tessa::Service::LogInternal;
+using Tessa::Service::LogLevel;
+using Tessa::System::LockGuard;
+
+namespace {
+
+constexpr int wrongTypeLine = 2280;
+
+Ref<MethodFault> MappingNotFound(const std::string& mappingText) {
+  const auto argument = MakeRef<Orbis::KeyAnyValue>();
+  argument->SetKey("diskMap");
+  argument->SetValue(MakeRef<Orbis::Boxed<std::string>>(mappingText));
+  const auto message = MakeRef<Orbis::LocalizableMessage>();
+  message->SetKey("nox.agentd.kovaDiskOperation.diskMappingNotFound");
+  message->GetArg()->Append(argument);
+  const auto fault = MakeRef<Orbis::Fault::InvalidArgument>();
+  fault->GetFaultMessage()->Append(message);
+  return fault;
+}
+
+}  // namespace
+
+void KovaManagerImpl::RemoveDisk(const std::string& disk, const std::string& passThrough,
+                                 const std::string& optionText, int optionFirst, int optionSecond,
+                                 std::string& faultText) {
+  Ref<MethodFault> fault;
+  {
+    const LockGuard guard(*_operationLock);
+    RefreshKovaDiskCache();
+    AskKernel(*_logger, "Error removing KOVA disks: %1", fault, [&] {
+      if (IsPDLDiskInput(disk)) {
+        _provider->RemoveDiskByUuid(UuidOfAbsentDisk(disk), passThrough);
+      } else {
+        _provider->RemoveDisk(disk, passThrough, RemovalOptions{optionText, optionFirst, optionSecond});
+      }
+    });
+  }
+  FinishWithoutResult(faultText, fault);
+}
+
+void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::string& passThrough,
+                                        const std::string& optionText, int optionFirst, int optionSecond,
+                                        std::string& faultText) {
+  const Ref<DiskMapping> group = ReadObject<DiskMapping>(mapping, wrongTypeLine);
+  Ref<MethodFault> fault;
+  {
+    const LockGuard guard(*_operationLock);
+    RefreshKovaDiskCache();
+    const std::string ssdName = NameOf(group->GetSsd().Get());
+    LogDiskMapping(*_logger, group);
+    if (IsPDLDiskInput(ssdName)) {
+      // A group whose cache disk has left is not looked for.
+      AskKernel(*_logger, "Error removing PDL'd KOVA disk mapping: %1", fault,
+                [&] { _provider->RemoveDiskByUuid(UuidOfAbsentDisk(ssdName), passThrough); });
+    } else if (!DiskMappingExists(group)) {
+      const std::string text = "SSD: " + ssdName + ", Disks: " + JoinNames(NamesOf(group->GetNonSsd().Get()));
+      LogInternal(_logger, LogLevel::Warning, "Failed to validate existing disk mapping: %1", text);
+      fault = MappingNotFound(text);
+    } else {
+      AskKernel(*_logger, "Error removing KOVA disk mapping: %1", fault, [&] {
+        _provider->RemoveDiskMapping(ssdName, passThrough,
+                                     RemovalOptions{optionText, optionFirst, optionSecond});
+      });
+    }
+  }
+  FinishWithoutResult(faultText, fault);
+}
+
+std::string KovaManagerImpl::UuidOfAbsentDisk(const std::string& disk) {
+  std::string uuid;
+  PDLDiskToKovaUuid(disk, uuid);
+  LogInternal(_logger, LogLevel::Verbose, "Given PDL'd disk input (KOVA UUID: '%1')", uuid);
+  return uuid;
+}
+
+void KovaManagerImpl::FinishWithoutResult(std::string& faultText, Ref<MethodFault>& fault) {
+  InvalidateKovaDiskCache();
+  std::string resultText;
+  Ref<Orbis::Any> noResult;
+  SerializeKovaResultAndFault(resultText, faultText, noResult, fault);
+}
+
+}  // namespace Kovasvc

@@ -29,6 +29,13 @@ class RunningServer {
   explicit RunningServer(HttpHandler handler = &Echo, const HttpLimits& limits = {})
       : _server(_path, limits, std::move(handler)),
         _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
+  explicit RunningServer(HttpDeferringHandler handler, const HttpLimits& limits = {},
+                         std::function<void()> onStopping = {})
+      : _server(_path, limits, std::move(handler)),
+        _run(std::async(std::launch::async, [this, onStopping = std::move(onStopping)] {
+          _server.OnStopping(onStopping);
+          return _server.Run();
+        })) {}
   ~RunningServer() { Stop(); }
   RunningServer(const RunningServer&) = delete;
   RunningServer& operator=(const RunningServer&) = delete;

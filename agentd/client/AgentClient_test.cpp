@@ -7,6 +7,7 @@
 
 #include "agentd/http/HttpClient.h"
 #include "agentd/routes/Routes.h"
+#include "agentd/tasks/TaskQueue.h"
 #include "agentd/testing/FakeService.h"
 #include "agentd/testing/RunningServer.h"
 #include "nox/Kova.h"
@@ -21,6 +22,12 @@ using testing::ElementsAre;
 using Testing::FakeHooks;
 using testing::HasSubstr;
 using Testing::RunningServer;
+
+HttpDeferringHandler Serving(const Host::ManagementApi& api, TaskQueue& tasks) {
+  return [router = Router(api, tasks)](const HttpRequest& request, const HttpResponder& responder) {
+    router.Serve(request, responder);
+  };
+}
 
 std::string WhyNot(const HttpAnswer& answer) {
   RunningServer server([&answer](const HttpRequest&) { return answer; });
@@ -37,7 +44,8 @@ TEST(AgentClient, AsksAnAgentAsAProgramAsksTheServiceItself) {
   const Host::KovaService service = Testing::AFakeService();
   FakeHooks::AnswerWithDisk("naa.1");
   FakeHooks::AnswerWithFault(Orbis::Fault::SystemError("half of it failed"));
-  RunningServer server([&service](const HttpRequest& request) { return Route(service, request); });
+  TaskQueue tasks;
+  RunningServer server(Serving(service, tasks));
   const Host::Answer answer =
       AgentClient("unix:" + server.Path()).QueryDisksForKova({"naa.1", "t10.\"quoted\" \\ ß"});
   EXPECT_THAT(FakeHooks::names, ElementsAre("naa.1", "t10.\"quoted\" \\ ß"));
@@ -50,7 +58,8 @@ TEST(AgentClient, AsksAnAgentAsAProgramAsksTheServiceItself) {
 TEST(AgentClient, AsksForGroupsAndConfiguration) {
   using Nox::Kova::Host::ConfigInfo;
   const Host::KovaService service = Testing::AFakeService();
-  RunningServer server([&service](const HttpRequest& request) { return Route(service, request); });
+  TaskQueue tasks;
+  RunningServer server(Serving(service, tasks));
   const AgentClient client("unix:" + server.Path());
   ConfigInfo::StorageInfo storage;
   storage.SetAutoClaim(true);
@@ -65,7 +74,8 @@ TEST(AgentClient, AsksForGroupsAndConfiguration) {
 
 TEST(AgentClient, GivesAFaultOfTheAgentAsAFault) {
   const Host::KovaService service = Testing::AFakeService();
-  RunningServer server([&service](const HttpRequest& request) { return Route(service, request); });
+  TaskQueue tasks;
+  RunningServer server(Serving(service, tasks));
   const Host::Answer answer = AgentClient("unix:" + server.Path()).QueryDisksForKova({""});
   EXPECT_FALSE(answer.result);
   EXPECT_EQ(dynamic_cast<const Orbis::Fault::InvalidArgument&>(*answer.fault).GetInvalidProperty(),

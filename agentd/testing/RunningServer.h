@@ -24,6 +24,13 @@ inline HttpAnswer Echo(const HttpRequest& request) {
   return {200, "text/plain", request.method + " " + request.target + " " + request.body};
 }
 
+// What a handler answers, however late.
+inline HttpAnswer AnswerOf(const HttpDeferringHandler& handler, const HttpRequest& request) {
+  const auto answered = std::make_shared<std::promise<HttpAnswer>>();
+  handler(request, HttpResponder([answered](HttpAnswer answer) { answered->set_value(std::move(answer)); }));
+  return answered->get_future().get();
+}
+
 class RunningServer {
  public:
   explicit RunningServer(HttpHandler handler = &Echo, const HttpLimits& limits = {})

@@ -174,8 +174,16 @@ void HostedPlugin::PublishInventory() {
 
 void HostedPlugin::ForgetCalls() {
   _timeline.Take();
-  _calls->TakeEnded();
+  for (const OtxCtl::Fault::RecordedCall& call : _calls->TakeEnded()) {
+    ++_callsSoFar[call.operation];
+  }
   _logger->Clear();
+}
+
+void HostedPlugin::FailCall(const std::string& operation, int call, std::string_view exception) {
+  ForgetCalls();
+  _calls->Inject(
+      {operation, _callsSoFar[operation] + call, std::string(exception), "injected", "offender", 0});
 }
 
 void HostedPlugin::ChangeHost(const std::function<void(HostDescription&)>& edit) {

@@ -5,6 +5,7 @@
 #pragma once
 
 #include <functional>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <ostream>
@@ -82,6 +83,8 @@ class HostedPlugin {
   TestSupport::RecordingLockFactory& Locks() { return _locks; }
   // Forgets what locks and calls have left behind, for long runs.
   void ForgetCalls();
+  // From now on, the call-th call of the kernel's operation throws, until faults are cleared.
+  void FailCall(const std::string& operation, int call, std::string_view exception);
 
   // Changes the host from outside, and tells the plug-in as an agent does.
   void ChangeHost(const std::function<void(OtxCtl::Sim::HostDescription&)>& edit);
@@ -105,6 +108,7 @@ class HostedPlugin {
   const std::shared_ptr<OtxCtl::Fault::CallRecorder> _calls;
   Host::AgentApp _app;
   const Tessa::Ref<Host::Inventory> _inventory;
+  std::map<std::string, int> _callsSoFar;  // those that are forgotten
   std::mutex _publishing;  // one after the other, so that the newest host is the last published
   Tessa::System::SystemFactory* _factoryBefore = nullptr;
   Tessa::Ref<Tessa::Service::Logger> _loggerBefore;

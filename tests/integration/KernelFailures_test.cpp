@@ -17,6 +17,7 @@
 
 #include "otxctl/sim/HostBuilder.h"
 #include "tests/integration/HostedPlugin.h"
+#include "tests/integration/KernelExceptions.h"
 
 namespace Integration {
 namespace {
@@ -28,28 +29,13 @@ using OtxCtl::Sim::HostGroup;
 using testing::ElementsAreArray;
 using testing::IsEmpty;
 
-// ---- the kernel's exceptions, and the fault that tells each
-
-struct ExceptionRow {
-  const char* name;
-  const char* fault;
-};
-constexpr ExceptionRow exceptions[] = {
-    {"HostCtlException", "SystemError: injected"},
-    {"KovaStorageException", "SystemError: injected"},
-    {"KovaExceptionHasPartition", "DiskHasPartitions offender"},
-    {"KovaExceptionLastRemainingHDD", "DiskIsLastRemainingNonSSD offender"},
-    {"KovaExceptionRescanError", "KovaDiskFault injected"},
-    {"KovaExceptionRemoveMappingAutoModeEnabled", "KovaDiskFault injected"},
-    {"KovaExceptionRemoveDiskAutoModeEnabled", "KovaDiskFault injected"},
-    {"KovaExceptionIncompatibleDiskMapping", "SystemError: injected"},
-};
-
 // One failure: the n-th call, from 1, of one of the kernel's operations.
 struct Failure {
   std::string operation;  // empty: nothing fails
   int call = 0;
-  ExceptionRow exception = {"", ""};
+  KernelException exception = kernelExceptions[0];
+
+  std::string FaultText() const { return exception.FaultText("injected", "offender"); }
 
   bool Is(const std::string& name, int number) const { return operation == name && call == number; }
   // The n-th reading of the kernel's disks.
@@ -117,7 +103,7 @@ std::string FaultOf(const std::vector<Made>& groups, std::size_t position, const
     warnings.push_back("Error restamping PDL'd KOVA disk mapping: injected");
   }
   warnings.push_back(std::string(formatWarning) + "injected");
-  return failure.exception.fault;
+  return failure.FaultText();
 }
 
 // The groups are made one by one; the disks are read before the first and after each.
@@ -323,7 +309,7 @@ Forecast ForecastOneChange(const OneChange& change, const Failure& failure) {
     forecast.warnings = {refreshWarning};
   } else if (failure.Is(change.operation, 1)) {
     forecast.warnings = {change.warning + "injected"};
-    forecast.answer.fault = failure.exception.fault;
+    forecast.answer.fault = failure.FaultText();
     forecast.groups = {groupOfS1, groupOfGone, groupOfS3};
   }
   return forecast;
@@ -355,7 +341,7 @@ Forecast ForecastUnmount(const Failure& failure) {
       fault = "InvalidArgument";
     } else if (failure.Is("UnmountDiskMapping", number)) {
       forecast.warnings.push_back("Error unmounting KOVA disk mapping: injected");
-      fault = failure.exception.fault;
+      fault = failure.FaultText();
     }
     isMounted[group] = !fault.empty();
     forecast.answer.results.push_back(group + (fault.empty() ? "" : " !" + fault));
@@ -492,7 +478,7 @@ class KernelFailures : public testing::TestWithParam<Scenario> {
     WatchTheHost(plugin);
     _injected = 0;
     plugin.Calls().Inject(
-        {failure.operation, failure.call, failure.exception.name, "injected", "offender", 0});
+        {failure.operation, failure.call, std::string(failure.exception.name), "injected", "offender", 0});
     ExpectForecast(plugin, failure);
     EXPECT_EQ(_injected, 1) << "the call was not made";
     plugin.Calls().ClearFaults();
@@ -514,9 +500,9 @@ TEST_P(KernelFailures, AreAnsweredAndForgotten) {
   int checked = 0;
   for (const auto& [operation, count] : calls) {
     for (const int call : std::set<int>{1, (count + 1) / 2, count}) {
-      for (const ExceptionRow& exception : exceptions) {
+      for (const KernelException& exception : kernelExceptions) {
         SCOPED_TRACE(operation + " " + std::to_string(call) + " of " + std::to_string(count) + " throws " +
-                     exception.name);
+                     std::string(exception.name));
         Check({operation, call, exception});
         ++checked;
         if (HasFailure()) {

@@ -1,6 +1,7 @@
 #include "tests/integration/HostedPlugin.h"
 
 #include <array>
+#include <set>
 
 #include "kova/agentd/KovaLibManager.h"
 #include "kova/agentd/KovaManagerImpl.h"
@@ -29,6 +30,7 @@ using Tessa::Ref;
 
 namespace {
 
+constexpr std::size_t mostCapacityDisks = 7;
 constexpr std::array<const char*, 10> operationNames = {
     "AddDisks",          "AddAllEligibleDisks", "InitializeDisks",         "RemoveDisk",
     "RemoveDiskMapping", "UnmountDiskMapping",  "ClaimUnmountedDiskgroup", "QueryDisksForKova",
@@ -130,6 +132,24 @@ std::ostream& operator<<(std::ostream& out, const Answer& answer) {
     out << " {" << result << "}";
   }
   return out << (answer.fault.empty() ? "; no fault" : "; fault: " + answer.fault);
+}
+
+std::string WrongGroups(const HostDescription& host) {
+  std::set<std::string> members;
+  for (const OtxCtl::Sim::HostGroup& group : host.groups) {
+    if (group.capacity.empty() || group.capacity.size() > mostCapacityDisks) {
+      return "the group of " + group.ssd + " has " + std::to_string(group.capacity.size()) +
+             " capacity disks";
+    }
+    std::vector<std::string> all = group.capacity;
+    all.push_back(group.ssd);
+    for (const std::string& disk : all) {
+      if (!members.insert(disk).second) {
+        return disk + " is in a group twice";
+      }
+    }
+  }
+  return "";
 }
 
 HostedPlugin::HostedPlugin(const HostDescription& description)

@@ -70,6 +70,10 @@ struct Answer {
 };
 std::ostream& operator<<(std::ostream& out, const Answer& answer);
 
+// What no host may ever look like: a disk in two groups, or twice in one; a group of no disks, or of too
+// many. Empty when nothing is wrong.
+std::string WrongGroups(const OtxCtl::Sim::HostDescription& host);
+
 class HostedPlugin {
  public:
   explicit HostedPlugin(const OtxCtl::Sim::HostDescription& description);

@@ -351,24 +351,6 @@ Request SequenceDraw::AnyRequest(const HostModel& model) {
 
 // ---- what no host may ever look like
 
-std::string WrongGroups(const HostDescription& host) {
-  std::set<std::string> members;
-  for (const HostGroup& group : host.groups) {
-    if (group.capacity.empty() || group.capacity.size() > 7) {
-      return "the group of " + group.ssd + " has " + std::to_string(group.capacity.size()) +
-             " capacity disks";
-    }
-    Names all = group.capacity;
-    all.push_back(group.ssd);
-    for (const std::string& disk : all) {
-      if (!members.insert(disk).second) {
-        return disk + " is in a group twice";
-      }
-    }
-  }
-  return "";
-}
-
 // Each of the two planners keeps to five groups, counting those of before the request as far as it is told of
 // them: a kernel that cannot say which there are is taken to have none.
 std::string TooManyGroups(const Step& step, const HostDescription& before, const HostDescription& after) {

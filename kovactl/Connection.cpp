@@ -14,30 +14,36 @@
 namespace Kovactl {
 namespace {
 
-class OwnHost final : public Connection {
+// What can be asked of a service so far; the rest of the interface says that it cannot.
+template <class Service>
+class SoFar final : public Host::ManagementApi {
  public:
-  explicit OwnHost(const Host::PluginHooks& hooks) : _service(hooks) {}
+  template <class Argument>
+  explicit SoFar(const Argument& argument) : _service(argument) {}
   Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
     return _service.QueryDisksForKova(names);
   }
   Host::Answer GetStorageInfo() const override { return _service.GetStorageInfo(); }
+  Host::Answer GetDiskGroups() const override { return _service.GetStorageInfo(); }
   Host::Answer GetConfigInfo() const override { return _service.GetConfigInfo(); }
-
- private:
-  Host::KovaService _service;
-};
-
-class AgentsHost final : public Connection {
- public:
-  explicit AgentsHost(const std::string& url) : _client(url) {}
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
-    return _client.QueryDisksForKova(names);
+  Host::Answer AddDisks(const Host::DiskList&) const override { return NotYet(); }
+  Host::Answer AddAllEligibleDisks() const override { return NotYet(); }
+  Host::Answer InitializeDisks(const Host::MappingList&) const override { return NotYet(); }
+  Host::Answer UnmountDiskMapping(const Host::MappingList&) const override { return NotYet(); }
+  Host::Answer RemoveDisk(const std::string&, const Host::RemovalArguments&) const override {
+    return NotYet();
   }
-  Host::Answer GetStorageInfo() const override { return _client.GetStorageInfo(); }
-  Host::Answer GetConfigInfo() const override { return _client.GetConfigInfo(); }
+  Host::Answer RemoveDiskMapping(const Nox::Kova::Host::DiskMapping&,
+                                 const Host::RemovalArguments&) const override {
+    return NotYet();
+  }
+  Host::Answer ClaimUnmountedDiskgroup() const override { return NotYet(); }
+  std::string DescribeHost() const override { throw std::runtime_error("not built"); }
+  Host::Answer ChangeHost(const std::string&) const override { return NotYet(); }
 
  private:
-  Agentd::AgentClient _client;
+  static Host::Answer NotYet() { return Host::FailedWith("not built"); }
+  Service _service;
 };
 
 [[noreturn]] void EndOverPanic(const char* text) {
@@ -46,24 +52,39 @@ class AgentsHost final : public Connection {
   _exit(static_cast<int>(ExitStatus::Panic));
 }
 
+Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
+  Tessa::Service::SetDefaultLogger(Host::MakeConsoleLogger(LevelOf(options.logLevel)));
+  Tessa::SetPanicHandler(&EndOverPanic);
+  return Host::HostRuntime::Start(options.runtime);
+}
+
 }  // namespace
 
-Connection::~Connection() = default;
-
-std::unique_ptr<Connection> Connect(const GlobalOptions& options) {
-  if (!options.runtime.hostFile.empty()) {
-    Tessa::Service::SetDefaultLogger(Host::MakeConsoleLogger(LevelOf(options.logLevel)));
-    Tessa::SetPanicHandler(&EndOverPanic);
-    return std::make_unique<OwnHost>(Host::HostRuntime::Start(options.runtime).Hooks());
+std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options) {
+  if (options.HostsThePlugIn()) {
+    return std::make_unique<SoFar<Host::KovaService>>(StartRuntime(options).Hooks());
   }
   if (options.runtime.save) {
     throw BadInput("--save goes with --host; an agent saves its host itself");
   }
   try {
-    return std::make_unique<AgentsHost>(options.agent);
+    return std::make_unique<SoFar<Agentd::AgentClient>>(options.agent);
   } catch (const std::invalid_argument& refused) {
     throw BadInput(refused.what());
   }
+}
+
+std::unique_ptr<Host::ManagementApi> ConnectToCopy(const GlobalOptions& options) {
+  if (options.runtime.save) {
+    throw BadInput("a plan changes nothing, so there is nothing to --save");
+  }
+  GlobalOptions copy = options;
+  if (!options.HostsThePlugIn()) {
+    throw BadInput("not built");
+  }
+  Host::HostRuntime& runtime = StartRuntime(copy);
+  runtime.SimulatedHost().SetWaiter([](std::chrono::milliseconds) {});
+  return std::make_unique<SoFar<Host::KovaService>>(runtime.Hooks());
 }
 
 Tessa::Service::LogLevel LevelOf(const std::string& name) {

@@ -61,9 +61,9 @@ void PrintTable(const StorageInfo& info, std::ostream& out) {
 
 }  // namespace
 
-ExitStatus RunGroups(const Connection& connection, const std::string& output, std::ostream& out,
+ExitStatus RunGroups(const Host::ManagementApi& host, const std::string& output, std::ostream& out,
                      std::ostream& err) {
-  return PrintAnswer<StorageInfo>(connection.GetStorageInfo(), output, out, err, &PrintTable);
+  return PrintAnswer<StorageInfo>(host.GetDiskGroups(), output, out, err, &PrintTable);
 }
 
 }  // namespace Kovactl

@@ -5,7 +5,7 @@
 
 #include <sstream>
 
-#include "kovactl/testing/FakeConnection.h"
+#include "kovactl/testing/FakeHost.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
 #include "orbis/Json.h"
@@ -43,11 +43,11 @@ Ref<DiskMapInfo> AGroup(const std::string& ssd, const std::vector<std::string>& 
 
 class GroupsCommand : public testing::Test {
  protected:
-  GroupsCommand() : _info(MakeRef<StorageInfo>()) { _connection.answer.result = _info; }
+  GroupsCommand() : _info(MakeRef<StorageInfo>()) { _host.answer.result = _info; }
 
-  ExitStatus Run(const std::string& output = "table") { return RunGroups(_connection, output, _out, _err); }
+  ExitStatus Run(const std::string& output = "table") { return RunGroups(_host, output, _out, _err); }
 
-  Testing::FakeConnection _connection;
+  Testing::FakeHost _host;
   Ref<StorageInfo> _info;
   std::ostringstream _out;
   std::ostringstream _err;
@@ -90,7 +90,7 @@ TEST_F(GroupsCommand, PrintsTheObjectForScripts) {
 }
 
 TEST_F(GroupsCommand, ExplainsAFault) {
-  _connection.answer = Host::FailedWith("no host");
+  _host.answer = Host::FailedWith("no host");
   EXPECT_EQ(Run(), ExitStatus::Fault);
   EXPECT_EQ(_out.str(), "");
   EXPECT_THAT(_err.str(), testing::HasSubstr("no host"));

@@ -62,7 +62,8 @@ Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
 
 std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options) {
   if (options.HostsThePlugIn()) {
-    return std::make_unique<SoFar<Host::KovaService>>(StartRuntime(options).Hooks());
+    Host::HostRuntime& runtime = StartRuntime(options);
+    return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.SimulatedHost());
   }
   if (options.runtime.save) {
     throw BadInput("--save goes with --host; an agent saves its host itself");
@@ -80,11 +81,11 @@ std::unique_ptr<Host::ManagementApi> ConnectToCopy(const GlobalOptions& options)
   }
   GlobalOptions copy = options;
   if (!options.HostsThePlugIn()) {
-    throw BadInput("not built");
+    copy.runtime.hostText = Connect(options)->DescribeHost();
   }
   Host::HostRuntime& runtime = StartRuntime(copy);
   runtime.SimulatedHost().SetWaiter([](std::chrono::milliseconds) {});
-  return std::make_unique<SoFar<Host::KovaService>>(runtime.Hooks());
+  return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.SimulatedHost());
 }
 
 Tessa::Service::LogLevel LevelOf(const std::string& name) {

@@ -24,6 +24,10 @@ std::string NameOf(const ScsiDisk& disk) {
   return disk.HasCanonicalName() ? disk.GetCanonicalName() : "";
 }
 
+bool HasLeft(const ScsiDisk& disk) {
+  return HasOperationalState(disk, ScsiDisk::STATE_ERROR);
+}
+
 std::string KindOf(const ScsiDisk& disk) {
   if (!disk.HasSsd()) {
     return "unknown";
@@ -62,7 +66,7 @@ std::string ReasonOf(const DiskResult& result) {
   if (result.GetError()) {
     return WordsFor(*result.GetError());
   }
-  if (result.GetDisk() && HasOperationalState(*result.GetDisk(), ScsiDisk::STATE_ERROR)) {
+  if (result.GetDisk() && HasLeft(*result.GetDisk())) {
     return "has left the host";
   }
   if (result.GetState() != DiskResult::STATE_INELIGIBLE) {

@@ -11,6 +11,9 @@ namespace Kovactl {
 // The canonical name; empty for a disk without one.
 std::string NameOf(const Nox::Host::ScsiDisk& disk);
 
+// Whether the device is gone; only what the kernel remembers of it is left.
+bool HasLeft(const Nox::Host::ScsiDisk& disk);
+
 // "flash", "hard disk", or "unknown".
 std::string KindOf(const Nox::Host::ScsiDisk& disk);
 

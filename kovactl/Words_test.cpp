@@ -63,6 +63,19 @@ Ref<DiskResult> ADisk(const std::string& state, const std::vector<std::string>& 
   return result;
 }
 
+TEST(Words, KnowADiskThatHasLeft) {
+  EXPECT_TRUE(HasLeft(*ADisk("inUse", {"error"})->GetDisk()));
+  EXPECT_FALSE(HasLeft(*ADisk("inUse", {"ok"})->GetDisk()));
+  EXPECT_FALSE(HasLeft(ScsiDisk()));
+}
+
+TEST(Words, AreEmptyForADiskWithoutName) {
+  ScsiDisk disk;
+  EXPECT_EQ(NameOf(disk), "");
+  disk.SetCanonicalName("naa.1");
+  EXPECT_EQ(NameOf(disk), "naa.1");
+}
+
 TEST(Words, ForTheStateOfADisk) {
   EXPECT_EQ(StateOf(*ADisk("inUse")), "in use");
   EXPECT_EQ(StateOf(*ADisk("eligible")), "eligible");

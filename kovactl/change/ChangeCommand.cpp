@@ -6,18 +6,30 @@
 #include "kovactl/DiskGroups.h"
 #include "kovactl/Print.h"
 #include "kovactl/change/GroupResults.h"
+#include "kovactl/plan/LeftOvers.h"
 
 namespace Kovactl {
 namespace {
 
 using Tessa::Ref;
 
-void PrintAnswer(const Change& change, const Host::Answer& answer, const std::string& output,
-                 std::ostream& out, std::ostream& err) {
+// Where the host has nothing to tell, what is left over says why.
+void PrintSilence(const Host::ManagementApi& host, const Change& change, std::ostream& out) {
+  out << Host::Printable(change.WordsForSilence()) << "\n";
+  const std::optional<Texts> offered = change.OfferedDisks();
+  const auto leftOver = offered ? ExplainLeftOvers(host, *offered) : std::vector<LeftOverDisk>();
+  if (!leftOver.empty()) {
+    out << "\n";
+    PrintLeftOvers(leftOver, out);
+  }
+}
+
+void PrintAnswer(const Host::ManagementApi& host, const Change& change, const Host::Answer& answer,
+                 const std::string& output, std::ostream& out, std::ostream& err) {
   Ref<GroupResults> results(dynamic_cast<GroupResults*>(answer.result.Get()));
   const bool isSilent = !results && !answer.fault;
   if (isSilent && output == "table") {
-    out << Host::Printable(change.WordsForSilence()) << "\n";
+    PrintSilence(host, change, out);
   } else if (isSilent && change.AnswersWithGroups()) {
     results = Tessa::MakeRef<GroupResults>();  // scripts can count on a list
   }
@@ -58,7 +70,7 @@ ExitStatus RunChange(const Host::ManagementApi& host, Change& change, const Cons
     return ExitStatus::BadInput;
   }
   const Host::Answer answer = change.Make(host);
-  PrintAnswer(change, answer, options.output, out, err);
+  PrintAnswer(host, change, answer, options.output, out, err);
   if (MayHaveChanged(change, answer)) {
     NoteForgotten(options, err);
   }

@@ -4,6 +4,7 @@
 #include <map>
 #include <optional>
 
+#include "host/HostError.h"
 #include "host/Inventory.h"
 #include "kova/agentd/planning/pure/AddPlan.h"
 #include "kovactl/Table.h"
@@ -112,6 +113,16 @@ std::vector<LeftOverDisk> FindLeftOvers(const Host::ManagementApi& host, const H
     leftOver.push_back(Explain(*verdict, reason == reasons.end() ? LeftOver::NotEligible : reason->second));
   }
   return leftOver;
+}
+
+std::vector<LeftOverDisk> ExplainLeftOvers(const Host::ManagementApi& host, const Names& offered) {
+  std::string description;
+  try {
+    description = host.DescribeHost();
+  } catch (const Host::HostError&) {
+    return {};
+  }
+  return FindLeftOvers(host, OtxCtl::Sim::ParseHostDescription(description), offered, {});
 }
 
 void PrintLeftOvers(const std::vector<LeftOverDisk>& disks, std::ostream& out) {

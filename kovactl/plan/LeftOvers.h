@@ -20,6 +20,10 @@ std::vector<LeftOverDisk> FindLeftOvers(const Host::ManagementApi& host,
                                         const std::vector<std::string>& offered,
                                         const std::set<std::string>& placed);
 
+// The same for a host on which nothing was changed; nothing for one that is not simulated.
+std::vector<LeftOverDisk> ExplainLeftOvers(const Host::ManagementApi& host,
+                                           const std::vector<std::string>& offered);
+
 // A table of disks and reasons; nothing for an empty list.
 void PrintLeftOvers(const std::vector<LeftOverDisk>& disks, std::ostream& out);
 

@@ -2,7 +2,9 @@
 
 #include <algorithm>
 #include <array>
+#include <map>
 
+#include "host/KnownDisks.h"
 #include "kovactl/DiskGroups.h"
 #include "kovactl/change/GroupResults.h"
 
@@ -46,6 +48,24 @@ void Compare(const HostGroup& before, const HostGroup& after, std::vector<Planne
   }
 }
 
+// Calls disks that have left what the host's answers call them.
+void RenameAbsent(const HostDescription& host, std::vector<PlannedGroup>& changes) {
+  std::map<std::string, std::string> names;
+  for (const OtxCtl::Sim::HostDisk& disk : host.disks) {
+    if (disk.absent) {
+      names.emplace(disk.name, Host::AbsentName(disk.kovaUuid));
+    }
+  }
+  const auto rename = [&names](std::string& name) {
+    const auto found = names.find(name);
+    name = found == names.end() ? name : found->second;
+  };
+  for (PlannedGroup& group : changes) {
+    rename(group.ssd);
+    std::for_each(group.capacity.begin(), group.capacity.end(), rename);
+  }
+}
+
 }  // namespace
 
 std::string WordFor(Fate fate) {
@@ -68,6 +88,7 @@ std::vector<PlannedGroup> CompareGroups(const HostDescription& before, const Hos
       Note(Fate::Made, group, group.capacity, changes);
     }
   }
+  RenameAbsent(before, changes);
   return changes;
 }
 

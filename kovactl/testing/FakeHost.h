@@ -1,10 +1,10 @@
 // A host for tests of commands: it answers with what the test says, and keeps what it was asked for.
 #pragma once
 
-#include <stdexcept>
 #include <string>
 #include <vector>
 
+#include "host/HostError.h"
 #include "host/ManagementApi.h"
 #include "nox/Kova.h"
 
@@ -51,7 +51,7 @@ class FakeHost final : public Host::ManagementApi {
 
   std::string DescribeHost() const override {
     if (descriptions.empty()) {
-      throw std::runtime_error("this host is not simulated");
+      throw Host::HostError("this host is not simulated");
     }
     const std::string now = descriptions.front();
     if (descriptions.size() > 1) {
@@ -59,14 +59,16 @@ class FakeHost final : public Host::ManagementApi {
     }
     return now;
   }
-  Host::Answer ChangeHost(const std::string& change) const override { return Changed("ChangeHost " + change); }
+  Host::Answer ChangeHost(const std::string& change) const override {
+    return Changed("ChangeHost " + change);
+  }
 
-  Host::Answer answer;                                 // to every question without one of its own
-  mutable std::vector<Host::Answer> groups;            // to GetDiskGroups, one after the other
-  Host::Answer changeAnswer;                           // to every change
-  mutable std::vector<std::string> descriptions;       // from DescribeHost, one after the other
-  mutable std::vector<std::string> asked;              // names of the last query
-  mutable std::vector<std::string> changes;            // "RemoveDisk naa.1", in order
+  Host::Answer answer;                            // to every question without one of its own
+  mutable std::vector<Host::Answer> groups;       // to GetDiskGroups, one after the other
+  Host::Answer changeAnswer;                      // to every change
+  mutable std::vector<std::string> descriptions;  // from DescribeHost, one after the other
+  mutable std::vector<std::string> asked;         // names of the last query
+  mutable std::vector<std::string> changes;       // "RemoveDisk naa.1", in order
 
  private:
   Host::Answer Changed(const std::string& what) const {

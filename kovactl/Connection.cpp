@@ -14,38 +14,6 @@
 namespace Kovactl {
 namespace {
 
-// What can be asked of a service so far; the rest of the interface says that it cannot.
-template <class Service>
-class SoFar final : public Host::ManagementApi {
- public:
-  template <class Argument>
-  explicit SoFar(const Argument& argument) : _service(argument) {}
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
-    return _service.QueryDisksForKova(names);
-  }
-  Host::Answer GetStorageInfo() const override { return _service.GetStorageInfo(); }
-  Host::Answer GetDiskGroups() const override { return _service.GetStorageInfo(); }
-  Host::Answer GetConfigInfo() const override { return _service.GetConfigInfo(); }
-  Host::Answer AddDisks(const Host::DiskList&) const override { return NotYet(); }
-  Host::Answer AddAllEligibleDisks() const override { return NotYet(); }
-  Host::Answer InitializeDisks(const Host::MappingList&) const override { return NotYet(); }
-  Host::Answer UnmountDiskMapping(const Host::MappingList&) const override { return NotYet(); }
-  Host::Answer RemoveDisk(const std::string&, const Host::RemovalArguments&) const override {
-    return NotYet();
-  }
-  Host::Answer RemoveDiskMapping(const Nox::Kova::Host::DiskMapping&,
-                                 const Host::RemovalArguments&) const override {
-    return NotYet();
-  }
-  Host::Answer ClaimUnmountedDiskgroup() const override { return NotYet(); }
-  std::string DescribeHost() const override { throw std::runtime_error("not built"); }
-  Host::Answer ChangeHost(const std::string&) const override { return NotYet(); }
-
- private:
-  static Host::Answer NotYet() { return Host::FailedWith("not built"); }
-  Service _service;
-};
-
 [[noreturn]] void EndOverPanic(const char* text) {
   Host::FlushLogs();
   std::fprintf(stderr, "kovactl: the plug-in panicked: %s\n", text);
@@ -58,18 +26,25 @@ Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
   return Host::HostRuntime::Start(options.runtime);
 }
 
+std::unique_ptr<Host::ManagementApi> ServiceOf(Host::HostRuntime& runtime) {
+  return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.SimulatedHost());
+}
+
 }  // namespace
 
 std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options) {
   if (options.HostsThePlugIn()) {
-    Host::HostRuntime& runtime = StartRuntime(options);
-    return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.SimulatedHost());
+    return ServiceOf(StartRuntime(options));
   }
+  return ConnectToAgent(options);
+}
+
+std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options) {
   if (options.runtime.save) {
     throw BadInput("--save goes with --host; an agent saves its host itself");
   }
   try {
-    return std::make_unique<SoFar<Agentd::AgentClient>>(options.agent);
+    return std::make_unique<Agentd::AgentClient>(options.agent);
   } catch (const std::invalid_argument& refused) {
     throw BadInput(refused.what());
   }
@@ -85,7 +60,7 @@ std::unique_ptr<Host::ManagementApi> ConnectToCopy(const GlobalOptions& options)
   }
   Host::HostRuntime& runtime = StartRuntime(copy);
   runtime.SimulatedHost().SetWaiter([](std::chrono::milliseconds) {});
-  return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.SimulatedHost());
+  return ServiceOf(runtime);
 }
 
 Tessa::Service::LogLevel LevelOf(const std::string& name) {

@@ -8,6 +8,10 @@
 #include "host/ManagementApi.h"
 #include "tessa/Logger.h"
 
+namespace Agentd {
+class AgentClient;
+}
+
 namespace Kovactl {
 
 // What all commands share.
@@ -22,6 +26,9 @@ struct GlobalOptions {
 
 // Throws BadInput, and what starting the runtime throws. An agent is not called yet. Once per process.
 std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options);
+
+// The options' agent, not called yet. Throws BadInput.
+std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options);
 
 // A copy of the options' host, simulated in this process: what is done to it is forgotten, and delays that
 // it has on demand are not waited for. Throws as Connect does. Once per process, and instead of Connect.

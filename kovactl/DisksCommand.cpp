@@ -39,8 +39,8 @@ void PrintTable(const DiskResults& disks, std::ostream& out) {
   using Align = Table::Align;
   Table table({{"DISK"}, {"KIND"}, {"SIZE", Align::Right}, {"STATE"}, {"WHY NOT"}, {"DESCRIPTION"}});
   for (const DiskResult* disk : disks) {
-    table.AddRow({NameOf(*disk->GetDisk()), KindOf(*disk->GetDisk()), SizeOf(*disk->GetDisk()), StateOf(*disk),
-                  ReasonOf(*disk), DescriptionOf(*disk)});
+    table.AddRow({NameOf(*disk->GetDisk()), KindOf(*disk->GetDisk()), SizeOf(*disk->GetDisk()),
+                  StateOf(*disk), ReasonOf(*disk), DescriptionOf(*disk)});
   }
   if (!disks.IsEmpty()) {
     table.Print(out);

@@ -108,7 +108,8 @@ TEST_F(DisksCommand, ExplainsAFaultWithoutAResult) {
   _host.answer = {.result = nullptr, .fault = MakeRef<SystemError>("no\nluck")};
   EXPECT_EQ(Run(), ExitStatus::Fault);
   EXPECT_EQ(_out.str(), "");
-  EXPECT_THAT(_err.str(), testing::StartsWith("kovactl: something in the host failed: no\\x0aluck\n  See how"));
+  EXPECT_THAT(_err.str(),
+              testing::StartsWith("kovactl: something in the host failed: no\\x0aluck\n  See how"));
 }
 
 TEST_F(DisksCommand, PrintsAResultBesideItsFault) {

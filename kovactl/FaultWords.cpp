@@ -38,7 +38,8 @@ constexpr std::array<Row, 15> faults = {{
     {"KovaIncompatibleDiskMapping", "the disk group is of a format that this host does not know",
      "Use the group on a host that knows its format, or remove it."},
     {"KovaDiskFault", "the storage service refused the disk",
-     "If the host claims disks on its own (`kovactl groups` tells), nothing can be removed until it no longer "
+     "If the host claims disks on its own (`kovactl groups` tells), nothing can be removed until it no "
+     "longer "
      "does. Otherwise look at the disk with `kovactl disks`."},
     {"KovaFault", "the storage service refused", ""},
     {"InvalidArgument", "the request does not fit the host",
@@ -47,8 +48,7 @@ constexpr std::array<Row, 15> faults = {{
      "See how the host is now with `kovactl disks` and `kovactl groups`; its log may tell more."},
     {"NotPermitted", "the caller's role does not allow this", "Ask somebody with the role that it needs."},
     {"Busy", "the host is busy", "Try again later."},
-    {"HostChanged", "the host has changed since it was looked at",
-     "Look at it again, then decide again."},
+    {"HostChanged", "the host has changed since it was looked at", "Look at it again, then decide again."},
 }};
 
 constexpr std::array<Row, 3> messages = {{
@@ -64,7 +64,8 @@ constexpr std::array<Row, 3> messages = {{
 
 template <std::size_t count>
 const Row* Find(const std::array<Row, count>& rows, std::string_view name) {
-  const auto row = std::find_if(rows.begin(), rows.end(), [name](const Row& one) { return one.name == name; });
+  const auto row =
+      std::find_if(rows.begin(), rows.end(), [name](const Row& one) { return one.name == name; });
   return row == rows.end() ? nullptr : &*row;
 }
 

@@ -19,6 +19,9 @@ void AddEverything(CLI::App& app, CommandLine& line) {
   Kovactl::AddSimCommands(app, line);
   Kovactl::AddHostCommands(app, line);
   Kovactl::AddReplayCommand(app, line);
+  app.footer(
+      "Exit status: 0 done; 1 the host answered with a fault; 2 usage or bad input, or no consent;\n"
+      "3 no agent answers; 70 the plug-in panicked.");
 }
 
 ExitStatus Run(const CommandLine& line) {

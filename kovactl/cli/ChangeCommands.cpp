@@ -16,8 +16,7 @@ void AddAdd(CLI::App& parent, const auto& take) {
     bool all = false;
   };
   const auto arguments = std::make_shared<Arguments>();
-  auto* const command =
-      parent.add_subcommand("add", "Make disk groups of disks, or extend groups by them");
+  auto* const command = parent.add_subcommand("add", "Make disk groups of disks, or extend groups by them");
   auto* const disks = command->add_option("DISK", arguments->disks, "Canonical names");
   command->add_flag("--all", arguments->all, "Every eligible disk of the host")->excludes(disks);
   take(*command, [arguments] {
@@ -45,8 +44,7 @@ void AddRemovalArguments(CLI::App& command, Host::RemovalArguments& arguments) {
   command.add_option("--pass-through", arguments.passThrough, "Text handed to the kernel as it is");
   command.add_option("--option-text", arguments.optionText, "Text of the kernel's removal options");
   command.add_option("--option-first", arguments.optionFirst, "Their first number")->capture_default_str();
-  command.add_option("--option-second", arguments.optionSecond, "Their second number")
-      ->capture_default_str();
+  command.add_option("--option-second", arguments.optionSecond, "Their second number")->capture_default_str();
 }
 
 using MakeRemoval = ChangeRef (*)(std::string disk, Host::RemovalArguments arguments);

@@ -1,11 +1,23 @@
+#include <cstdlib>
+
 #include "kovactl/cli/CommandLine.h"
 
 namespace Kovactl {
+namespace {
+
+constexpr const char* agentVariable = "KOVA_AGENT";
+
+}  // namespace
 
 void AddGlobalOptions(CLI::App& app, CommandLine& line) {
   GlobalOptions& global = line.global;
-  auto* const agent =
-      app.add_option("--agent", global.agent, "Agent to ask: unix:PATH")->capture_default_str();
+  const char* const usualAgent = std::getenv(agentVariable);
+  if (usualAgent != nullptr && *usualAgent != '\0') {
+    global.agent = usualAgent;
+  }
+  auto* const agent = app.add_option("--agent", global.agent,
+                                     "Agent to ask: unix:PATH; the environment's KOVA_AGENT unless given")
+                          ->capture_default_str();
   app.add_option("--host", global.runtime.hostFile,
                  "Host description to work on in this process, without an agent")
       ->excludes(agent);

@@ -9,8 +9,8 @@
 namespace Kovactl {
 
 void AddPlanCommands(CLI::App& app, CommandLine& line) {
-  auto* const plan =
-      app.add_subcommand("plan", "Show what a change would do, on a copy of the host; changes nothing");
+  auto* const plan = app.add_subcommand(
+      "plan", "Show what a change would do, on a copy of a simulated host; changes nothing");
   plan->require_subcommand(1);
   AddChanges(*plan, [&line](CLI::App& command, const MakeChange& make) {
     command.callback([&line, make] {

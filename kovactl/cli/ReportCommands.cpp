@@ -2,9 +2,11 @@
 
 #include <iostream>
 
+#include "agentd/client/AgentClient.h"
 #include "kovactl/ConfigCommand.h"
 #include "kovactl/DisksCommand.h"
 #include "kovactl/GroupsCommand.h"
+#include "kovactl/TasksCommand.h"
 #include "kovactl/cli/CommandLine.h"
 
 namespace Kovactl {
@@ -34,12 +36,25 @@ void AddReport(CLI::App& app, CommandLine& line, const char* name, const char* w
   });
 }
 
+void AddTasks(CLI::App& app, CommandLine& line) {
+  app.add_subcommand("tasks", "List the changes that an agent was given, and what became of them")
+      ->callback([&line] {
+        line.action = [&line] {
+          if (line.global.HostsThePlugIn() || line.global.output == "soap") {
+            throw BadInput("tasks are an agent's, and printed as a table or as json");
+          }
+          return PrintTasks(ConnectToAgent(line.global)->Tasks(), line.global.output, std::cout);
+        };
+      });
+}
+
 }  // namespace
 
 void AddReportCommands(CLI::App& app, CommandLine& line) {
   AddDisks(app, line);
   AddReport(app, line, "groups", "List disk groups: disks, kind, size, mounted or not", &RunGroups);
   AddReport(app, line, "config", "Show cluster, network and fault domain", &RunConfig);
+  AddTasks(app, line);
 }
 
 }  // namespace Kovactl

@@ -14,19 +14,33 @@ using Json = nlohmann::ordered_json;
 using Pointer = Json::json_pointer;
 using Target = std::shared_ptr<Json>;
 
-// An option of two words, for and against, and the place of its value in the change.
+// Two options that exclude each other, and the place in the change that one makes true, the other false.
 struct Switch {
-  const char* words;
   const char* place;
-  const char* what;
+  const char* yes;
+  const char* meansYes;
+  const char* no;
+  const char* meansNo;
 };
 constexpr Switch diskSwitches[] = {
-    {"--absent,!--present", "/disk/absent", "The device has left the host, or is there"},
-    {"--ssd,!--hdd", "/disk/ssd", "It is a flash disk, or a hard disk"},
-    {"--capacity-flash,!--no-capacity-flash", "/disk/capacityFlash", "It is flash for capacity, or not"},
-    {"--local,!--remote", "/disk/local", "No other host can reach it, or some can"},
-    {"--in-inventory,!--not-in-inventory", "/disk/inInventory", "The agent lists it, or does not"},
+    {"/disk/absent", "--absent", "The device has left the host", "--present", "The device is there"},
+    {"/disk/ssd", "--ssd", "It is a flash disk", "--hdd", "It is a hard disk"},
+    {"/disk/capacityFlash", "--capacity-flash", "It is flash meant for capacity", "--no-capacity-flash",
+     "It is not"},
+    {"/disk/local", "--local", "No other host can reach it", "--remote", "Other hosts can reach it"},
+    {"/disk/inInventory", "--in-inventory", "The agent lists it", "--not-in-inventory",
+     "The agent does not list it"},
 };
+
+void AddSwitch(CLI::App& command, const Target& target, const Switch& one, CLI::Option* disk) {
+  const auto set = [target, place = one.place](bool value) { (*target)[Pointer(place)] = value; };
+  auto* const yes = command.add_flag_callback(
+      one.yes, [set] { set(true); }, one.meansYes);
+  auto* const no = command.add_flag_callback(
+      one.no, [set] { set(false); }, one.meansNo);
+  yes->needs(disk)->excludes(no);
+  no->needs(disk);
+}
 
 // An option, or an argument, whose value is written to that place.
 template <class Value>
@@ -41,8 +55,7 @@ void AddSet(CLI::App& sim, CommandLine& line) {
   auto* const command = sim.add_subcommand("set", "Change a disk of the host, or the host itself");
   auto* const disk = AddValue<std::string>(*command, change, "DISK", "/disk/name", "Canonical name");
   for (const Switch& one : diskSwitches) {
-    const auto set = [change, &one](std::int64_t count) { (*change)[Pointer(one.place)] = count > 0; };
-    command->add_flag_function(one.words, set, one.what)->needs(disk);
+    AddSwitch(*command, change, one, disk);
   }
   AddValue<int>(*command, change, "--partitions", "/disk/partitions", "How many partitions it holds")
       ->needs(disk);

@@ -225,6 +225,7 @@ class Changes:
         self.assert_ended(self.ask("sim", "set", "naa.9", "--absent"), 1, "naa.9")
         self.assert_ended(self.ask("sim", "set", "naa.h1"), 2, "say what to set")
         self.assert_ended(self.ask("sim", "set", "--absent"), 2, "DISK")
+        self.assert_ended(self.ask("sim", "set", "naa.h1", "--absent", "--present"), 2, "excludes")
         self.assert_ended(self.ask("sim", "fault", "Fly", "--delay-ms", "1"), 2, "Fly")
         self.assert_ended(self.ask("sim", "fault", "RemoveDisk", "--exception", "Fly"), 2, "Fly")
         self.assert_ended(self.ask("sim", "fault", "RemoveDisk"), 2, "--exception")
@@ -298,6 +299,50 @@ class InOneProcess(Changes, ProgramTest):
                               "a table or as json": ("-o", "soap", "plan", "claim")}.items():
             with self.subTest(command):
                 self.assert_ended(self.kovactl("--host", self.path("host.json"), *command), 2, told)
+
+    def test_has_no_tasks(self):
+        self.use(HOST)
+        self.assert_ended(self.kovactl("--host", self.path("host.json"), "tasks"), 2, "tasks are an agent's")
+
+
+class OverAgent(Changes, ProgramTest):
+    def use(self, host):
+        self.agent = self.start_agent("--host", self.write("host.json", host), "--save", "--log-level", "error")
+
+    def arguments(self):
+        return ["--agent", "unix:" + self.socket]
+
+    def ask(self, *arguments):
+        return self.ask_agent(*arguments)
+
+    def test_lists_what_it_was_asked_to_change(self):
+        self.use(HOST)
+        self.assertEqual(self.done("tasks").out, "0 tasks\n")
+        self.done("add", "naa.s1", "naa.h1", "--yes")
+        self.ask("remove", "naa.h1", "--yes")
+        lines = self.done("tasks").out.splitlines()
+        self.assertEqual(lines[-1], "2 tasks: 1 done, 1 failed")
+        self.assertTrue(lines[2].endswith("last capacity disk of its group: naa.h1"), lines[2])
+        tasks = self.done("-o", "json", "tasks").json()["tasks"]
+        self.assertEqual([(task["operation"], task["state"]) for task in tasks],
+                         [("AddDisks", "done"), ("RemoveDisk", "failed")])
+
+    def test_leaves_a_saved_host_that_a_process_of_its_own_goes_on_with(self):
+        self.use(HOST)
+        self.done("add", "naa.s1", "naa.h1", "--yes")
+        groups = self.groups()
+        self.assertEqual(self.stop(self.agent), 0)
+        alone = self.kovactl("--host", self.path("host.json"), "-o", "json", "groups").json()["diskMapInfo"]
+        self.assertEqual([names(group["mapping"]) for group in alone], groups)
+
+    def test_finds_its_agent_in_the_environment(self):
+        self.use(HOST)
+        command = [os.path.join(BIN, "kovactl"), "groups"]
+        for agent, status in (("unix:" + self.socket, 0), ("unix:" + self.path("none"), 3), ("http:", 2)):
+            with self.subTest(agent):
+                ended = subprocess.run(command, env={**os.environ, "KOVA_AGENT": agent}, capture_output=True,
+                                       timeout=PATIENCE, check=False)
+                self.assertEqual(ended.returncode, status)
 
 
 if __name__ == "__main__":

@@ -51,7 +51,7 @@ TEST(TasksCommand, RefusesAnAnswerThatIsNone) {
 
 TEST(TasksCommand, LetsNoLabelPlayWithTheTerminal) {
   EXPECT_EQ(Printed(R"({"tasks": [{"id": "t-1", "label": "\u001b[2J", "state": "\u001b[1m"}]})"),
-            "TASK  LABEL     STATE\n"
+            "TASK  LABEL    STATE\n"
             "t-1   \\x1b[2J  \\x1b[1m\n"
             "\n"
             "1 task: 1 \\x1b[1m\n");

@@ -16,7 +16,6 @@ trap cleanup EXIT
 trap 'exit 130' INT TERM
 
 say() {
-  echo
   echo "# $*"
 }
 

@@ -77,7 +77,7 @@ class Demo(ProgramTest):
         self.assert_ended(outcome, 0)
         self.assertEqual(outcome.err, "")
         for told in ("2 disk groups: 2 added", "has left the host", "1 disk group: 1 unmounted", "not mounted",
-                     "3 disk groups"):
+                     "4 tasks: 4 done"):
             self.assertIn(told, outcome.out)
 
 

@@ -27,9 +27,11 @@ Ref<MethodFault> MappingNotFound(const std::string& mappingText) {
   const auto argument = MakeRef<Orbis::KeyAnyValue>();
   argument->SetKey("diskMap");
   argument->SetValue(MakeRef<Orbis::Boxed<std::string>>(mappingText));
+  const auto arguments = MakeRef<Orbis::DataArray<Orbis::KeyAnyValue>>();
+  arguments->Append(argument);
   const auto message = MakeRef<Orbis::LocalizableMessage>();
   message->SetKey("nox.agentd.kovaDiskOperation.diskMappingNotFound");
-  message->GetArg()->Append(argument);
+  message->SetArg(arguments);
   const auto fault = MakeRef<Orbis::Fault::InvalidArgument>();
   fault->GetFaultMessage()->Append(message);
   return fault;

@@ -55,8 +55,10 @@ inline std::string DiskText(const Nox::Host::ScsiDisk* disk) {
 // As in "ssd: disk disk".
 inline std::string GroupText(const Nox::Kova::Host::DiskMapping& mapping) {
   std::string text = DiskText(mapping.GetSsd().Get()) + ":";
-  for (const Nox::Host::ScsiDisk* disk : *mapping.GetNonSsd()) {
-    text += " " + DiskText(disk);
+  if (mapping.GetNonSsd()) {
+    for (const Nox::Host::ScsiDisk* disk : *mapping.GetNonSsd()) {
+      text += " " + DiskText(disk);
+    }
   }
   return text;
 }

@@ -2,6 +2,7 @@
 
 import os
 
+import emit_xsd
 from schema import Field, Type
 
 BANNER = "// Generated from {origin}. Changes here are lost; change the schema.\n"
@@ -292,6 +293,33 @@ def messages(schema, origin):
     return types
 
 
+def documents_header(origin):
+    return [
+        BANNER.format(origin=origin),
+        "#pragma once",
+        "",
+        "#include <string_view>",
+        "",
+        '#include "tessa/Api.h"',
+        "",
+        "namespace Nox {",
+        "",
+        "// The service as clients of other makes need it described. Texts that live for ever; threads: any.",
+        "TESSA_API std::string_view WsdlText() noexcept;",
+        "TESSA_API std::string_view XsdText() noexcept;",
+        "",
+        "}  // namespace Nox",
+    ]
+
+
+def documents_source(schema, origin):
+    lines = [BANNER.format(origin=origin), '#include "nox/Documents.h"', "", "namespace Nox {"]
+    for name, document in (("Wsdl", emit_xsd.wsdl(schema)), ("Xsd", emit_xsd.xsd(schema))):
+        lines += ["", f"std::string_view {name}Text() noexcept {{", '  return R"document(' + document[0]]
+        lines += document[1:] + [')document";', "}"]
+    return lines + ["", "}  // namespace Nox"]
+
+
 def write(path, lines):
     text = "\n".join(lines) + "\n"
     os.makedirs(os.path.dirname(path), exist_ok=True)
@@ -324,6 +352,8 @@ def emit(schema, origin, module, out_dir):
             type_.origin_name = f"{module}/schema/{os.path.basename(origin)}"
         write(f"{out_dir}/{module}/Operations.h", header(schema, module, "Operations", wrappers, needs))
         write(f"{out_dir}/{module}/Operations.cpp", source(schema, module, "Operations", wrappers, registered=False))
+        write(f"{out_dir}/{module}/Documents.h", documents_header(wrappers[0].origin_name))
+        write(f"{out_dir}/{module}/Documents.cpp", documents_source(schema, wrappers[0].origin_name))
     if module != "orbis":
         lines = [BANNER.format(origin=mine[0].origin_name), "#pragma once", ""] + forward_declarations(schema, mine)
         write(f"{out_dir}/{module}/Fwd.h", lines)

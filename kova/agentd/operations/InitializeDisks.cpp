@@ -78,7 +78,7 @@ void KovaManagerImpl::InitializeMapping(Ref<DiskMapping> mapping, const std::str
   AskKernel(*_logger, "Error formatting KOVA disks: %1", refused, [&] {
     const std::string ssdName = NameOf(mapping->GetSsd().Get());
     Texts capacityNames = NamesOf(mapping->GetNonSsd().Get());
-    if (IsPDLDiskInput(ssdName) || IsOffline(ssdName)) {
+    if (IsOffline(ssdName) || IsPDLDiskInput(ssdName)) {
       RestampDiskMapping(ssdName, capacityNames);  // what is there is never formatted
     } else {
       FormatDiskMapping(ssdName, capacityNames, requestTag, mappingCount, mappingIndex);

@@ -60,7 +60,7 @@ asan:
 	@cd build/asan && $(CTEST)
 
 # The thread sanitizer, on the tests in which threads meet.
-TSAN_TESTS := tessa_test otxctl_test otxctl_fault_test otxctl_contract_test kova_agentd_test kova_module_test agentd_test
+TSAN_TESTS := tessa_test otxctl_test otxctl_fault_test otxctl_contract_test kova_agentd_test kova_module_test agentd_test concurrency_test
 
 tsan:
 	@$(SETUP) build test

@@ -73,7 +73,8 @@ void HttpConnection::PassOn() {
   _version = message.version();
   _withBody = message.method() != http::verb::head;
   HttpRequest request{std::string(message.method_string()), std::string(message.target()),
-                      std::string(message[http::field::content_type]), std::move(message.body())};
+                      std::string(message[http::field::content_type]), std::move(message.body()),
+                      std::string(message["SOAPAction"])};
   asio::post(_context.workers, [self = shared_from_this(), request = std::move(request)]() mutable {
     Handle(std::move(self), request);
   });

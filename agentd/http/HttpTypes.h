@@ -12,6 +12,7 @@ struct HttpRequest {
   std::string target;       // as sent: "/api/v1/disks?names=naa.1"
   std::string contentType;  // empty: none
   std::string body;
+  std::string soapAction = {};  // of the header of that name; empty: none
 };
 
 struct HttpAnswer {

@@ -10,6 +10,7 @@
 #include "agentd/routes/JsonAnswers.h"
 #include "agentd/routes/Operations.h"
 #include "agentd/routes/RequestReader.h"
+#include "agentd/routes/SoapEndpoint.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
@@ -21,6 +22,7 @@ namespace {
 using Host::ManagementApi;
 
 constexpr std::string_view jsonType = "application/json";
+constexpr std::string_view xmlType = "text/xml";
 
 // A request on its way: who serves it, what was asked, and the way back.
 struct Call {
@@ -119,6 +121,14 @@ void PostHost(const Call& call) {
          [&api = call.api, change = call.request.body] { return api.ChangeHost(change); });
 }
 
+void PostSoap(const Call& call) {
+  ServeSoap(call.api, call.tasks, call.request, call.responder);
+}
+
+void GetSoap(const Call& call) {
+  call.responder.Answer(DescribeService(call.target));
+}
+
 bool IsNothing(std::string_view rest) {
   return rest.empty();
 }
@@ -132,22 +142,24 @@ bool IsOperation(std::string_view rest) {
 }
 
 struct Route {
-  std::string_view method;
+  std::string_view bodyType;  // what a POST must be; empty for a GET
   std::string_view path;
   bool (*takes)(std::string_view rest);  // what stands behind the path
   void (*serve)(const Call& call);
 };
 
-constexpr std::array<Route, 9> routes = {{
-    {"GET", "/healthz", &IsNothing, &Health},
-    {"GET", "/api/v1/disks", &IsNothing, &GetDisks},
-    {"GET", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
-    {"GET", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
-    {"GET", "/api/v1/tasks", &IsNothing, &GetTasks},
-    {"GET", "/api/v1/tasks/", &IsId, &GetTask},
-    {"GET", "/api/v1/host", &IsNothing, &GetHost},
-    {"POST", "/api/v1/host", &IsNothing, &PostHost},
-    {"POST", "/api/v1/", &IsOperation, &PostOperation},
+constexpr std::array<Route, 11> routes = {{
+    {"", "/healthz", &IsNothing, &Health},
+    {"", "/api/v1/disks", &IsNothing, &GetDisks},
+    {"", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
+    {"", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
+    {"", "/api/v1/tasks", &IsNothing, &GetTasks},
+    {"", "/api/v1/tasks/", &IsId, &GetTask},
+    {"", "/api/v1/host", &IsNothing, &GetHost},
+    {jsonType, "/api/v1/host", &IsNothing, &PostHost},
+    {jsonType, "/api/v1/", &IsOperation, &PostOperation},
+    {"", "/soap", &IsNothing, &GetSoap},
+    {xmlType, "/soap", &IsNothing, &PostSoap},
 }};
 
 bool Leads(const Route& route, std::string_view path) {
@@ -155,18 +167,18 @@ bool Leads(const Route& route, std::string_view path) {
 }
 
 // A content type is demanded of every body: a form of a stranger's page cannot send this one.
-bool IsJson(std::string_view contentType) {
+bool IsOfType(std::string_view wanted, std::string_view contentType) {
   std::string type(contentType.substr(0, contentType.find(';')));
   type.erase(type.find_last_not_of(" \t") + 1);
   std::transform(type.begin(), type.end(), type.begin(), [](char byte) {
     return byte >= 'A' && byte <= 'Z' ? static_cast<char>(byte - 'A' + 'a') : byte;
   });
-  return type == jsonType;
+  return type == wanted;
 }
 
 void Follow(const Route& route, const Call& call) {
-  if (route.method == "POST" && !IsJson(call.request.contentType)) {
-    call.responder.Answer(PlainText(415, "the body must be application/json"));
+  if (!route.bodyType.empty() && !IsOfType(route.bodyType, call.request.contentType)) {
+    call.responder.Answer(PlainText(415, "the body must be " + std::string(route.bodyType)));
     return;
   }
   try {
@@ -190,7 +202,7 @@ void Router::Serve(const HttpRequest& request, const HttpResponder& responder) c
     if (!Leads(route, path)) {
       continue;
     }
-    if (route.method == request.method) {
+    if (request.method == (route.bodyType.empty() ? "GET" : "POST")) {
       Follow(route, {_api, _tasks, *target, request, responder, path.substr(route.path.size())});
       return;
     }

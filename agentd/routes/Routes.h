@@ -9,14 +9,16 @@
 //   GET  /api/v1/tasks/ID            one of them, with its result
 //   GET  /api/v1/host                the description of a simulated host
 //   POST /api/v1/host                changes it: {"set": {..}, "disk": {"name": .., ..}}
+//   POST /soap                       the operations of the management API as SOAP 1.1 messages
+//   GET  /soap?wsdl, ?xsd=nox.xsd    how they are described
 //
-// An answer is {"result": .., "fault": ..}, either null or both; that of a changing operation also has
-// "task", its id. With "wait": false the answer is the task as it was taken on, with 202.
+// An answer in JSON is {"result": .., "fault": ..}, either null or both; that of a changing operation also
+// has "task", its id. With "wait": false the answer is the task as it was taken on, with 202.
 //
 //   200  there is a result, perhaps beside a fault; or neither: done, nothing to say
 //   400  a request that cannot be read (text), or an InvalidArgument
 //   403  NotPermitted        404, 405, 415  the path, the method or the type of the body (text)
-//   500  any other fault     503            Busy, with Retry-After
+//   500  any other fault, and every SOAP fault     503            Busy, with Retry-After
 //
 // Queries are answered on the calling thread. Changes are handed to the task queue, and answered by it when
 // their turn has come: however many wait, and however long one takes, no thread waits for them here.

@@ -38,6 +38,7 @@ std::vector<Kovasvc::Planning::HostGroup> GroupsOf(const OtxCtl::Sim::SimRules& 
   std::vector<HostCtl::Kova::DiskMapping> records;
   kernel.GetDiskMappings(records, true);
   std::vector<Kovasvc::Planning::HostGroup> groups;
+  groups.reserve(records.size());
   for (const HostCtl::Kova::DiskMapping& record : records) {
     groups.push_back({.group = {.allFlash = record.allFlash, .heldBack = record.thirdFlag},
                       .capacityDisks = record.capacityDisks.size(),
@@ -55,6 +56,7 @@ Reasons AskPlanning(const HostDescription& host, const Names& offered) {
   std::vector<HostCtl::Kova::DiskResult> records;
   kernel.QueryDisks(offered, records);
   std::vector<Kovasvc::Planning::OfferedDisk> disks;
+  disks.reserve(records.size());
   for (const HostCtl::Kova::DiskResult& record : records) {
     // Only the addition of every eligible disk minds a reason beside the state.
     const bool isFree = !offered.empty() || record.reason == HostCtl::Kova::DiskReason::None;

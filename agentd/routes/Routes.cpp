@@ -14,6 +14,7 @@
 #include "agentd/tasks/TaskQueue.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
+#include "nox/Documents.h"
 #include "orbis/ParseException.h"
 
 namespace Agentd {
@@ -121,6 +122,12 @@ void PostHost(const Call& call) {
          [&api = call.api, change = call.request.body] { return api.ChangeHost(change); });
 }
 
+void GetDescription(const Call& call) {
+  if (HasOnly("", call)) {
+    call.responder.Answer({200, std::string(jsonType), std::string(Nox::OpenApiText())});
+  }
+}
+
 void PostSoap(const Call& call) {
   ServeSoap(call.api, call.tasks, call.request, call.responder);
 }
@@ -148,11 +155,12 @@ struct Route {
   void (*serve)(const Call& call);
 };
 
-constexpr std::array<Route, 11> routes = {{
+constexpr std::array<Route, 12> routes = {{
     {"", "/healthz", &IsNothing, &Health},
     {"", "/api/v1/disks", &IsNothing, &GetDisks},
     {"", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
     {"", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
+    {"", "/api/v1/openapi.json", &IsNothing, &GetDescription},
     {"", "/api/v1/tasks", &IsNothing, &GetTasks},
     {"", "/api/v1/tasks/", &IsId, &GetTask},
     {"", "/api/v1/host", &IsNothing, &GetHost},

@@ -519,7 +519,10 @@ HostCtl::Kova::DiskResult HostModel::RecordOf(const Disk& disk) const {
   record.capacityFlash = disk.capacityFlash;
   const HostGroup* const group = GroupOf(disk.name);
   record.state = DiskState::Ineligible;
-  if (group != nullptr && group->mounted) {
+  if (disk.verdict) {
+    record.state = static_cast<DiskState>(disk.verdict->state);
+    record.reason = static_cast<DiskReason>(disk.verdict->reason);
+  } else if (group != nullptr && group->mounted) {
     record.state = DiskState::InUse;
   } else if (disk.absent && group == nullptr) {
     record.reason = DiskReason::None;

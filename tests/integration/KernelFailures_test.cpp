@@ -22,7 +22,6 @@
 namespace Integration {
 namespace {
 
-using OtxCtl::Fault::FaultRule;
 using OtxCtl::Sim::AHost;
 using OtxCtl::Sim::HostDescription;
 using OtxCtl::Sim::HostGroup;

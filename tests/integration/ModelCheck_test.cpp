@@ -31,6 +31,7 @@ using OtxCtl::Sim::HostBuilder;
 using OtxCtl::Sim::HostDescription;
 using OtxCtl::Sim::HostDisk;
 using OtxCtl::Sim::HostGroup;
+using OtxCtl::Sim::HostVerdict;
 using Names = std::vector<std::string>;
 
 constexpr int requestsOfASequence = 25;
@@ -158,10 +159,15 @@ HostDescription SequenceDraw::Host() {
     const bool ssd = Chance(3);
     const bool tagged = Chance(4) && (ssd || Chance(6));
     const bool usb = Chance(20);
+    // Eligible, but too small; eligible, but of an unmounted group; ineligible for no reason; in use by
+    // nobody.
+    constexpr std::array<HostVerdict, 4> odd = {{{1, 5}, {1, 6}, {2, 0}, {0, 0}}};
+    const bool isOdd = Chance(20);
     host.WithDisk(name, ssd, [&](HostDisk& disk) {
       disk.capacityFlash = tagged;
       disk.partitions = Chance(15) ? 1 : 0;
       disk.transport = usb ? std::optional<std::string>("usb") : std::nullopt;
+      disk.verdict = isOdd ? std::optional<HostVerdict>(Pick(odd)) : std::nullopt;
     });
     (ssd && !tagged ? ssds : others).push_back(name);
   }

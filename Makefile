@@ -7,7 +7,7 @@ JOBS ?= $(shell nproc)
 CTEST := ctest --output-on-failure --no-tests=error -j $(JOBS)
 
 help:
-	@echo "make demo    build, start the agent on an example host and look at its disks"
+	@echo "make demo    build, start the agent on an example host; its disks are added, lost, unmounted, claimed"
 	@echo "make test    build and run every test that needs no virtual machine"
 	@echo "make check   format, second compiler, clang-tidy on what changed, sanitizers, fuzzing"
 	@echo "make bench   benchmarks"

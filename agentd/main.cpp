@@ -12,6 +12,7 @@
 #include "agentd/Trace.h"
 #include "agentd/http/HttpServer.h"
 #include "agentd/routes/Routes.h"
+#include "agentd/tasks/TaskQueue.h"
 #include "host/HostRuntime.h"
 #include "host/KovaService.h"
 #include "host/LogSink.h"
@@ -68,34 +69,48 @@ void WriteReadyFile(const Options& options) {
   }
 }
 
-void Serve(Options& options) {
+void SetUpLogging(const Options& options) {
   Tessa::Service::LogLevel level{};
   if (!Tessa::Service::ParseLevel(options.logLevel, level)) {
     throw std::runtime_error("unknown log level '" + options.logLevel +
                              "'; levels are none, error, warning, info, verbose, trivia");
   }
-  const std::string socketPath = SocketPath(options.listen);
-  const auto logger = Host::MakeConsoleLogger(level);
-  Tessa::Service::SetDefaultLogger(logger);
+  Tessa::Service::SetDefaultLogger(Host::MakeConsoleLogger(level));
   Tessa::SetPanicHandler(&EndOverPanic);
+}
+
+void Log(Tessa::Service::LogLevel level, const char* format, const std::string& argument = {}) {
+  Tessa::Service::LogInternal(Tessa::Service::GetDefaultLogger(), level, format, argument);
+}
+
+void Serve(Options& options) {
+  using Tessa::Service::LogLevel;
+  const std::string socketPath = SocketPath(options.listen);
+  SetUpLogging(options);
   if (!options.traceFile.empty()) {
     options.runtime.recorder = Agentd::TraceTo(options.traceFile);
   }
-  const Host::KovaService service(Host::HostRuntime::Start(options.runtime).Hooks());
-  Agentd::HttpServer server(socketPath, Agentd::HttpLimits(), [&service](const Agentd::HttpRequest& request) {
-    return Agentd::Route(service, request);
-  });
+  Host::HostRuntime& runtime = Host::HostRuntime::Start(options.runtime);
+  const Host::KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+  Agentd::TaskQueue tasks;
+  const Agentd::Router router(service, tasks);
+  Agentd::HttpServer server(
+      socketPath, Agentd::HttpLimits(),
+      [&router](const Agentd::HttpRequest& request, const Agentd::HttpResponder& responder) {
+        router.Serve(request, responder);
+      });
+  server.OnStopping([&tasks] { tasks.Close(); });
   WriteReadyFile(options);
-  using Tessa::Service::LogInternal;
-  using Tessa::Service::LogLevel;
-  LogInternal(logger, LogLevel::Info, "Answering on %1", options.listen);
-  if (!server.Run()) {
+  Log(LogLevel::Info, "Answering on %1", options.listen);
+  const bool isDrained = server.Run();
+  tasks.Finish();  // whatever the time: a change is never left in its middle
+  if (!isDrained) {
     // A handler hangs, and may never come back: nothing that it could still use is taken down.
-    LogInternal(logger, LogLevel::Warning, "Stopped with requests unfinished");
+    Log(LogLevel::Warning, "Stopped with requests unfinished");
     Host::FlushLogs();
     _exit(unfinishedStatus);
   }
-  LogInternal(logger, LogLevel::Info, "Stopped");
+  Log(LogLevel::Info, "Stopped");
 }
 
 }  // namespace

@@ -6,6 +6,8 @@
 
 #include <benchmark/benchmark.h>
 
+#include <algorithm>
+#include <random>
 #include <stdexcept>
 #include <string>
 #include <vector>
@@ -67,19 +69,26 @@ class Fixture : public Bench::ManagerFixture {
     return disks;
   }
 
-  // The disks as groups of a request.
-  Ref<DataArray<DiskMapping>> Groups() const {
+  // The disks as groups of a request, in the host's order or in none.
+  Ref<DataArray<DiskMapping>> Groups(bool shuffled) const {
+    std::vector<Ref<ScsiDisk>> disks;
+    for (ScsiDisk* disk : *_disks) {
+      disks.emplace_back(disk);
+    }
+    if (shuffled) {
+      std::shuffle(disks.begin(), disks.end(), std::mt19937(1));
+    }
     const auto groups = MakeRef<DataArray<DiskMapping>>();
     Ref<DataArray<ScsiDisk>> capacity;
-    for (std::size_t i = 0; i < _disks->Size(); ++i) {
+    for (std::size_t i = 0; i < disks.size(); ++i) {
       if (i % disksPerGroup == 0) {
         const auto mapping = MakeRef<DiskMapping>();
         capacity = MakeRef<DataArray<ScsiDisk>>();
-        mapping->SetSsd((*_disks)[i]);
+        mapping->SetSsd(disks[i]);
         mapping->SetNonSsd(capacity);
         groups->Append(mapping);
       } else {
-        capacity->Append((*_disks)[i]);
+        capacity->Append(disks[i]);
       }
     }
     return groups;
@@ -158,13 +167,19 @@ void FindUnmounted(benchmark::State& state) {
 }
 
 // The request as a whole.
-void CheckRequest(benchmark::State& state) {
+void CheckGroups(benchmark::State& state, bool shuffled) {
   Fixture fixture(EmptyHost(static_cast<int>(state.range(0))));
-  const Ref<DataArray<DiskMapping>> groups = fixture.Groups();
+  const Ref<DataArray<DiskMapping>> groups = fixture.Groups(shuffled);
   for (auto _ : state) {
     fixture.Manager().ValidateDiskMappings(groups.Get());
   }
   CountDisks(state);
+}
+void CheckRequest(benchmark::State& state) {
+  CheckGroups(state, false);
+}
+void CheckShuffled(benchmark::State& state) {
+  CheckGroups(state, true);
 }
 
 BENCHMARK(PlanHybrid)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
@@ -172,6 +187,7 @@ BENCHMARK(ExtendGroups)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(327
 BENCHMARK(SplitAllFlash)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
 BENCHMARK(FindUnmounted)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
 BENCHMARK(CheckRequest)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
+BENCHMARK(CheckShuffled)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
 
 void PlanHybridFloor(benchmark::State& state) {
   ReadDisks(state);
@@ -201,6 +217,10 @@ BENCHMARK(PlanHybridFloor)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(
 BENCHMARK(ExtendGroupsFloor)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
 BENCHMARK(SplitAllFlashFloor)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
 BENCHMARK(FindUnmountedFloor)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
+void CheckShuffledFloor(benchmark::State& state) {
+  ReadDisks(state);
+}
+BENCHMARK(CheckShuffledFloor)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
 BENCHMARK(CheckRequestFloor)->ArgName("disks")->Arg(32)->Arg(512)->Arg(4096)->Arg(32768);
 
 }  // namespace

@@ -1,7 +1,9 @@
 // What a request must be before it may reach the plug-in.
 //
 // The plug-in takes a mistyped or half-filled request for impossible and ends the process over it. So every
-// request of a client passes here first, and what is refused is answered with a fault that names the thing.
+// request of a client passes here first. What is refused is thrown as an InvalidArgument, whose property is
+// the place ("disks[3]") and whose message says why; what is let in comes back with every disk that the
+// inventory knows replaced by the inventory's object: a client cannot call a hard disk flash.
 //
 // Threads: any.
 #pragma once
@@ -9,15 +11,50 @@
 #include <string>
 #include <vector>
 
+#include "host/ManagementApi.h"
 #include "orbis/Types.h"
+
+namespace HostCtl::Kova {
+class KovaInfo;
+}
+
+namespace Host {
+class KnownDisks;
+}
 
 namespace Host::Gate {
 
-inline constexpr std::size_t longestName = 1024;  // bytes
-inline constexpr std::size_t mostNames = 100'000;
+inline constexpr std::size_t longestName = 1024;    // bytes
+inline constexpr std::size_t longestOption = 4096;  // bytes
+inline constexpr std::size_t mostNames = 100'000;   // or disks, of a whole request
+inline constexpr std::size_t mostMappings = 10'000;
 
-// Null when the names may pass: not empty, not too long, UTF-8 without control characters, not too many.
-// Otherwise an InvalidArgument whose property is the place ("names[3]") and whose message says why.
-Tessa::Ref<Orbis::MethodFault> CheckNames(const std::string& property, const std::vector<std::string>& names);
+// Names must be there, not too long, UTF-8 without control characters, and not too many. `property` is what
+// the client calls them.
+void CheckNames(const std::string& property, const std::vector<std::string>& names);
+
+// The name of a disk, present or absent, and what goes with it to the kernel.
+void CheckRemoval(const std::string& disk, const RemovalArguments& arguments);
+void CheckRemovalArguments(const RemovalArguments& arguments);
+
+// The disks of an AddDisks. One that the inventory lacks is let in only with its ssd flag.
+Tessa::Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known);
+
+// Groups to be made: as AdmitDisks, but absent disks may be named too.
+Tessa::Ref<MappingList> AdmitNewGroups(const MappingList& mappings, const KnownDisks& known);
+
+// Groups that are there already, to be unmounted or removed. Their disks may be unknown to the inventory:
+// the plug-in compares names, and says itself when there is no such group.
+Tessa::Ref<MappingList> AdmitGroups(const MappingList& mappings, const KnownDisks& known);
+Tessa::Ref<Nox::Kova::Host::DiskMapping> AdmitGroup(const Nox::Kova::Host::DiskMapping& mapping,
+                                                    const KnownDisks& known);
+
+// Disks as AdmitDisks lets them in: a cache disk of a group that is not mounted brings its whole group along,
+// and the plug-in cannot bear a member that the inventory lacks. Refuses the disk and names the member. A
+// kernel that cannot be asked is a SystemError, thrown as well.
+void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel);
+
+// A change of a simulated host that the host would not accept; `error` begins with the path.
+[[noreturn]] void RefuseChange(const std::string& error);
 
 }  // namespace Host::Gate

@@ -28,6 +28,13 @@ std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(
   return std::make_unique<OtxCtl::Fault::RecordingProvider>(std::move(provider), recorder);
 }
 
+HostDescription DescribedHost(const RuntimeOptions& options) {
+  if (options.hostText) {
+    return OtxCtl::Sim::ParseHostDescription(*options.hostText);
+  }
+  return options.hostFile.empty() ? OtxCtl::Sim::DefaultHost() : OtxCtl::Sim::LoadHostFile(options.hostFile);
+}
+
 }  // namespace
 
 HostRuntime& HostRuntime::Start(const RuntimeOptions& options) {
@@ -63,14 +70,13 @@ void HostRuntime::Uninstall() noexcept {
 }
 
 void HostRuntime::LoadHost(const RuntimeOptions& options) {
-  if (options.save && options.hostFile.empty()) {
+  if (options.save && (options.hostFile.empty() || options.hostText)) {
     throw HostError("--save needs a host of your own: name its file with --host");
   }
   if (options.save) {
     _writer.emplace(options.hostFile);  // before reading: nobody else may write from here on
   }
-  _host = std::make_shared<SimHost>(options.hostFile.empty() ? OtxCtl::Sim::DefaultHost()
-                                                             : OtxCtl::Sim::LoadHostFile(options.hostFile));
+  _host = std::make_shared<SimHost>(DescribedHost(options));
   if (_writer) {
     _host->SetSaver([this](const HostDescription& changed) { _writer->Save(changed); });
   }

@@ -20,7 +20,9 @@ class CallRecorder;
 namespace Host {
 
 struct RuntimeOptions {
-  std::string hostFile;    // empty: the embedded example host
+  std::string hostFile;  // empty: the embedded example host
+  // The host's description itself, instead of a file; it is never saved.
+  std::optional<std::string> hostText;
   bool save = false;       // write every change of the host back to its file
   std::string pluginFile;  // empty: where FindPlugin finds it
   // Records every call of the provider, if set.

@@ -17,8 +17,10 @@
 #include "host/KovaService.h"
 #include "host/LogSink.h"
 #include "host/testing/OwnProcess.h"
+#include "host/testing/Requests.h"
 #include "nox/Kova.h"
 #include "nox/StorageSystem.h"
+#include "orbis/Soap.h"
 #include "otxctl/fault/CallRecorder.h"
 #include "otxctl/sim/HostBuilder.h"
 #include "tessa/Panic.h"
@@ -120,6 +122,24 @@ TEST_F(HostRuntimeTest, ServesTheHostOfAFile) {
   InOwnProcess([&options] {
     EXPECT_THAT(Disks(HostRuntime::Start(options)), ElementsAre("naa.1 eligible", "naa.2 ineligible"));
   });
+}
+
+TEST_F(HostRuntimeTest, ServesTheHostOfAText) {
+  auto options = OnExampleHost();
+  options.hostText = WriteHostDescription(AHost().WithSsd("naa.1").Build());
+  InOwnProcess(
+      [&options] { EXPECT_THAT(Disks(HostRuntime::Start(options)), ElementsAre("naa.1 eligible")); });
+  options.hostText = R"({"disks": [{"name": "naa.1", "ssd": 1, "bytes": 1}]})";
+  InOwnProcess([&options] {
+    EXPECT_THAT(WhyNotStarted<OtxCtl::Sim::HostDescriptionError>(options), HasSubstr("disks[0].ssd"));
+  });
+}
+
+TEST_F(HostRuntimeTest, DoesNotSaveTheHostOfAText) {
+  auto options = On(AHost().WithSsd("naa.1"));
+  options.hostText = WriteHostDescription(AHost().WithSsd("naa.2").Build());
+  options.save = true;
+  InOwnProcess([&options] { EXPECT_THAT(WhyNotStarted<HostError>(options), HasSubstr("--save")); });
 }
 
 TEST_F(HostRuntimeTest, IsTheSameWhoeverStartsItLater) {
@@ -249,6 +269,75 @@ TEST_F(HostRuntimeTest, APluginThatCannotBeInitialisedLeavesNothingBehind) {
 
     options.pluginFile = KOVA_PLUGIN;
     EXPECT_THAT(Disks(HostRuntime::Start(options)), ElementsAre("naa.1 eligible"));
+  });
+}
+
+// The whole way through the gate and the real plug-in, and back.
+std::string ToldBy(const Answer& answer) {
+  return Testing::Told(answer.fault.Get());
+}
+
+TEST_F(HostRuntimeTest, AddsUnmountsClaimsAndRemovesOnTheSimulatedHost) {
+  const auto options = On(AHost().WithSsd("naa.1").WithHdds({"naa.2", "naa.3"}));
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+    const auto groups = [&runtime] { return runtime.SimulatedHost().Snapshot().groups; };
+    EXPECT_EQ(ToldBy(service.AddDisks(*Testing::DisksNamed({"naa.1", "naa.2", "naa.3"}))), "done");
+    ASSERT_EQ(groups().size(), 1u);
+    EXPECT_EQ(ToldBy(service.RemoveDisk("naa.3", {})), "done");
+    const auto group = Testing::MappingOf("naa.1", {"naa.2"});
+    EXPECT_EQ(ToldBy(service.UnmountDiskMapping(*Testing::Mappings({group}))), "done");
+    EXPECT_FALSE(groups()[0].mounted);
+    EXPECT_EQ(ToldBy(service.ClaimUnmountedDiskgroup()), "done");
+    EXPECT_TRUE(groups()[0].mounted);
+    EXPECT_EQ(ToldBy(service.RemoveDiskMapping(*group, {})), "done");
+    EXPECT_TRUE(groups().empty());
+    EXPECT_EQ(ToldBy(service.InitializeDisks(*Testing::Mappings({group}))), "done");
+    EXPECT_EQ(groups().size(), 1u);
+  });
+}
+
+TEST_F(HostRuntimeTest, RefusesTheCacheDiskOfABrokenGroupThatWouldEndThePlugin) {
+  const auto options = On(AHost()
+                              .WithSsd("naa.1")
+                              .WithHdds({"naa.2", "naa.3", "naa.4"})
+                              .WithUnmountedGroup("naa.1", {"naa.2", "naa.3"})
+                              .Without("naa.3"));
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+    EXPECT_THAT(ToldBy(service.AddDisks(*Testing::DisksNamed({"naa.1", "naa.4"}))),
+                HasSubstr("'kova:uuid-of-naa.3'"));
+    EXPECT_EQ(ToldBy(service.ChangeHost(R"({"disk": {"name": "naa.3", "absent": false}})")), "done");
+    EXPECT_EQ(ToldBy(service.AddDisks(*Testing::DisksNamed({"naa.1"}))), "done");
+    EXPECT_TRUE(runtime.SimulatedHost().Snapshot().groups[0].mounted);
+  });
+}
+
+TEST_F(HostRuntimeTest, WithoutTheGateThatRequestEndsTheProcess) {
+  const auto options =
+      On(AHost().WithSsd("naa.1").WithHdd("naa.2").WithUnmountedGroup("naa.1", {"naa.2"}).Without("naa.2"));
+  InOwnProcess(
+      [&options] {
+        const HostRuntime& runtime = HostRuntime::Start(options);
+        std::string disk;
+        std::string fault;
+        std::string result;
+        Orbis::SerializeObjectToSoap(*Testing::ADisk("naa.1", true), nullptr, disk);
+        runtime.Hooks().addDisks({disk}, "", fault, result);
+      },
+      panicStatus, "panic: Not initialized");
+}
+
+TEST_F(HostRuntimeTest, AChangeOfTheHostIsSeenByTheNextRequest) {
+  const auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+    EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible", "naa.2 eligible"));
+    EXPECT_EQ(ToldBy(service.ChangeHost(R"({"disk": {"name": "naa.2", "partitions": 1}})")), "done");
+    EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible", "naa.2 ineligible"));
   });
 }
 

@@ -1,10 +1,27 @@
 #include "host/KovaService.h"
 
 #include <exception>
+#include <memory>
 
 #include "host/Gate.h"
+#include "host/HostError.h"
+#include "host/KnownDisks.h"
+#include "host/UnmountedGroups.h"
+#include "kova/agentd/include/HostCtlException.h"
+#include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/include/KovaPlugin.h"
+#include "nox/Kova.h"
+#include "orbis/Soap.h"
+#include "otxctl/TaskScope.h"
+#include "otxctl/sim/SimHost.h"
 
 namespace Host {
+
+using Nox::Kova::Host::DiskMapping;
+using OtxCtl::Sim::HostDescription;
+using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
+using Tessa::Ref;
+
 namespace {
 
 // Calls a hook with empty texts and reads what it appended.
@@ -12,9 +29,19 @@ template <class Call>
 Answer Ask(Call call) {
   std::string faultText;
   std::string resultText;
+  call(faultText, resultText);
+  return ReadAnswer(faultText, resultText);
+}
+
+// The work's answer; what the gate refuses, and any exception, become a fault.
+template <class Work>
+Answer Guarded(Work work) {
   try {
-    call(faultText, resultText);
-    return ReadAnswer(faultText, resultText);
+    return work();
+  } catch (const Orbis::MethodFault::Exception& refused) {
+    return {.result = nullptr, .fault = refused.GetFault()};
+  } catch (const HostCtl::Lib::HostCtlException& failed) {
+    return FailedWith(failed.Describe());
   } catch (const std::exception& exception) {
     return FailedWith(exception.what());
   }
@@ -25,27 +52,162 @@ Answer OrFailed(Answer answer, const char* reason) {
   return answer.result || answer.fault ? answer : FailedWith(reason);
 }
 
+std::string RequestTag() {
+  const OtxCtl::TaskScope* const task = OtxCtl::TaskScope::Current();
+  return task == nullptr ? std::string() : task->GetId();
+}
+
+std::string ToText(const Orbis::Any& value) {
+  std::string text;
+  Orbis::SerializeObjectToSoap(value, nullptr, text);
+  return text;
+}
+
+template <class Item>
+Kovasvc::Texts ToTexts(const Orbis::DataArray<Item>& items) {
+  Kovasvc::Texts texts;
+  texts.reserve(items.Size());
+  for (const Item* item : items) {
+    texts.push_back(ToText(*item));
+  }
+  return texts;
+}
+
+std::unique_ptr<HostCtl::Kova::KovaInfo> Kernel() {
+  return std::unique_ptr<HostCtl::Kova::KovaInfo>(OtxCtl::Kova::KovaPluginImpl().GetKovaInfo());
+}
+
 }  // namespace
 
 Answer KovaService::QueryDisksForKova(const std::vector<std::string>& names) const {
-  if (const auto refused = Gate::CheckNames("names", names)) {
-    return {.result = nullptr, .fault = refused};
-  }
-  return OrFailed(Ask([&](std::string& faultText, std::string& resultText) {
-                    std::vector<std::string> wanted = names;
-                    _hooks.queryDisksForKova(wanted, faultText, resultText);
-                  }),
-                  "The disks of the host could not be read; the agent's log says why.");
+  return Guarded([&] {
+    Gate::CheckNames("names", names);
+    return OrFailed(Ask([&](std::string& faultText, std::string& resultText) {
+                      std::vector<std::string> wanted = names;
+                      _hooks.queryDisksForKova(wanted, faultText, resultText);
+                    }),
+                    "The disks of the host could not be read; the agent's log says why.");
+  });
 }
 
 Answer KovaService::GetStorageInfo() const {
-  return OrFailed(Ask([&](std::string&, std::string& resultText) { _hooks.getStorageInfo(resultText); }),
-                  "The disk groups of the host could not be read; the agent's log says why.");
+  return Guarded([&] {
+    return OrFailed(Ask([&](std::string&, std::string& resultText) { _hooks.getStorageInfo(resultText); }),
+                    "The disk groups of the host could not be read; the agent's log says why.");
+  });
+}
+
+Answer KovaService::GetDiskGroups() const {
+  Answer answer = GetStorageInfo();
+  auto* const info = dynamic_cast<StorageInfo*>(answer.result.Get());
+  if (info == nullptr) {
+    return answer;
+  }
+  const Answer more = Guarded([&] {
+    AppendUnmounted(UnmountedGroups(*Kernel()), KnownDisks::Now(), *info);
+    return Answer();
+  });
+  answer.fault = more.fault;  // beside the groups that could be read
+  return answer;
 }
 
 Answer KovaService::GetConfigInfo() const {
-  return OrFailed(Ask([&](std::string&, std::string& resultText) { _hooks.getConfigInfo(resultText); }),
-                  "The configuration of the host could not be read; the agent's log says why.");
+  return Guarded([&] {
+    return OrFailed(Ask([&](std::string&, std::string& resultText) { _hooks.getConfigInfo(resultText); }),
+                    "The configuration of the host could not be read; the agent's log says why.");
+  });
+}
+
+Answer KovaService::AddDisks(const DiskList& disks) const {
+  return Guarded([&] {
+    const KnownDisks known = KnownDisks::Now();
+    const Ref<DiskList> admitted = Gate::AdmitDisks(disks, known);
+    Gate::DemandWholeGroups(*admitted, known, *Kernel());
+    return Ask([&](std::string& faultText, std::string& resultText) {
+      _hooks.addDisks(ToTexts(*admitted), RequestTag(), faultText, resultText);
+    });
+  });
+}
+
+Answer KovaService::AddAllEligibleDisks() const {
+  return Guarded([&] {
+    return Ask([&](std::string& faultText, std::string& resultText) {
+      _hooks.addAllEligibleDisks(RequestTag(), faultText, resultText);
+    });
+  });
+}
+
+Answer KovaService::InitializeDisks(const MappingList& mappings) const {
+  return Guarded([&] {
+    const Ref<MappingList> admitted = Gate::AdmitNewGroups(mappings, KnownDisks::Now());
+    return Ask([&](std::string& faultText, std::string& resultText) {
+      _hooks.initializeDisks(ToTexts(*admitted), RequestTag(), faultText, resultText);
+    });
+  });
+}
+
+Answer KovaService::UnmountDiskMapping(const MappingList& mappings) const {
+  return Guarded([&] {
+    const Ref<MappingList> admitted = Gate::AdmitGroups(mappings, KnownDisks::Now());
+    return Ask([&](std::string& faultText, std::string& resultText) {
+      _hooks.unmountDiskMapping(ToTexts(*admitted), RequestTag(), faultText, resultText);
+    });
+  });
+}
+
+Answer KovaService::RemoveDisk(const std::string& disk, const RemovalArguments& arguments) const {
+  return Guarded([&] {
+    Gate::CheckRemoval(disk, arguments);
+    return Ask([&](std::string& faultText, std::string&) {
+      _hooks.removeDisks(disk, arguments.passThrough, arguments.optionText, arguments.optionFirst,
+                         arguments.optionSecond, faultText);
+    });
+  });
+}
+
+Answer KovaService::RemoveDiskMapping(const DiskMapping& mapping, const RemovalArguments& arguments) const {
+  return Guarded([&] {
+    Gate::CheckRemovalArguments(arguments);
+    const Ref<DiskMapping> admitted = Gate::AdmitGroup(mapping, KnownDisks::Now());
+    return Ask([&](std::string& faultText, std::string&) {
+      _hooks.removeDiskMapping(ToText(*admitted), arguments.passThrough, arguments.optionText,
+                               arguments.optionFirst, arguments.optionSecond, faultText);
+    });
+  });
+}
+
+Answer KovaService::ClaimUnmountedDiskgroup() const {
+  return Guarded([&] {
+    _hooks.claimUnmountedDiskgroup();
+    return Answer();
+  });
+}
+
+OtxCtl::Sim::SimHost& KovaService::SimulatedHost() const {
+  if (_simulated == nullptr) {
+    throw HostError("this is no simulated host: there is no description of it");
+  }
+  return *_simulated;
+}
+
+std::string KovaService::DescribeHost() const {
+  return WriteHostDescription(SimulatedHost().Snapshot());
+}
+
+Answer KovaService::ChangeHost(const std::string& change) const {
+  OtxCtl::Sim::SimHost& host = SimulatedHost();
+  return Guarded([&] {
+    try {
+      host.Change([&change](HostDescription& described) { ApplyChange(described, change); });
+    } catch (const OtxCtl::Sim::HostDescriptionError& refused) {
+      Gate::RefuseChange(refused.what());
+    }
+    // The plug-in's cache of the disks must not be older than the host. This is done out here and not by the
+    // host's listener, which may run inside a hook that holds the plug-in's locks.
+    std::string dropped;
+    _hooks.getStorageInfo(dropped);
+    return Answer();
+  });
 }
 
 }  // namespace Host

@@ -52,9 +52,9 @@ void PrintText(const ConfigInfo& config, std::ostream& out) {
 
 }  // namespace
 
-ExitStatus RunConfig(const Connection& connection, const std::string& output, std::ostream& out,
+ExitStatus RunConfig(const Host::ManagementApi& host, const std::string& output, std::ostream& out,
                      std::ostream& err) {
-  return PrintAnswer<ConfigInfo>(connection.GetConfigInfo(), output, out, err, &PrintText);
+  return PrintAnswer<ConfigInfo>(host.GetConfigInfo(), output, out, err, &PrintText);
 }
 
 }  // namespace Kovactl

@@ -5,7 +5,7 @@
 
 #include <sstream>
 
-#include "kovactl/testing/FakeConnection.h"
+#include "kovactl/testing/FakeHost.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
 #include "orbis/Soap.h"
@@ -43,11 +43,11 @@ Ref<ConfigInfo> AFullConfig() {
 class ConfigCommand : public testing::Test {
  protected:
   ExitStatus Run(const Ref<ConfigInfo>& config, const std::string& output = "table") {
-    _connection.answer.result = config;
-    return RunConfig(_connection, output, _out, _err);
+    _host.answer.result = config;
+    return RunConfig(_host, output, _out, _err);
   }
 
-  Testing::FakeConnection _connection;
+  Testing::FakeHost _host;
   std::ostringstream _out;
   std::ostringstream _err;
 };
@@ -106,8 +106,8 @@ TEST_F(ConfigCommand, PrintsTheObjectForScripts) {
 }
 
 TEST_F(ConfigCommand, ExplainsAFault) {
-  _connection.answer = Host::FailedWith("no host");
-  EXPECT_EQ(RunConfig(_connection, "table", _out, _err), ExitStatus::Fault);
+  _host.answer = Host::FailedWith("no host");
+  EXPECT_EQ(RunConfig(_host, "table", _out, _err), ExitStatus::Fault);
   EXPECT_THAT(_err.str(), testing::HasSubstr("no host"));
 }
 

@@ -14,56 +14,53 @@
 namespace Kovactl {
 namespace {
 
-class OwnHost final : public Connection {
- public:
-  explicit OwnHost(const Host::PluginHooks& hooks) : _service(hooks) {}
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
-    return _service.QueryDisksForKova(names);
-  }
-  Host::Answer GetStorageInfo() const override { return _service.GetStorageInfo(); }
-  Host::Answer GetConfigInfo() const override { return _service.GetConfigInfo(); }
-
- private:
-  Host::KovaService _service;
-};
-
-class AgentsHost final : public Connection {
- public:
-  explicit AgentsHost(const std::string& url) : _client(url) {}
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
-    return _client.QueryDisksForKova(names);
-  }
-  Host::Answer GetStorageInfo() const override { return _client.GetStorageInfo(); }
-  Host::Answer GetConfigInfo() const override { return _client.GetConfigInfo(); }
-
- private:
-  Agentd::AgentClient _client;
-};
-
 [[noreturn]] void EndOverPanic(const char* text) {
   Host::FlushLogs();
   std::fprintf(stderr, "kovactl: the plug-in panicked: %s\n", text);
   _exit(static_cast<int>(ExitStatus::Panic));
 }
 
+Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
+  Tessa::Service::SetDefaultLogger(Host::MakeConsoleLogger(LevelOf(options.logLevel)));
+  Tessa::SetPanicHandler(&EndOverPanic);
+  return Host::HostRuntime::Start(options.runtime);
+}
+
+std::unique_ptr<Host::ManagementApi> ServiceOf(Host::HostRuntime& runtime) {
+  return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.SimulatedHost());
+}
+
 }  // namespace
 
-Connection::~Connection() = default;
-
-std::unique_ptr<Connection> Connect(const GlobalOptions& options) {
-  if (!options.runtime.hostFile.empty()) {
-    Tessa::Service::SetDefaultLogger(Host::MakeConsoleLogger(LevelOf(options.logLevel)));
-    Tessa::SetPanicHandler(&EndOverPanic);
-    return std::make_unique<OwnHost>(Host::HostRuntime::Start(options.runtime).Hooks());
+std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options) {
+  if (options.HostsThePlugIn()) {
+    return ServiceOf(StartRuntime(options));
   }
+  return ConnectToAgent(options);
+}
+
+std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options) {
   if (options.runtime.save) {
     throw BadInput("--save goes with --host; an agent saves its host itself");
   }
   try {
-    return std::make_unique<AgentsHost>(options.agent);
+    return std::make_unique<Agentd::AgentClient>(options.agent);
   } catch (const std::invalid_argument& refused) {
     throw BadInput(refused.what());
   }
+}
+
+std::unique_ptr<Host::ManagementApi> ConnectToCopy(const GlobalOptions& options) {
+  if (options.runtime.save) {
+    throw BadInput("a plan changes nothing, so there is nothing to --save");
+  }
+  GlobalOptions copy = options;
+  if (!options.HostsThePlugIn()) {
+    copy.runtime.hostText = Connect(options)->DescribeHost();
+  }
+  Host::HostRuntime& runtime = StartRuntime(copy);
+  runtime.SimulatedHost().SetWaiter([](std::chrono::milliseconds) {});
+  return ServiceOf(runtime);
 }
 
 Tessa::Service::LogLevel LevelOf(const std::string& name) {

@@ -3,22 +3,16 @@
 
 #include <memory>
 #include <string>
-#include <vector>
 
-#include "host/Answer.h"
 #include "host/HostRuntime.h"
+#include "host/ManagementApi.h"
 #include "tessa/Logger.h"
 
-namespace Kovactl {
+namespace Agentd {
+class AgentClient;
+}
 
-class Connection {
- public:
-  virtual ~Connection();
-  // As Host::KovaService::QueryDisksForKova.
-  virtual Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const = 0;
-  virtual Host::Answer GetStorageInfo() const = 0;
-  virtual Host::Answer GetConfigInfo() const = 0;
-};
+namespace Kovactl {
 
 // What all commands share.
 struct GlobalOptions {
@@ -26,10 +20,19 @@ struct GlobalOptions {
   Host::RuntimeOptions runtime;  // with a host file, the command hosts the plug-in itself
   std::string output = "table";  // table, json or soap
   std::string logLevel = "warning";
+
+  bool HostsThePlugIn() const noexcept { return !runtime.hostFile.empty(); }
 };
 
-// Throws BadInput, and what starting the runtime throws. An agent is not called yet.
-std::unique_ptr<Connection> Connect(const GlobalOptions& options);
+// Throws BadInput, and what starting the runtime throws. An agent is not called yet. Once per process.
+std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options);
+
+// The options' agent, not called yet. Throws BadInput.
+std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options);
+
+// A copy of the options' host, simulated in this process: what is done to it is forgotten, and delays that
+// it has on demand are not waited for. Throws as Connect does. Once per process, and instead of Connect.
+std::unique_ptr<Host::ManagementApi> ConnectToCopy(const GlobalOptions& options);
 
 // The level of that name; throws BadInput.
 Tessa::Service::LogLevel LevelOf(const std::string& name);

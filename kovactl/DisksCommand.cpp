@@ -16,10 +16,6 @@ namespace {
 using Nox::Kova::Host::DiskResult;
 using DiskResults = Orbis::DataArray<DiskResult>;
 
-std::string NameOf(const DiskResult& result) {
-  return result.GetDisk()->HasCanonicalName() ? result.GetDisk()->GetCanonicalName() : "";
-}
-
 std::string DescriptionOf(const DiskResult& result) {
   return result.GetDisk()->HasDisplayName() ? result.GetDisk()->GetDisplayName() : "";
 }
@@ -43,8 +39,8 @@ void PrintTable(const DiskResults& disks, std::ostream& out) {
   using Align = Table::Align;
   Table table({{"DISK"}, {"KIND"}, {"SIZE", Align::Right}, {"STATE"}, {"WHY NOT"}, {"DESCRIPTION"}});
   for (const DiskResult* disk : disks) {
-    table.AddRow({NameOf(*disk), KindOf(*disk->GetDisk()), SizeOf(*disk->GetDisk()), StateOf(*disk),
-                  ReasonOf(*disk), DescriptionOf(*disk)});
+    table.AddRow({NameOf(*disk->GetDisk()), KindOf(*disk->GetDisk()), SizeOf(*disk->GetDisk()),
+                  StateOf(*disk), ReasonOf(*disk), DescriptionOf(*disk)});
   }
   if (!disks.IsEmpty()) {
     table.Print(out);
@@ -55,9 +51,9 @@ void PrintTable(const DiskResults& disks, std::ostream& out) {
 
 }  // namespace
 
-ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>& names,
+ExitStatus RunDisks(const Host::ManagementApi& host, const std::vector<std::string>& names,
                     const std::string& output, std::ostream& out, std::ostream& err) {
-  const Host::Answer answer = connection.QueryDisksForKova(names);
+  const Host::Answer answer = host.QueryDisksForKova(names);
   const ExitStatus status = PrintAnswer<DiskResults>(answer, output, out, err, &PrintTable);
   const auto* const disks = dynamic_cast<const DiskResults*>(answer.result.Get());
   if (disks == nullptr) {
@@ -65,7 +61,7 @@ ExitStatus RunDisks(const Connection& connection, const std::vector<std::string>
   }
   std::set<std::string> unknown(names.begin(), names.end());
   for (const DiskResult* disk : *disks) {
-    unknown.erase(NameOf(*disk));
+    unknown.erase(NameOf(*disk->GetDisk()));
   }
   for (const std::string& name : unknown) {
     err << "kovactl: this host has no disk '" << Host::Printable(name) << "'\n";

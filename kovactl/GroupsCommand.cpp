@@ -2,6 +2,7 @@
 
 #include <ostream>
 
+#include "kovactl/DiskGroups.h"
 #include "kovactl/Print.h"
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
@@ -12,16 +13,18 @@ namespace {
 
 using Nox::Host::ScsiDisk;
 using Nox::Kova::Host::DiskMapInfo;
-using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
 
+// `state` is that of the group, for its first line; a disk that has left says so itself.
 void AddDisk(Table& table, const std::string& group, const std::string& role, const ScsiDisk* disk,
              const std::string& state) {
   if (disk == nullptr) {
     table.AddRow({group, role, "(missing)", "", "", state, ""});
     return;
   }
-  table.AddRow({group, role, disk->HasCanonicalName() ? disk->GetCanonicalName() : "", KindOf(*disk),
-                SizeOf(*disk), state, disk->HasDisplayName() ? disk->GetDisplayName() : ""});
+  const std::string left = HasLeft(*disk) ? "has left the host" : "";
+  const std::string both = state.empty() || left.empty() ? state + left : state + ", " + left;
+  table.AddRow({group, role, NameOf(*disk), KindOf(*disk), SizeOf(*disk), both,
+                disk->HasDisplayName() ? disk->GetDisplayName() : ""});
 }
 
 void PrintTable(const StorageInfo& info, std::ostream& out) {
@@ -61,9 +64,9 @@ void PrintTable(const StorageInfo& info, std::ostream& out) {
 
 }  // namespace
 
-ExitStatus RunGroups(const Connection& connection, const std::string& output, std::ostream& out,
+ExitStatus RunGroups(const Host::ManagementApi& host, const std::string& output, std::ostream& out,
                      std::ostream& err) {
-  return PrintAnswer<StorageInfo>(connection.GetStorageInfo(), output, out, err, &PrintTable);
+  return PrintAnswer<StorageInfo>(host.GetDiskGroups(), output, out, err, &PrintTable);
 }
 
 }  // namespace Kovactl

@@ -4,12 +4,12 @@
 #include <iosfwd>
 #include <string>
 
-#include "kovactl/Connection.h"
+#include "host/ManagementApi.h"
 #include "kovactl/ExitStatus.h"
 
 namespace Kovactl {
 
-ExitStatus RunGroups(const Connection& connection, const std::string& output, std::ostream& out,
+ExitStatus RunGroups(const Host::ManagementApi& host, const std::string& output, std::ostream& out,
                      std::ostream& err);
 
 }  // namespace Kovactl

@@ -5,7 +5,9 @@
 
 #include <sstream>
 
-#include "kovactl/testing/FakeConnection.h"
+#include "kovactl/DiskGroups.h"
+#include "kovactl/testing/FakeHost.h"
+#include "kovactl/testing/Objects.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
 #include "orbis/Json.h"
@@ -16,38 +18,17 @@ namespace {
 using Nox::Host::ScsiDisk;
 using Nox::Kova::Host::DiskMapInfo;
 using Orbis::DataArray;
-using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
 using Tessa::MakeRef;
 using Tessa::Ref;
-
-Ref<ScsiDisk> ADisk(const std::string& name, bool ssd) {
-  const auto disk = MakeRef<ScsiDisk>();
-  disk->SetCanonicalName(name);
-  disk->SetSsd(ssd);
-  disk->GetCapacity()->SetBlockSize(512);
-  disk->GetCapacity()->SetBlock(std::int64_t{1} << 21);
-  return disk;
-}
-
-Ref<DiskMapInfo> AGroup(const std::string& ssd, const std::vector<std::string>& capacity, bool mounted) {
-  const auto disks = MakeRef<DataArray<ScsiDisk>>();
-  for (const std::string& name : capacity) {
-    disks->Append(ADisk(name, false));
-  }
-  const auto group = MakeRef<DiskMapInfo>();
-  group->GetMapping()->SetSsd(ADisk(ssd, true));
-  group->GetMapping()->SetNonSsd(disks);
-  group->SetMounted(mounted);
-  return group;
-}
+using Testing::AGroup;
 
 class GroupsCommand : public testing::Test {
  protected:
-  GroupsCommand() : _info(MakeRef<StorageInfo>()) { _connection.answer.result = _info; }
+  GroupsCommand() : _info(MakeRef<StorageInfo>()) { _host.answer.result = _info; }
 
-  ExitStatus Run(const std::string& output = "table") { return RunGroups(_connection, output, _out, _err); }
+  ExitStatus Run(const std::string& output = "table") { return RunGroups(_host, output, _out, _err); }
 
-  Testing::FakeConnection _connection;
+  Testing::FakeHost _host;
   Ref<StorageInfo> _info;
   std::ostringstream _out;
   std::ostringstream _err;
@@ -71,6 +52,23 @@ TEST_F(GroupsCommand, PrintsEachGroupWithItsDisks) {
             "2 disk groups; the host waits to be told which disks to claim\n");
 }
 
+TEST_F(GroupsCommand, MarksDisksThatHaveLeft) {
+  const auto group = AGroup("kova:1", {"naa.2", "kova:3"}, true);
+  const auto left = MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{ScsiDisk::STATE_ERROR});
+  group->GetMapping()->GetSsd()->SetOperationalState(left);
+  (*group->GetMapping()->GetNonSsd())[1]->SetOperationalState(left);
+  _info->SetDiskMapInfo(MakeRef<DataArray<DiskMapInfo>>());
+  _info->GetDiskMapInfo()->Append(group);
+  EXPECT_EQ(Run(), ExitStatus::Done);
+  EXPECT_EQ(_out.str(),
+            "GROUP  ROLE      DISK    KIND          SIZE  STATE\n"
+            "    1  cache     kova:1  flash      1.0 GiB  mounted, has left the host\n"
+            "       capacity  naa.2   hard disk  1.0 GiB\n"
+            "       capacity  kova:3  hard disk  1.0 GiB  has left the host\n"
+            "\n"
+            "1 disk group\n");
+}
+
 TEST_F(GroupsCommand, SaysThatThereAreNone) {
   _info->SetAutoClaim(true);
   EXPECT_EQ(Run(), ExitStatus::Done);
@@ -90,7 +88,7 @@ TEST_F(GroupsCommand, PrintsTheObjectForScripts) {
 }
 
 TEST_F(GroupsCommand, ExplainsAFault) {
-  _connection.answer = Host::FailedWith("no host");
+  _host.answer = Host::FailedWith("no host");
   EXPECT_EQ(Run(), ExitStatus::Fault);
   EXPECT_EQ(_out.str(), "");
   EXPECT_THAT(_err.str(), testing::HasSubstr("no host"));

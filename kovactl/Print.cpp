@@ -3,7 +3,7 @@
 #include <ostream>
 
 #include "host/Text.h"
-#include "kovactl/Words.h"
+#include "kovactl/FaultWords.h"
 #include "orbis/Json.h"
 #include "orbis/Soap.h"
 
@@ -19,9 +19,10 @@ void PrintObject(const Orbis::Any& object, const std::string& output, std::ostre
   out << text << "\n";
 }
 
-void PrintFault(const Host::Answer& answer, std::ostream& err) {
-  if (answer.fault) {
-    err << "kovactl: " << Host::Printable(Explain(*answer.fault)) << "\n";
+void PrintFault(const Orbis::MethodFault& fault, std::ostream& err) {
+  err << "kovactl: " << Host::Printable(Explain(fault)) << "\n";
+  if (const std::string advice = Advise(fault); !advice.empty()) {
+    err << "  " << advice << "\n";
   }
 }
 

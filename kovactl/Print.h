@@ -12,14 +12,16 @@ namespace Kovactl {
 // Prints the object as JSON or SOAP text.
 void PrintObject(const Orbis::Any& object, const std::string& output, std::ostream& out);
 
-// Explains the answer's fault, if it has one, on a line of its own.
-void PrintFault(const Host::Answer& answer, std::ostream& err);
+// Explains the fault on a line of its own, and says on the next what can be done.
+void PrintFault(const Orbis::MethodFault& fault, std::ostream& err);
 
 // Prints a result of that type, as a table by `printTable`; Fault when there is a fault or no such result.
 template <class Result, class PrintTable>
 ExitStatus PrintAnswer(const Host::Answer& answer, const std::string& output, std::ostream& out,
                        std::ostream& err, PrintTable printTable) {
-  PrintFault(answer, err);
+  if (answer.fault) {
+    PrintFault(*answer.fault, err);
+  }
   const auto* const result = dynamic_cast<const Result*>(answer.result.Get());
   if (result == nullptr) {
     return ExitStatus::Fault;

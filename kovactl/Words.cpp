@@ -4,48 +4,14 @@
 #include <array>
 #include <cstdio>
 
-#include "nox/Faults.h"
+#include "kovactl/FaultWords.h"
 #include "nox/Kova.h"
-#include "orbis/TypeDescriptor.h"
 
 namespace Kovactl {
 namespace {
 
 using Nox::Host::ScsiDisk;
 using Nox::Kova::Host::DiskResult;
-using Orbis::MethodFault;
-
-struct FaultWords {
-  std::string_view type;
-  std::string_view words;
-};
-constexpr std::array<FaultWords, 15> faultWords = {{
-    {"DiskHasPartitions", "holds partitions or is in use by others"},
-    {"DiskIsUSB", "attached by USB"},
-    {"DiskIsNonLocal", "not local: other hosts can reach it"},
-    {"DiskTooSmall", "too small"},
-    {"DiskIsLastRemainingNonSSD", "last capacity disk of its group"},
-    {"DuplicateDisks", "a disk is named twice"},
-    {"InsufficientDisks", "too few disks for a disk group"},
-    {"KovaIncompatibleDiskMapping", "the disk group is of a format that this host does not know"},
-    {"KovaDiskFault", "the storage service refused the disk"},
-    {"KovaFault", "the storage service refused"},
-    {"InvalidArgument", "the request does not fit the host"},
-    {"SystemError", "something in the host failed"},
-    {"NotPermitted", "the caller's role does not allow this"},
-    {"Busy", "the host is busy; try again later"},
-    {"HostChanged", "the host has changed since it was looked at"},
-}};
-
-std::string WordsFor(const MethodFault& fault) {
-  const std::string& type = fault.GetType().name;
-  for (const FaultWords& row : faultWords) {
-    if (row.type == type) {
-      return std::string(row.words);
-    }
-  }
-  return type;
-}
 
 bool HasOperationalState(const ScsiDisk& disk, const char* state) {
   const auto& states = disk.GetOperationalState();
@@ -53,6 +19,14 @@ bool HasOperationalState(const ScsiDisk& disk, const char* state) {
 }
 
 }  // namespace
+
+std::string NameOf(const ScsiDisk& disk) {
+  return disk.HasCanonicalName() ? disk.GetCanonicalName() : "";
+}
+
+bool HasLeft(const ScsiDisk& disk) {
+  return HasOperationalState(disk, ScsiDisk::STATE_ERROR);
+}
 
 std::string KindOf(const ScsiDisk& disk) {
   if (!disk.HasSsd()) {
@@ -92,7 +66,7 @@ std::string ReasonOf(const DiskResult& result) {
   if (result.GetError()) {
     return WordsFor(*result.GetError());
   }
-  if (result.GetDisk() && HasOperationalState(*result.GetDisk(), ScsiDisk::STATE_ERROR)) {
+  if (result.GetDisk() && HasLeft(*result.GetDisk())) {
     return "has left the host";
   }
   if (result.GetState() != DiskResult::STATE_INELIGIBLE) {
@@ -101,21 +75,6 @@ std::string ReasonOf(const DiskResult& result) {
   return result.GetDisk() && HasOperationalState(*result.GetDisk(), ScsiDisk::STATE_OFF)
              ? "its disk group is not mounted"
              : "the kernel gives no reason";
-}
-
-std::string Explain(const MethodFault& fault) {
-  std::string text = WordsFor(fault);
-  if (const auto* systemError = dynamic_cast<const Orbis::Fault::SystemError*>(&fault)) {
-    text += ": " + systemError->GetReason();
-  }
-  const auto* diskFault = dynamic_cast<const Nox::Fault::KovaDiskFault*>(&fault);
-  if (diskFault != nullptr && diskFault->HasDevice()) {
-    text += ": " + diskFault->GetDevice();
-  }
-  for (const Orbis::LocalizableMessage* message : *fault.GetFaultMessage()) {
-    text += "; " + (message->HasMessage() ? message->GetMessage() : message->GetKey());
-  }
-  return text;
 }
 
 }  // namespace Kovactl

@@ -1,13 +1,18 @@
-// What API objects say, in words for people.
+// What disks say, in words for people.
 #pragma once
 
 #include <cstdint>
 #include <string>
 
 #include "nox/Fwd.h"
-#include "orbis/Types.h"
 
 namespace Kovactl {
+
+// The canonical name; empty for a disk without one.
+std::string NameOf(const Nox::Host::ScsiDisk& disk);
+
+// Whether the device is gone; only what the kernel remembers of it is left.
+bool HasLeft(const Nox::Host::ScsiDisk& disk);
 
 // "flash", "hard disk", or "unknown".
 std::string KindOf(const Nox::Host::ScsiDisk& disk);
@@ -24,8 +29,5 @@ std::string StateOf(const Nox::Kova::Host::DiskResult& result);
 
 // Why a disk cannot be used; empty when it can, or already is.
 std::string ReasonOf(const Nox::Kova::Host::DiskResult& result);
-
-// What went wrong, in one line: the words for the fault's kind, then its messages.
-std::string Explain(const Orbis::MethodFault& fault);
 
 }  // namespace Kovactl

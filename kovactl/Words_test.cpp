@@ -1,24 +1,17 @@
 #include "kovactl/Words.h"
 
-#include <gmock/gmock.h>
 #include <gtest/gtest.h>
-
-#include <set>
 
 #include "nox/Faults.h"
 #include "nox/Kova.h"
-#include "orbis/TypeDescriptor.h"
 
 namespace Kovactl {
 namespace {
 
 using Nox::Host::ScsiDisk;
 using Nox::Kova::Host::DiskResult;
-using Orbis::MethodFault;
 using Tessa::MakeRef;
 using Tessa::Ref;
-using testing::HasSubstr;
-using testing::Not;
 
 TEST(Words, ForTheKindOfADisk) {
   ScsiDisk disk;
@@ -70,6 +63,19 @@ Ref<DiskResult> ADisk(const std::string& state, const std::vector<std::string>& 
   return result;
 }
 
+TEST(Words, KnowADiskThatHasLeft) {
+  EXPECT_TRUE(HasLeft(*ADisk("inUse", {"error"})->GetDisk()));
+  EXPECT_FALSE(HasLeft(*ADisk("inUse", {"ok"})->GetDisk()));
+  EXPECT_FALSE(HasLeft(ScsiDisk()));
+}
+
+TEST(Words, AreEmptyForADiskWithoutName) {
+  ScsiDisk disk;
+  EXPECT_EQ(NameOf(disk), "");
+  disk.SetCanonicalName("naa.1");
+  EXPECT_EQ(NameOf(disk), "naa.1");
+}
+
 TEST(Words, ForTheStateOfADisk) {
   EXPECT_EQ(StateOf(*ADisk("inUse")), "in use");
   EXPECT_EQ(StateOf(*ADisk("eligible")), "eligible");
@@ -90,49 +96,6 @@ TEST(Words, ForTheReasonFollowTheFaultThenTheDisksState) {
   EXPECT_EQ(ReasonOf(*ADisk("inUse", {"error"})), "has left the host");
   EXPECT_EQ(ReasonOf(*ADisk("ineligible", {"off"})), "its disk group is not mounted");
   EXPECT_EQ(ReasonOf(*ADisk("ineligible", {"ok"})), "the kernel gives no reason");
-}
-
-// Every fault class there is, made without anything set.
-std::vector<Ref<MethodFault>> EveryFault() {
-  std::vector<Ref<MethodFault>> faults;
-  for (const Orbis::TypeDescriptor* type : Orbis::AllTypes()) {
-    if (type->kind == Orbis::TypeKind::DataObject && type->IsA(MethodFault::StaticType()) &&
-        !type->IsAbstract()) {
-      faults.emplace_back(static_cast<MethodFault*>(type->create().Get()));
-    }
-  }
-  return faults;
-}
-
-TEST(Words, StandForEveryFaultThatThereIs) {
-  std::set<std::string> words;
-  std::size_t count = 0;
-  for (const auto& fault : EveryFault()) {
-    const std::string& type = fault->GetType().name;
-    EXPECT_THAT(Explain(*fault), Not(HasSubstr(type))) << "the bare name of a class tells people nothing";
-    words.insert(Explain(*fault));
-    ++count;
-  }
-  EXPECT_GE(count, 15u);
-  EXPECT_EQ(words.size(), count) << "no two faults sound the same";
-}
-
-TEST(Words, OfAFaultGoOnWithWhatItCarries) {
-  EXPECT_EQ(Explain(Orbis::Fault::SystemError("no cable")), "something in the host failed: no cable");
-  EXPECT_EQ(Explain(Nox::Fault::DiskTooSmall("naa.1")), "too small: naa.1");
-  EXPECT_EQ(Explain(Nox::Fault::DiskTooSmall()), "too small");
-}
-
-TEST(Words, OfAFaultEndWithItsMessagesOrTheirKeys) {
-  Nox::Fault::KovaFault fault;
-  const auto told = MakeRef<Orbis::LocalizableMessage>();
-  told->SetKey("a.b");
-  told->SetMessage("first");
-  const auto untold = MakeRef<Orbis::LocalizableMessage>();
-  untold->SetKey("c.d");
-  fault.GetFaultMessage()->Append(told);
-  fault.GetFaultMessage()->Append(untold);
-  EXPECT_EQ(Explain(fault), "the storage service refused; first; c.d");
 }
 
 }  // namespace

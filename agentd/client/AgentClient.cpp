@@ -1,6 +1,7 @@
 #include "agentd/client/AgentClient.h"
 
 #include <stdexcept>
+#include <utility>
 
 #include "agentd/http/HttpClient.h"
 #include "nox/Kova.h"
@@ -10,9 +11,65 @@
 #include "orbis/json/JsonText.h"
 
 namespace Agentd {
+
+using Host::Answer;
+using Nox::Kova::Host::ConfigInfo;
+using Nox::Kova::Host::DiskMapping;
+using Nox::Kova::Host::DiskMapResult;
+using Nox::Kova::Host::DiskResult;
+using Orbis::DataArray;
+
 namespace {
 
 constexpr std::string_view unixScheme = "unix:";
+constexpr std::string_view jsonType = "application/json";
+constexpr std::string_view folder = "/api/v1/";
+constexpr std::size_t longestShown = 1024;  // bytes of an answer that is not understood
+
+constexpr std::chrono::milliseconds queryPatience = std::chrono::minutes(10);
+// A kernel may format for long, and to give up would not stop it.
+constexpr std::chrono::milliseconds changePatience = std::chrono::hours(24);
+
+// The members of a JSON object, one after the other.
+class Body {
+ public:
+  Body& Add(const char* name, const std::string& text) {
+    Begin(name);
+    Orbis::Json::AppendString(text, _text);
+    return *this;
+  }
+  Body& Add(const char* name, std::int32_t number) {
+    Begin(name);
+    _text += std::to_string(number);
+    return *this;
+  }
+  Body& Add(const char* name, const Orbis::Any& value) {
+    Begin(name);
+    Orbis::WriteJson(value, _text);
+    return *this;
+  }
+  Body& Add(const Host::RemovalArguments& arguments) {
+    return Add("passThrough", arguments.passThrough)
+        .Add("optionText", arguments.optionText)
+        .Add("optionFirst", arguments.optionFirst)
+        .Add("optionSecond", arguments.optionSecond);
+  }
+  std::string Done() const { return _text + "}"; }
+
+ private:
+  void Begin(const char* name) {
+    _text += _text.size() == 1 ? "" : ",";
+    Orbis::Json::AppendString(name, _text);
+    _text += ":";
+  }
+
+  std::string _text = "{";
+};
+
+const Orbis::TypeDescriptor* GroupResults() {
+  return &DataArray<DiskMapResult>::StaticType();
+}
+constexpr const Orbis::TypeDescriptor* noResult = nullptr;
 
 }  // namespace
 
@@ -23,35 +80,91 @@ AgentClient::AgentClient(const std::string& url) {
   _socketPath = url.substr(unixScheme.size());
 }
 
-Host::Answer AgentClient::QueryDisksForKova(const std::vector<std::string>& names) const {
-  std::string body = "{\"names\":[";
-  for (std::size_t i = 0; i < names.size(); ++i) {
-    body += i == 0 ? "" : ",";
-    Orbis::Json::AppendString(names[i], body);
-  }
-  body += "]}";
-  return Call("QueryDisksForKova", body, &Orbis::DataArray<Nox::Kova::Host::DiskResult>::StaticType());
+Answer AgentClient::QueryDisksForKova(const std::vector<std::string>& names) const {
+  const std::string body = Body().Add("names", Orbis::ArrayOfString(names)).Done();
+  return Ask("QueryDisksForKova", body, &DataArray<DiskResult>::StaticType(), queryPatience);
 }
 
-Host::Answer AgentClient::GetStorageInfo() const {
-  return Call("GetStorageInfo", "{}", &Nox::Kova::Host::ConfigInfo::StorageInfo::StaticType());
+Answer AgentClient::GetStorageInfo() const {
+  return Ask("GetStorageInfo", "{}", &ConfigInfo::StorageInfo::StaticType(), queryPatience);
 }
 
-Host::Answer AgentClient::GetConfigInfo() const {
-  return Call("GetConfigInfo", "{}", &Nox::Kova::Host::ConfigInfo::StaticType());
+Answer AgentClient::GetDiskGroups() const {
+  return Ask("GetDiskGroups", "{}", &ConfigInfo::StorageInfo::StaticType(), queryPatience);
 }
 
-Host::Answer AgentClient::Call(const std::string& operation, const std::string& body,
-                               const Orbis::TypeDescriptor* resultType) const {
-  const HttpAnswer http = Exchange(_socketPath, {"POST", "/api/v1/" + operation, "application/json", body});
-  if (http.contentType != "application/json") {
-    throw ConnectionError("the agent on " + _socketPath + " answered with status " +
-                          std::to_string(http.status) + ": " + http.body.substr(0, 1024));
-  }
+Answer AgentClient::GetConfigInfo() const {
+  return Ask("GetConfigInfo", "{}", &ConfigInfo::StaticType(), queryPatience);
+}
+
+Answer AgentClient::AddDisks(const Host::DiskList& disks) const {
+  return Ask("AddDisks", Body().Add("disks", disks).Done(), GroupResults(), changePatience);
+}
+
+Answer AgentClient::AddAllEligibleDisks() const {
+  return Ask("AddAllEligibleDisks", "{}", GroupResults(), changePatience);
+}
+
+Answer AgentClient::InitializeDisks(const Host::MappingList& mappings) const {
+  return Ask("InitializeDisks", Body().Add("mappings", mappings).Done(), GroupResults(), changePatience);
+}
+
+Answer AgentClient::UnmountDiskMapping(const Host::MappingList& mappings) const {
+  return Ask("UnmountDiskMapping", Body().Add("mappings", mappings).Done(), GroupResults(), changePatience);
+}
+
+Answer AgentClient::RemoveDisk(const std::string& disk, const Host::RemovalArguments& arguments) const {
+  return Ask("RemoveDisk", Body().Add("disk", disk).Add(arguments).Done(), noResult, changePatience);
+}
+
+Answer AgentClient::RemoveDiskMapping(const DiskMapping& mapping,
+                                      const Host::RemovalArguments& arguments) const {
+  return Ask("RemoveDiskMapping", Body().Add("mapping", mapping).Add(arguments).Done(), noResult,
+             changePatience);
+}
+
+Answer AgentClient::ClaimUnmountedDiskgroup() const {
+  return Ask("ClaimUnmountedDiskgroup", "{}", noResult, changePatience);
+}
+
+std::string AgentClient::DescribeHost() const {
+  return Get("host");
+}
+
+Answer AgentClient::ChangeHost(const std::string& change) const {
+  return Ask("host", change, noResult, changePatience);
+}
+
+std::string AgentClient::Tasks() const {
+  return Get("tasks");
+}
+
+std::string AgentClient::Task(const std::string& id) const {
+  return Get("tasks/" + id);
+}
+
+Answer AgentClient::Ask(const std::string& operation, const std::string& body,
+                        const Orbis::TypeDescriptor* resultType, std::chrono::milliseconds patience) const {
+  const HttpAnswer http =
+      Exchange(_socketPath, {"POST", std::string(folder) + operation, std::string(jsonType), body}, patience);
+  DemandJson(http);
   try {
     return Host::ReadJsonAnswer(http.body, resultType);
   } catch (const Orbis::ParseException& refused) {
     throw ConnectionError("the answer of the agent on " + _socketPath + " cannot be read: " + refused.what());
+  }
+}
+
+std::string AgentClient::Get(const std::string& target) const {
+  HttpAnswer http = Exchange(_socketPath, {"GET", std::string(folder) + target, "", ""}, queryPatience);
+  DemandJson(http);
+  return std::move(http.body);
+}
+
+void AgentClient::DemandJson(const HttpAnswer& http) const {
+  if (http.contentType != jsonType) {
+    throw ConnectionError("the agent on " + _socketPath + " answered with status " +
+                          std::to_string(http.status) + ": " + http.body.substr(0, longestShown));
   }
 }
 

@@ -1,27 +1,52 @@
 // The management API of an agent, over its socket: objects in, objects out.
 #pragma once
 
+#include <chrono>
 #include <string>
 #include <vector>
 
-#include "host/Answer.h"
+#include "agentd/http/HttpTypes.h"
+#include "host/ManagementApi.h"
 
 namespace Agentd {
 
-class AgentClient {
+// A change is waited for as long as it takes, within a day; a query for ten minutes.
+//
+// Threads: any; every call has a connection of its own. Errors: ConnectionError when the agent cannot be
+// reached or does not answer in the form it should. A fault of the gate, or Busy, is an answer like any
+// other.
+class AgentClient final : public Host::ManagementApi {
  public:
   // A URL: "unix:/run/kova/agentd.sock". Throws std::invalid_argument for any other.
   explicit AgentClient(const std::string& url);
 
-  // As Host::KovaService. Throws ConnectionError when the agent cannot be reached or does not answer in the
-  // form it should.
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const;
-  Host::Answer GetStorageInfo() const;
-  Host::Answer GetConfigInfo() const;
+  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override;
+  Host::Answer GetStorageInfo() const override;
+  Host::Answer GetDiskGroups() const override;
+  Host::Answer GetConfigInfo() const override;
+  // The label of these is empty.
+  Host::Answer AddDisks(const Host::DiskList& disks) const override;
+  Host::Answer AddAllEligibleDisks() const override;
+  Host::Answer InitializeDisks(const Host::MappingList& mappings) const override;
+  Host::Answer UnmountDiskMapping(const Host::MappingList& mappings) const override;
+  Host::Answer RemoveDisk(const std::string& disk, const Host::RemovalArguments& arguments) const override;
+  Host::Answer RemoveDiskMapping(const Nox::Kova::Host::DiskMapping& mapping,
+                                 const Host::RemovalArguments& arguments) const override;
+  Host::Answer ClaimUnmountedDiskgroup() const override;
+  std::string DescribeHost() const override;
+  Host::Answer ChangeHost(const std::string& change) const override;
+
+  // What became of the requests that changed disks, as the agent writes it: {"tasks": [..]}.
+  std::string Tasks() const;
+  // One of them, with its result.
+  std::string Task(const std::string& id) const;
 
  private:
-  Host::Answer Call(const std::string& operation, const std::string& body,
-                    const Orbis::TypeDescriptor* resultType) const;
+  Host::Answer Ask(const std::string& operation, const std::string& body,
+                   const Orbis::TypeDescriptor* resultType, std::chrono::milliseconds patience) const;
+  // The body, which must be JSON.
+  std::string Get(const std::string& target) const;
+  void DemandJson(const HttpAnswer& http) const;
 
   std::string _socketPath;
 };

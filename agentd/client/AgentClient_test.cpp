@@ -7,8 +7,12 @@
 
 #include "agentd/http/HttpClient.h"
 #include "agentd/routes/Routes.h"
+#include "agentd/tasks/TaskQueue.h"
+#include "agentd/testing/FakeApi.h"
 #include "agentd/testing/FakeService.h"
 #include "agentd/testing/RunningServer.h"
+#include "host/testing/Requests.h"
+#include "nox/Faults.h"
 #include "nox/Kova.h"
 #include "orbis/Types.h"
 
@@ -21,6 +25,12 @@ using testing::ElementsAre;
 using Testing::FakeHooks;
 using testing::HasSubstr;
 using Testing::RunningServer;
+
+HttpDeferringHandler Serving(const Host::ManagementApi& api, TaskQueue& tasks) {
+  return [router = Router(api, tasks)](const HttpRequest& request, const HttpResponder& responder) {
+    router.Serve(request, responder);
+  };
+}
 
 std::string WhyNot(const HttpAnswer& answer) {
   RunningServer server([&answer](const HttpRequest&) { return answer; });
@@ -37,7 +47,8 @@ TEST(AgentClient, AsksAnAgentAsAProgramAsksTheServiceItself) {
   const Host::KovaService service = Testing::AFakeService();
   FakeHooks::AnswerWithDisk("naa.1");
   FakeHooks::AnswerWithFault(Orbis::Fault::SystemError("half of it failed"));
-  RunningServer server([&service](const HttpRequest& request) { return Route(service, request); });
+  TaskQueue tasks;
+  RunningServer server(Serving(service, tasks));
   const Host::Answer answer =
       AgentClient("unix:" + server.Path()).QueryDisksForKova({"naa.1", "t10.\"quoted\" \\ ß"});
   EXPECT_THAT(FakeHooks::names, ElementsAre("naa.1", "t10.\"quoted\" \\ ß"));
@@ -50,7 +61,8 @@ TEST(AgentClient, AsksAnAgentAsAProgramAsksTheServiceItself) {
 TEST(AgentClient, AsksForGroupsAndConfiguration) {
   using Nox::Kova::Host::ConfigInfo;
   const Host::KovaService service = Testing::AFakeService();
-  RunningServer server([&service](const HttpRequest& request) { return Route(service, request); });
+  TaskQueue tasks;
+  RunningServer server(Serving(service, tasks));
   const AgentClient client("unix:" + server.Path());
   ConfigInfo::StorageInfo storage;
   storage.SetAutoClaim(true);
@@ -63,9 +75,94 @@ TEST(AgentClient, AsksForGroupsAndConfiguration) {
   EXPECT_TRUE(dynamic_cast<const ConfigInfo&>(*client.GetConfigInfo().result).GetEnabled());
 }
 
+TEST(AgentClient, HandsEveryOperationOnAsItWasCalled) {
+  using namespace Host::Testing;
+  const Testing::FakeApi api;
+  TaskQueue tasks;
+  RunningServer server(Serving(api, tasks));
+  const AgentClient client("unix:" + server.Path());
+  const auto mapping = MappingOf("naa.1", {"naa.2", "naa.3"});
+  const Host::RemovalArguments arguments{"p", "o \"\\", -2147483647 - 1, 2147483647};
+  client.GetDiskGroups();
+  client.AddDisks(*Disks({ADisk("naa.1"), ADisk("naa.2", true), ADisk("naa.3", false)}));
+  client.AddAllEligibleDisks();
+  client.InitializeDisks(*Mappings({mapping, MappingOf("naa.4", {})}));
+  client.UnmountDiskMapping(*Mappings({mapping}));
+  client.RemoveDisk("naa.1", arguments);
+  client.RemoveDiskMapping(*mapping, arguments);
+  client.ClaimUnmountedDiskgroup();
+  client.ChangeHost(R"({"set": {}})");
+  EXPECT_THAT(api.Asked(),
+              ElementsAre("GetDiskGroups", "AddDisks naa.1? naa.2! naa.3", "AddAllEligibleDisks",
+                          "InitializeDisks naa.1? < naa.2? naa.3? > naa.4? < >",
+                          "UnmountDiskMapping naa.1? < naa.2? naa.3? >",
+                          "RemoveDisk naa.1 p o \"\\ -2147483648 2147483647",
+                          "RemoveDiskMapping naa.1? < naa.2? naa.3? > p o \"\\ -2147483648 2147483647",
+                          "ClaimUnmountedDiskgroup", R"(ChangeHost {"set": {}})"));
+}
+
+TEST(AgentClient, GivesWhatAChangeCameTo) {
+  using Nox::Kova::Host::DiskMapResult;
+  Testing::FakeApi api;
+  const auto results = Tessa::MakeRef<Orbis::DataArray<DiskMapResult>>();
+  results->Append(Tessa::MakeRef<DiskMapResult>());
+  api.answer.result = results;
+  api.answer.fault = Tessa::MakeRef<Nox::Fault::DiskHasPartitions>("naa.1");
+  TaskQueue tasks;
+  RunningServer server(Serving(api, tasks));
+  const AgentClient client("unix:" + server.Path());
+  const Host::Testing::MappingRef mapping = Host::Testing::MappingOf("naa.1", {});
+  const auto mappings = Host::Testing::Mappings({mapping});
+  for (const Host::Answer& answer :
+       {client.AddDisks(*Host::Testing::DisksNamed({"naa.1"})), client.AddAllEligibleDisks(),
+        client.InitializeDisks(*mappings), client.UnmountDiskMapping(*mappings)}) {
+    EXPECT_EQ(dynamic_cast<const Orbis::DataArray<DiskMapResult>&>(*answer.result).Size(), 1u);
+    EXPECT_EQ(dynamic_cast<const Nox::Fault::DiskHasPartitions&>(*answer.fault).GetDevice(), "naa.1");
+  }
+}
+
+TEST(AgentClient, GivesNeitherResultNorFaultAsThat) {
+  const Testing::FakeApi api;
+  TaskQueue tasks;
+  RunningServer server(Serving(api, tasks));
+  const AgentClient client("unix:" + server.Path());
+  for (const Host::Answer& answer : {client.AddAllEligibleDisks(), client.RemoveDisk("naa.1", {}),
+                                     client.RemoveDiskMapping(*Host::Testing::MappingOf("naa.1", {}), {}),
+                                     client.ClaimUnmountedDiskgroup(), client.ChangeHost("{}")}) {
+    EXPECT_FALSE(answer.result);
+    EXPECT_FALSE(answer.fault);
+  }
+}
+
+TEST(AgentClient, GivesBusyAsAFault) {
+  const Testing::FakeApi api;
+  TaskQueue tasks;
+  tasks.Close();
+  RunningServer server(Serving(api, tasks));
+  const Host::Answer answer = AgentClient("unix:" + server.Path()).AddAllEligibleDisks();
+  EXPECT_NE(dynamic_cast<const Nox::Fault::Busy*>(answer.fault.Get()), nullptr);
+}
+
+TEST(AgentClient, FetchesTasksAndTheHostsDescriptionAsTheyAre) {
+  Testing::FakeApi api;
+  api.description = "{\"name\": \"a\"}\n";
+  TaskQueue tasks;
+  RunningServer server(Serving(api, tasks));
+  const AgentClient client("unix:" + server.Path());
+  EXPECT_EQ(client.DescribeHost(), api.description);
+  EXPECT_EQ(client.Tasks(), "{\"tasks\":[]}\n");
+  client.AddAllEligibleDisks();
+  EXPECT_THAT(client.Tasks(), HasSubstr("AddAllEligibleDisks"));
+  EXPECT_THAT(client.Task(tasks.List().at(0).id), HasSubstr("\"result\":null"));
+  EXPECT_THROW(client.Task("task-1"), ConnectionError);
+  api.description.clear();
+  EXPECT_THROW(client.DescribeHost(), ConnectionError);
+}
+
 TEST(AgentClient, GivesAFaultOfTheAgentAsAFault) {
   const Host::KovaService service = Testing::AFakeService();
-  RunningServer server([&service](const HttpRequest& request) { return Route(service, request); });
+  TaskQueue tasks;
+  RunningServer server(Serving(service, tasks));
   const Host::Answer answer = AgentClient("unix:" + server.Path()).QueryDisksForKova({""});
   EXPECT_FALSE(answer.result);
   EXPECT_EQ(dynamic_cast<const Orbis::Fault::InvalidArgument&>(*answer.fault).GetInvalidProperty(),

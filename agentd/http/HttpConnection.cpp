@@ -73,24 +73,27 @@ void HttpConnection::PassOn() {
   _version = message.version();
   _withBody = message.method() != http::verb::head;
   HttpRequest request{std::string(message.method_string()), std::string(message.target()),
-                      std::string(message[http::field::content_type]), std::move(message.body())};
+                      std::string(message[http::field::content_type]), std::move(message.body()),
+                      std::string(message["SOAPAction"])};
   asio::post(_context.workers, [self = shared_from_this(), request = std::move(request)]() mutable {
-    HttpAnswer answer = self->Handle(request);
+    Handle(std::move(self), request);
+  });
+}
+
+void HttpConnection::Handle(std::shared_ptr<HttpConnection> self, const HttpRequest& request) {
+  const HttpDeferringHandler& handler = self->_context.handler;
+  const HttpResponder responder([self = std::move(self)](HttpAnswer answer) mutable {
     asio::io_context& network = self->_context.network;
-    // Back to the network's thread, which is the only one that touches the connection.
     asio::post(network, [self = std::move(self), answer = std::move(answer)]() mutable {
       self->Write(std::move(answer));
     });
   });
-}
-
-HttpAnswer HttpConnection::Handle(const HttpRequest& request) const {
   try {
-    return _context.handler(request);
+    handler(request, responder);
   } catch (const std::exception& exception) {
-    return PlainText(500, exception.what());
+    responder.Answer(PlainText(500, exception.what()));
   } catch (...) {
-    return PlainText(500, "an error of an unknown kind");
+    responder.Answer(PlainText(500, "an error of an unknown kind"));
   }
 }
 
@@ -104,6 +107,9 @@ void HttpConnection::Write(HttpAnswer answer) {
   _keepAlive = _keepAlive && !_context.draining;
   _response.emplace(static_cast<http::status>(answer.status), _version);
   _response->set(http::field::content_type, answer.contentType);
+  if (answer.retryAfterSeconds > 0) {
+    _response->set(http::field::retry_after, std::to_string(answer.retryAfterSeconds));
+  }
   _response->content_length(answer.body.size());
   if (_withBody) {
     _response->body() = std::move(answer.body);

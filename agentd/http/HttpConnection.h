@@ -1,8 +1,8 @@
 // One client of the HTTP server. Part of the server; nobody else includes this.
 //
 // Threads: everything here runs on the thread of the network, except for Handle, which runs on a worker.
-// Ownership: a connection keeps itself alive while something of it is under way, and leaves the list of
-// connections when it goes.
+// Ownership: a connection keeps itself alive while something of it is under way, an outstanding answer
+// included, and leaves the list of connections when it goes.
 #pragma once
 
 #include <array>
@@ -26,7 +26,7 @@ class HttpConnection;
 // What the server and its connections share.
 struct HttpContext {
   HttpLimits limits;
-  HttpHandler handler;
+  HttpDeferringHandler handler;
   boost::asio::io_context& network;
   boost::asio::thread_pool& workers;
   std::function<void()> onLastGone;  // told when the last connection has gone
@@ -53,7 +53,9 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
 
   void OnRead(Error error);
   void PassOn();
-  HttpAnswer Handle(const HttpRequest& request) const;
+  // Takes the reference along to where the answer comes from: the network's thread must be the one that sees
+  // the connection go, so no worker may keep one.
+  static void Handle(std::shared_ptr<HttpConnection> self, const HttpRequest& request);
   void Write(HttpAnswer answer);
   void OnWritten(Error error);
   // Reads what the client still sends, for a moment: closed at once, it might never see the answer.

@@ -30,13 +30,14 @@ constexpr std::chrono::milliseconds acceptPause(100);
 
 class HttpServer::Impl {
  public:
-  Impl(const std::string& socketPath, const HttpLimits& limits, HttpHandler handler);
+  Impl(const std::string& socketPath, const HttpLimits& limits, HttpDeferringHandler handler);
   ~Impl();
 
   bool Run();
   void Stop() {
     asio::post(_network, [this] { BeginDrain(); });
   }
+  void OnStopping(std::function<void()> listener) { _onStopping = std::move(listener); }
 
  private:
   void Listen();
@@ -47,6 +48,7 @@ class HttpServer::Impl {
   void CloseSocket();
 
   const std::string _path;
+  std::function<void()> _onStopping;
   // In this order: whatever still holds connections goes down before what connections use.
   HttpContext _context;
   asio::io_context _network{1};
@@ -57,7 +59,7 @@ class HttpServer::Impl {
   asio::steady_timer _drainTimer;
 };
 
-HttpServer::Impl::Impl(const std::string& socketPath, const HttpLimits& limits, HttpHandler handler)
+HttpServer::Impl::Impl(const std::string& socketPath, const HttpLimits& limits, HttpDeferringHandler handler)
     : _path(socketPath),
       _context{.limits = limits,
                .handler = std::move(handler),
@@ -155,6 +157,9 @@ void HttpServer::Impl::BeginDrain() {
   _acceptTimer.cancel();
   error_code ignored;
   _signals.cancel(ignored);
+  if (_onStopping) {
+    _onStopping();
+  }
   if (_context.connections.empty()) {
     return;
   }
@@ -181,6 +186,12 @@ void HttpServer::Impl::CloseSocket() {
 }
 
 HttpServer::HttpServer(const std::string& socketPath, const HttpLimits& limits, HttpHandler handler)
+    : HttpServer(socketPath, limits,
+                 HttpDeferringHandler([handler = std::move(handler)](const HttpRequest& request,
+                                                                     const HttpResponder& responder) {
+                   responder.Answer(handler(request));
+                 })) {}
+HttpServer::HttpServer(const std::string& socketPath, const HttpLimits& limits, HttpDeferringHandler handler)
     : _impl(std::make_unique<Impl>(socketPath, limits, std::move(handler))) {}
 HttpServer::~HttpServer() = default;
 bool HttpServer::Run() {
@@ -188,6 +199,9 @@ bool HttpServer::Run() {
 }
 void HttpServer::Stop() {
   _impl->Stop();
+}
+void HttpServer::OnStopping(std::function<void()> listener) {
+  _impl->OnStopping(std::move(listener));
 }
 
 }  // namespace Agentd

@@ -3,8 +3,11 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <condition_variable>
 #include <csignal>
 #include <filesystem>
+#include <mutex>
 #include <stdexcept>
 
 #include "agentd/testing/RawClient.h"
@@ -243,6 +246,135 @@ TEST(HttpServer, GivesUpOnRequestsThatTakeLongerThanTheDrainTime) {
   gate.WaitUntilEntered();
   EXPECT_FALSE(server.Stop());
   gate.Open();
+}
+
+// Keeps the responders of the requests it is handed, for the test to answer.
+class Deferral {
+ public:
+  HttpDeferringHandler Handler() {
+    return [this](const HttpRequest& request, const HttpResponder& responder) {
+      const std::lock_guard guard(_mutex);
+      _kept.emplace_back(request.target, responder);
+      _changed.notify_all();
+    };
+  }
+  // Waits for the request.
+  HttpResponder Take(const std::string& target) {
+    std::unique_lock lock(_mutex);
+    for (;;) {
+      const auto found = std::find_if(_kept.begin(), _kept.end(),
+                                      [&target](const auto& kept) { return kept.first == target; });
+      if (found != _kept.end()) {
+        HttpResponder responder = found->second;
+        _kept.erase(found);
+        return responder;
+      }
+      _changed.wait(lock);
+    }
+  }
+
+ private:
+  std::mutex _mutex;
+  std::condition_variable _changed;
+  std::vector<std::pair<std::string, HttpResponder>> _kept;
+};
+
+TEST(HttpServerDeferred, AnAnswerMayComeLaterAndFromElsewhere) {
+  Deferral deferral;
+  RunningServer server(deferral.Handler());
+  RawClient first(server.Path());
+  RawClient second(server.Path());
+  first.Send("GET /1 HTTP/1.1\r\nHost: x\r\n\r\n");
+  second.Send("GET /2 HTTP/1.1\r\nHost: x\r\n\r\n");
+  const HttpResponder firstAnswer = deferral.Take("/1");
+  deferral.Take("/2").Answer({200, "text/plain", "second"});
+  EXPECT_EQ(second.Receive().body, "second");
+  firstAnswer.Answer({503, "text/plain", "first", 7});
+  const RawAnswer answer = first.Receive();
+  EXPECT_EQ(answer.body, "first");
+  EXPECT_THAT(answer.header, HasSubstr("retry-after: 7"));
+}
+
+TEST(HttpServerDeferred, OutstandingAnswersHoldUpNoWorker) {
+  Deferral deferral;
+  HttpLimits limits;
+  limits.workers = 1;
+  RunningServer server(deferral.Handler(), limits);
+  std::vector<std::unique_ptr<RawClient>> clients;
+  std::vector<HttpResponder> responders;
+  for (int i = 0; i < 20; ++i) {
+    const std::string target = "/" + std::to_string(i);
+    clients.push_back(std::make_unique<RawClient>(server.Path()));
+    clients.back()->Send("GET " + target + " HTTP/1.1\r\nHost: x\r\n\r\n");
+    responders.push_back(deferral.Take(target));
+  }
+  for (int i = 0; i < 20; ++i) {
+    responders[i].Answer({200, "text/plain", std::to_string(i)});
+    EXPECT_EQ(clients[i]->Receive().body, std::to_string(i));
+  }
+}
+
+TEST(HttpServerDeferred, TheFirstAnswerCounts) {
+  Deferral deferral;
+  RunningServer server(deferral.Handler());
+  RawClient client(server.Path());
+  client.Send(get);
+  const HttpResponder responder = deferral.Take("/a");
+  const HttpResponder copy = responder;
+  responder.Answer({200, "text/plain", "one"});
+  copy.Answer({200, "text/plain", "two"});
+  EXPECT_EQ(client.Receive().body, "one");
+  client.Send("GET /b HTTP/1.1\r\nHost: x\r\n\r\n");
+  deferral.Take("/b").Answer({200, "text/plain", "three"});
+  EXPECT_EQ(client.Receive().body, "three");
+}
+
+TEST(HttpServerDeferred, ARequestThatIsDroppedIsAnsweredWith500) {
+  Deferral deferral;
+  RunningServer server(deferral.Handler());
+  RawClient client(server.Path());
+  client.Send(get);
+  deferral.Take("/a");
+  EXPECT_EQ(client.Receive().status, 500u);
+}
+
+TEST(HttpServerDeferred, AnAnswerToAClientThatHasLeftHarmsNobody) {
+  Deferral deferral;
+  RunningServer server(deferral.Handler());
+  { RawClient(server.Path()).Send(get); }
+  deferral.Take("/a").Answer({200, "text/plain", std::string(1 << 20, 'x')});
+  RawClient client(server.Path());
+  client.Send("GET /b HTTP/1.1\r\nHost: x\r\n\r\n");
+  deferral.Take("/b").Answer({200, "text/plain", "well"});
+  EXPECT_EQ(client.Receive().body, "well");
+}
+
+TEST(HttpServerDeferred, AStopTellsTheListenerAndThenWaitsForOutstandingAnswers) {
+  Deferral deferral;
+  std::promise<void> stopping;
+  RunningServer server(deferral.Handler(), {}, [&stopping] { stopping.set_value(); });
+  RawClient client(server.Path());
+  client.Send(get);
+  const HttpResponder responder = deferral.Take("/a");
+  server.Server().Stop();
+  stopping.get_future().wait();
+  responder.Answer({200, "text/plain", "last"});
+  const RawAnswer answer = client.Receive();
+  EXPECT_EQ(answer.body, "last");
+  EXPECT_THAT(answer.header, HasSubstr("connection: close"));
+  EXPECT_TRUE(server.Wait());
+}
+
+TEST(HttpServerDeferred, AStopGivesUpOnAnswersThatDoNotComeInTime) {
+  Deferral deferral;
+  HttpLimits limits;
+  limits.drainTime = std::chrono::milliseconds(20);
+  RunningServer server(deferral.Handler(), limits);
+  RawClient client(server.Path());
+  client.Send(get);
+  const HttpResponder responder = deferral.Take("/a");
+  EXPECT_FALSE(server.Stop());
+  responder.Answer({200, "text/plain", "too late"});
 }
 
 }  // namespace

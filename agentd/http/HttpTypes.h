@@ -12,12 +12,14 @@ struct HttpRequest {
   std::string target;       // as sent: "/api/v1/disks?names=naa.1"
   std::string contentType;  // empty: none
   std::string body;
+  std::string soapAction = {};  // of the header of that name; empty: none
 };
 
 struct HttpAnswer {
   unsigned status = 200;
   std::string contentType = "application/json";
   std::string body;
+  int retryAfterSeconds = 0;  // 0: the header is not sent
 };
 
 // What a connection may cost before it is refused.
@@ -29,7 +31,7 @@ struct HttpLimits {
   std::chrono::milliseconds readTime = std::chrono::seconds(30);
   std::chrono::milliseconds writeTime = std::chrono::seconds(60);  // for one whole answer; beyond: closed
   std::chrono::milliseconds drainTime = std::chrono::seconds(60);  // for what is in flight when stopping
-  unsigned workers = 4;                                            // requests handled at the same time
+  unsigned workers = 4;  // requests handled at the same time; one that is answered later counts no more
 };
 
 }  // namespace Agentd

@@ -4,165 +4,212 @@
 #include <array>
 #include <optional>
 #include <string>
-#include <vector>
+#include <utility>
 
 #include "agentd/http/HttpTarget.h"
-#include "host/KovaService.h"
+#include "agentd/routes/JsonAnswers.h"
+#include "agentd/routes/Operations.h"
+#include "agentd/routes/RequestReader.h"
+#include "agentd/routes/SoapEndpoint.h"
+#include "agentd/tasks/TaskQueue.h"
+#include "host/HostError.h"
+#include "host/ManagementApi.h"
 #include "orbis/ParseException.h"
-#include "orbis/json/JsonText.h"
 
 namespace Agentd {
 namespace {
 
-using Host::Answer;
-using Host::KovaService;
+using Host::ManagementApi;
 
 constexpr std::string_view jsonType = "application/json";
+constexpr std::string_view xmlType = "text/xml";
 
-HttpAnswer PlainText(unsigned status, const std::string& text) {
-  return {status, "text/plain", text + "\n"};
-}
-
-HttpAnswer ToJson(const Answer& answer) {
-  HttpAnswer http;
-  WriteJsonAnswer(answer, http.body);
-  http.body += "\n";
-  if (!answer.result && answer.fault) {
-    http.status = dynamic_cast<Orbis::Fault::InvalidArgument*>(answer.fault.Get()) != nullptr ? 400 : 500;
-  }
-  return http;
-}
-
-[[noreturn]] void Refuse(const Orbis::Json::Value& value, const std::string& path,
-                         const std::string& wanted) {
-  throw Orbis::ParseException(path, value.line,
-                              "wanted " + wanted + ", found " + Orbis::Json::Describe(value));
-}
-
-// The body {"names": [..]}, or {}.
-std::vector<std::string> ReadNames(const std::string& body) {
-  using Orbis::Json::Kind;
-  const Orbis::Json::Value root = Orbis::Json::Parse(body, Orbis::Limits::Untrusted());
-  if (root.kind != Kind::Object) {
-    Refuse(root, "(root)", "an object");
-  }
-  std::vector<std::string> names;
-  for (const auto& [key, value] : root.members) {
-    if (key != "names") {
-      throw Orbis::ParseException(key, value.line, "unknown parameter; QueryDisksForKova takes 'names'");
-    }
-    if (value.kind != Kind::Array) {
-      Refuse(value, key, "an array of names");
-    }
-    for (const Orbis::Json::Value& item : value.items) {
-      if (item.kind != Kind::String) {
-        Refuse(item, "names[" + std::to_string(names.size()) + "]", "a name");
-      }
-      names.push_back(item.text);
-    }
-  }
-  return names;
-}
-
-HttpAnswer Health(const KovaService&, const HttpTarget&, const HttpRequest&) {
-  return PlainText(200, "ok");
-}
-
-std::optional<HttpAnswer> RefuseParameters(const HttpTarget& target, std::string_view known) {
-  for (const auto& [name, value] : target.parameters) {
-    if (name != known) {
-      return PlainText(
-          400, "unknown parameter '" + name + "'" +
-                   (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'"));
-    }
-  }
-  return std::nullopt;
-}
-
-// The body of an operation without parameters: {}.
-void DemandNoParameters(const std::string& body) {
-  const Orbis::Json::Value root = Orbis::Json::Parse(body, Orbis::Limits::Untrusted());
-  if (root.kind != Orbis::Json::Kind::Object) {
-    Refuse(root, "(root)", "an object");
-  }
-  for (const auto& [key, value] : root.members) {
-    throw Orbis::ParseException(key, value.line, "unknown parameter; the operation takes none");
-  }
-}
-
-HttpAnswer GetDisks(const KovaService& service, const HttpTarget& target, const HttpRequest&) {
-  const auto refused = RefuseParameters(target, "names");
-  return refused ? *refused : ToJson(service.QueryDisksForKova(target.ValuesOf("names")));
-}
-
-HttpAnswer PostQueryDisks(const KovaService& service, const HttpTarget&, const HttpRequest& request) {
-  return ToJson(service.QueryDisksForKova(ReadNames(request.body)));
-}
-
-using Operation = Answer (KovaService::*)() const;
-
-template <Operation operation>
-HttpAnswer GetPlain(const KovaService& service, const HttpTarget& target, const HttpRequest&) {
-  const auto refused = RefuseParameters(target, "");
-  return refused ? *refused : ToJson((service.*operation)());
-}
-
-template <Operation operation>
-HttpAnswer PostPlain(const KovaService& service, const HttpTarget&, const HttpRequest& request) {
-  DemandNoParameters(request.body);
-  return ToJson((service.*operation)());
-}
-
-struct Entry {
-  std::string_view method;
-  std::string_view path;
-  HttpAnswer (*serve)(const KovaService&, const HttpTarget&, const HttpRequest&);
+// A request on its way: who serves it, what was asked, and the way back.
+struct Call {
+  const ManagementApi& api;
+  TaskQueue& tasks;
+  const HttpTarget& target;
+  const HttpRequest& request;
+  const HttpResponder& responder;
+  std::string_view rest;  // of the path, behind the route's
 };
 
-constexpr std::array<Entry, 7> entries = {{
-    {"GET", "/healthz", &Health},
-    {"GET", "/api/v1/disks", &GetDisks},
-    {"POST", "/api/v1/QueryDisksForKova", &PostQueryDisks},
-    {"GET", "/api/v1/groups", &GetPlain<&KovaService::GetStorageInfo>},
-    {"POST", "/api/v1/GetStorageInfo", &PostPlain<&KovaService::GetStorageInfo>},
-    {"GET", "/api/v1/config", &GetPlain<&KovaService::GetConfigInfo>},
-    {"POST", "/api/v1/GetConfigInfo", &PostPlain<&KovaService::GetConfigInfo>},
+// Refuses every parameter of the target but `known`. Whether the request may go on.
+bool HasOnly(std::string_view known, const Call& call) {
+  for (const auto& [name, value] : call.target.parameters) {
+    if (name != known) {
+      call.responder.Answer(PlainText(
+          400, "unknown parameter '" + name + "'" +
+                   (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'")));
+      return false;
+    }
+  }
+  return true;
+}
+
+void Health(const Call& call) {
+  call.responder.Answer(PlainText(200, "ok"));
+}
+
+void GetDisks(const Call& call) {
+  if (HasOnly("names", call)) {
+    call.responder.Answer(ToHttp(call.api.QueryDisksForKova(call.target.ValuesOf("names"))));
+  }
+}
+
+template <Host::Answer (ManagementApi::*operation)() const>
+void GetPlain(const Call& call) {
+  if (HasOnly("", call)) {
+    call.responder.Answer(ToHttp((call.api.*operation)()));
+  }
+}
+
+// Hands the work to the queue. The client gets the answer when it is done or, without waiting, the task.
+void Submit(const Call& call, const std::string& operation, const ReadRequest& request,
+            TaskQueue::Work work) {
+  try {
+    if (!request.wait) {
+      call.responder.Answer(DescribeTask(202, call.tasks.Submit(operation, request.label, std::move(work))));
+      return;
+    }
+    call.tasks.Submit(operation, request.label, std::move(work),
+                      [responder = call.responder](const Task& ended) { responder.Answer(ToHttp(ended)); });
+  } catch (const Orbis::MethodFault::Exception& busy) {
+    call.responder.Answer(ToHttp(Host::Answer{.result = nullptr, .fault = busy.GetFault()}));
+  }
+}
+
+void PostOperation(const Call& call) {
+  const Operation& operation = *FindOperation(call.rest);
+  ReadRequest request = ReadJsonRequest(operation, call.request.body);
+  if (!operation.changes) {
+    call.responder.Answer(ToHttp(operation.call(call.api, request.arguments)));
+    return;
+  }
+  Submit(call, std::string(operation.name), request,
+         [&api = call.api, &operation, arguments = std::move(request.arguments)] {
+           return operation.call(api, arguments);
+         });
+}
+
+void GetTasks(const Call& call) {
+  if (HasOnly("", call)) {
+    call.responder.Answer(DescribeTasks(call.tasks.List()));
+  }
+}
+
+void GetTask(const Call& call) {
+  const std::optional<Task> task = call.tasks.Find(std::string(call.rest));
+  call.responder.Answer(task ? DescribeTask(200, *task)
+                             : PlainText(404, "no task of that id; those that ended long ago are forgotten"));
+}
+
+void GetHost(const Call& call) {
+  if (!HasOnly("", call)) {
+    return;
+  }
+  try {
+    call.responder.Answer({200, std::string(jsonType), call.api.DescribeHost()});
+  } catch (const Host::HostError& unknown) {
+    call.responder.Answer(PlainText(404, unknown.what()));
+  }
+}
+
+// A task like any other: nothing changes the host while a request is at work on it.
+void PostHost(const Call& call) {
+  Submit(call, "ChangeHost", ReadRequest(),
+         [&api = call.api, change = call.request.body] { return api.ChangeHost(change); });
+}
+
+void PostSoap(const Call& call) {
+  ServeSoap(call.api, call.tasks, call.request, call.responder);
+}
+
+void GetSoap(const Call& call) {
+  call.responder.Answer(DescribeService(call.target));
+}
+
+bool IsNothing(std::string_view rest) {
+  return rest.empty();
+}
+
+bool IsId(std::string_view rest) {
+  return !rest.empty();
+}
+
+bool IsOperation(std::string_view rest) {
+  return FindOperation(rest) != nullptr;
+}
+
+struct Route {
+  std::string_view bodyType;  // what a POST must be; empty for a GET
+  std::string_view path;
+  bool (*takes)(std::string_view rest);  // what stands behind the path
+  void (*serve)(const Call& call);
+};
+
+constexpr std::array<Route, 11> routes = {{
+    {"", "/healthz", &IsNothing, &Health},
+    {"", "/api/v1/disks", &IsNothing, &GetDisks},
+    {"", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
+    {"", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
+    {"", "/api/v1/tasks", &IsNothing, &GetTasks},
+    {"", "/api/v1/tasks/", &IsId, &GetTask},
+    {"", "/api/v1/host", &IsNothing, &GetHost},
+    {jsonType, "/api/v1/host", &IsNothing, &PostHost},
+    {jsonType, "/api/v1/", &IsOperation, &PostOperation},
+    {"", "/soap", &IsNothing, &GetSoap},
+    {xmlType, "/soap", &IsNothing, &PostSoap},
 }};
 
+bool Leads(const Route& route, std::string_view path) {
+  return path.substr(0, route.path.size()) == route.path && route.takes(path.substr(route.path.size()));
+}
+
 // A content type is demanded of every body: a form of a stranger's page cannot send this one.
-bool IsJson(std::string_view contentType) {
+bool IsOfType(std::string_view wanted, std::string_view contentType) {
   std::string type(contentType.substr(0, contentType.find(';')));
   type.erase(type.find_last_not_of(" \t") + 1);
   std::transform(type.begin(), type.end(), type.begin(), [](char byte) {
     return byte >= 'A' && byte <= 'Z' ? static_cast<char>(byte - 'A' + 'a') : byte;
   });
-  return type == jsonType;
+  return type == wanted;
+}
+
+void Follow(const Route& route, const Call& call) {
+  if (!route.bodyType.empty() && !IsOfType(route.bodyType, call.request.contentType)) {
+    call.responder.Answer(PlainText(415, "the body must be " + std::string(route.bodyType)));
+    return;
+  }
+  try {
+    route.serve(call);
+  } catch (const Orbis::ParseException& refused) {
+    call.responder.Answer(PlainText(400, refused.what()));
+  }
 }
 
 }  // namespace
 
-HttpAnswer Route(const KovaService& service, const HttpRequest& request) {
+void Router::Serve(const HttpRequest& request, const HttpResponder& responder) const {
   const std::optional<HttpTarget> target = ParseTarget(request.target);
   if (!target) {
-    return PlainText(400, "the target holds a broken escape");
+    responder.Answer(PlainText(400, "the target holds a broken escape"));
+    return;
   }
+  const std::string_view path = target->path;
   bool pathKnown = false;
-  for (const Entry& entry : entries) {
-    pathKnown = pathKnown || entry.path == target->path;
-    if (entry.path != target->path || entry.method != request.method) {
+  for (const Route& route : routes) {
+    if (!Leads(route, path)) {
       continue;
     }
-    if (entry.method == "POST" && !IsJson(request.contentType)) {
-      return PlainText(415, "the body must be application/json");
+    if (request.method == (route.bodyType.empty() ? "GET" : "POST")) {
+      Follow(route, {_api, _tasks, *target, request, responder, path.substr(route.path.size())});
+      return;
     }
-    try {
-      return entry.serve(service, *target, request);
-    } catch (const Orbis::ParseException& refused) {
-      return PlainText(400, refused.what());
-    }
+    pathKnown = true;
   }
-  return pathKnown ? PlainText(405, "that method is not served here")
-                   : PlainText(404, "nothing is served here");
+  responder.Answer(pathKnown ? PlainText(405, "that method is not served here")
+                             : PlainText(404, "nothing is served here"));
 }
 
 }  // namespace Agentd

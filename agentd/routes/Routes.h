@@ -1,24 +1,51 @@
 // Which request calls which operation.
 //
-//   GET  /healthz                     "ok" while the agent serves
-//   GET  /api/v1/disks?names=N&..     QueryDisksForKova
-//   POST /api/v1/QueryDisksForKova    the same, {"names": [..]}
-//   GET  /api/v1/groups               GetStorageInfo; POST /api/v1/GetStorageInfo, {}
-//   GET  /api/v1/config               GetConfigInfo; POST /api/v1/GetConfigInfo, {}
+//   GET  /healthz                    "ok" while the agent serves
+//   GET  /api/v1/disks?names=N&..    QueryDisksForKova
+//   GET  /api/v1/groups              GetDiskGroups
+//   GET  /api/v1/config              GetConfigInfo
+//   POST /api/v1/OPERATION           any operation, its parameters in the body (see RequestReader.h)
+//   GET  /api/v1/tasks               what became of the requests that change disks
+//   GET  /api/v1/tasks/ID            one of them, with its result
+//   GET  /api/v1/host                the description of a simulated host
+//   POST /api/v1/host                changes it: {"set": {..}, "disk": {"name": .., ..}}
+//   POST /soap                       the operations of the management API as SOAP 1.1 messages
+//   GET  /soap?wsdl, ?xsd=nox.xsd    how they are described
 //
-// An answer is {"result": .., "fault": ..}, either null. The status is 200 with a result, 400 for an
-// InvalidArgument or a request that cannot be read, 500 for other faults.
+// An answer in JSON is {"result": .., "fault": ..}, either null or both; that of a changing operation also
+// has "task", its id. With "wait": false the answer is the task as it was taken on, with 202.
+//
+//   200  there is a result, perhaps beside a fault; or neither: done, nothing to say
+//   400  a request that cannot be read (text), or an InvalidArgument
+//   403  NotPermitted        404, 405, 415  the path, the method or the type of the body (text)
+//   500  any other fault, and every SOAP fault     503            Busy, with Retry-After
+//
+// Queries are answered on the calling thread. Changes are handed to the task queue, and answered by it when
+// their turn has come: however many wait, and however long one takes, no thread waits for them here.
 #pragma once
 
+#include "agentd/http/HttpResponder.h"
 #include "agentd/http/HttpTypes.h"
 
 namespace Host {
-class KovaService;
+class ManagementApi;
 }
 
 namespace Agentd {
 
-// Threads: any.
-HttpAnswer Route(const Host::KovaService& service, const HttpRequest& request);
+class TaskQueue;
+
+class Router {
+ public:
+  // Both outlive the router and whatever it handed to the queue.
+  Router(const Host::ManagementApi& api, TaskQueue& tasks) : _api(api), _tasks(tasks) {}
+
+  // Threads: any. Throws nothing that a client could bring about.
+  void Serve(const HttpRequest& request, const HttpResponder& responder) const;
+
+ private:
+  const Host::ManagementApi& _api;
+  TaskQueue& _tasks;
+};
 
 }  // namespace Agentd

@@ -3,7 +3,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "agentd/tasks/TaskQueue.h"
 #include "agentd/testing/FakeService.h"
+#include "agentd/testing/RunningServer.h"
 #include "orbis/Types.h"
 
 namespace Agentd {
@@ -17,14 +19,21 @@ using testing::IsEmpty;
 
 class Routes : public testing::Test {
  protected:
-  HttpAnswer Get(const std::string& target) const { return Route(_service, {"GET", target, "", ""}); }
+  HttpAnswer Send(const HttpRequest& request) const {
+    return Testing::AnswerOf(
+        [this](const HttpRequest& asked, const HttpResponder& responder) { _router.Serve(asked, responder); },
+        request);
+  }
+  HttpAnswer Get(const std::string& target) const { return Send({"GET", target, "", ""}); }
   HttpAnswer Post(const std::string& target, const std::string& body,
                   const std::string& type = "application/json") const {
-    return Route(_service, {"POST", target, type, body});
+    return Send({"POST", target, type, body});
   }
   HttpAnswer Query(const std::string& body) const { return Post("/api/v1/QueryDisksForKova", body); }
 
   const Host::KovaService _service = Testing::AFakeService();
+  TaskQueue _tasks;
+  const Router _router{_service, _tasks};
 };
 
 TEST_F(Routes, HealthIsOk) {
@@ -63,13 +72,14 @@ TEST_F(Routes, DisksAreChosenByNamesInTheBody) {
 TEST_F(Routes, GroupsAndConfigurationAreAnsweredByBothTheirRoutes) {
   Orbis::SerializeObjectToSoap(*Tessa::MakeRef<Nox::Kova::Host::ConfigInfo>(), nullptr,
                                FakeHooks::resultText);
-  const HttpAnswer answers[] = {Get("/api/v1/groups"), Post("/api/v1/GetStorageInfo", "{}"),
-                                Get("/api/v1/config"), Post("/api/v1/GetConfigInfo", "{}")};
+  const HttpAnswer answers[] = {Get("/api/v1/groups"), Post("/api/v1/GetDiskGroups", "{}"),
+                                Post("/api/v1/GetStorageInfo", "{}"), Get("/api/v1/config"),
+                                Post("/api/v1/GetConfigInfo", "{}")};
   for (const HttpAnswer& answer : answers) {
     EXPECT_EQ(answer.status, 200u);
     EXPECT_EQ(answer.body, "{\"result\":{\"@type\":\"KovaHostConfigInfo\"},\"fault\":null}\n");
   }
-  EXPECT_EQ(FakeHooks::calls, 4);
+  EXPECT_EQ(FakeHooks::calls, 5);
 }
 
 TEST_F(Routes, AReportThatHoldsNothingIsAFault) {
@@ -130,7 +140,12 @@ TEST_F(Routes, AnUnknownPathIs404AndAnotherMethod405) {
   EXPECT_EQ(Get("/api/v1/querydisksforkova").status, 404u);
   EXPECT_EQ(Get("/api/v1/QueryDisksForKova").status, 405u);
   EXPECT_EQ(Post("/healthz", "{}").status, 405u);
-  EXPECT_EQ(Route(_service, {"DELETE", "/api/v1/disks", "", ""}).status, 405u);
+  EXPECT_EQ(Send({"DELETE", "/api/v1/disks", "", ""}).status, 405u);
+  EXPECT_EQ(Get("/api/v1/AddDisks").status, 405u);
+  EXPECT_EQ(Post("/api/v1/tasks", "{}").status, 405u);
+  EXPECT_EQ(Post("/api/v1/", "{}").status, 404u);
+  EXPECT_EQ(Post("/api/v1/NoSuchOperation", "{}").status, 404u);
+  EXPECT_EQ(Get("/api/v1/tasks/").status, 404u);
   EXPECT_EQ(FakeHooks::calls, 0);
 }
 

@@ -24,11 +24,25 @@ inline HttpAnswer Echo(const HttpRequest& request) {
   return {200, "text/plain", request.method + " " + request.target + " " + request.body};
 }
 
+// What a handler answers, however late.
+inline HttpAnswer AnswerOf(const HttpDeferringHandler& handler, const HttpRequest& request) {
+  const auto answered = std::make_shared<std::promise<HttpAnswer>>();
+  handler(request, HttpResponder([answered](HttpAnswer answer) { answered->set_value(std::move(answer)); }));
+  return answered->get_future().get();
+}
+
 class RunningServer {
  public:
   explicit RunningServer(HttpHandler handler = &Echo, const HttpLimits& limits = {})
       : _server(_path, limits, std::move(handler)),
         _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
+  explicit RunningServer(HttpDeferringHandler handler, const HttpLimits& limits = {},
+                         std::function<void()> onStopping = {})
+      : _server(_path, limits, std::move(handler)),
+        _run(std::async(std::launch::async, [this, onStopping = std::move(onStopping)] {
+          _server.OnStopping(onStopping);
+          return _server.Run();
+        })) {}
   ~RunningServer() { Stop(); }
   RunningServer(const RunningServer&) = delete;
   RunningServer& operator=(const RunningServer&) = delete;

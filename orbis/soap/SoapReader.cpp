@@ -5,6 +5,7 @@
 #include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/Version.h"
+#include "orbis/soap/ElementCodec.h"
 #include "orbis/xml/XmlReader.h"
 
 namespace Orbis {
@@ -244,6 +245,10 @@ Ref<Any> ReadDocument(std::string_view text, const Limits& limits, const Version
 }
 
 }  // namespace
+
+Ref<Any> Soap::ReadElement(const Element& element, const TypeDescriptor* declared) {
+  return SoapReader(nullptr, nullptr).ReadValue(element, declared);
+}
 
 void DeserializeSoapToObject(std::string_view text, Ref<Any>& value, const Version* version,
                              const TypeDescriptor* type, const TypeFilter* filter) {

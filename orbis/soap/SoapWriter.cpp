@@ -4,6 +4,7 @@
 #include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/Version.h"
+#include "orbis/soap/ElementCodec.h"
 #include "orbis/xml/XmlWriter.h"
 #include "tessa/Throwable.h"
 
@@ -21,6 +22,11 @@ class SoapWriter {
     _out.append("\" xmlns:xsd=\"").append(schemaNamespace);
     _out.append("\" xmlns:xsi=\"").append(instanceNamespace).append("\"");
     WriteTypedBody("object", value, nullptr);
+  }
+
+  void WriteInNamespace(std::string_view name, const Any& value, const TypeDescriptor* declared) {
+    _out.append("<").append(name).append(" xmlns=\"").append(apiNamespace).append("\"");
+    WriteTypedBody(name, value, declared);
   }
 
  private:
@@ -142,6 +148,11 @@ class SoapWriter {
 };
 
 }  // namespace
+
+void Soap::AppendElement(std::string_view name, const Any& value, const TypeDescriptor* declared,
+                         std::string& out) {
+  SoapWriter(nullptr, out).WriteInNamespace(name, value, declared);
+}
 
 void SerializeObjectToSoap(const Any& value, const Version* version, std::string& out) {
   const std::size_t before = out.size();

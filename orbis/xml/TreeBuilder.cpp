@@ -5,6 +5,8 @@
 #include <new>
 #include <type_traits>
 
+#include "orbis/Soap.h"
+
 namespace Orbis::Xml {
 
 namespace {
@@ -188,8 +190,10 @@ void TreeBuilder::AddAttribute(const Name& name, std::string_view value) {
     element.type = ResolveType(value);
   } else if (xsi && name.local == "nil") {
     element.nil = ReadNil(value);
-  } else if (_attributes == Attributes::Refuse) {
+  } else if (_attributes == Attributes::Refuse || element.nameSpace == apiNamespace) {
     Refuse("attribute " + Quoted(name.local) + " is not known here");
+  } else if (name.nameSpace == envelopeNamespace && name.local == "mustUnderstand") {
+    element.mustUnderstand = value == "1" || value == "true";
   }
 }
 

@@ -32,6 +32,7 @@ struct Element {
   std::string_view text;
   TypeName type;  // xsi:type is the only attribute besides xsi:nil that an element may carry, see below
   bool nil = false;
+  bool mustUnderstand = false;  // an envelope's attribute of that name says so
   int line = 0;
   const Element* firstChild = nullptr;
   const Element* nextSibling = nullptr;
@@ -40,8 +41,9 @@ struct Element {
 
 // What to make of attributes in no namespace or another than xsi. Data objects have none.
 enum class Attributes {
-  Refuse,  // data objects: an error that names the attribute
-  Ignore,  // envelopes, whose attributes other software chooses
+  Refuse,        // an error that names the attribute
+  RefuseOnData,  // the same on elements of the API's namespace, which are data; others are an envelope's,
+                 // whose attributes other software chooses
 };
 
 class Document {

@@ -290,7 +290,7 @@ TEST(XmlReader, RefusesWhatIsNotWellFormed) {
       "<a><?xml version='1.0'?></a>",
   };
   for (const std::string& text : texts) {
-    EXPECT_THROW(Read(text, kUntrusted, Attributes::Ignore), ParseException) << text;
+    EXPECT_THROW(Read(text, kUntrusted, Attributes::RefuseOnData), ParseException) << text;
   }
 }
 
@@ -346,7 +346,7 @@ TEST(XmlReader, RefusesReferencesToWhatIsNoCharacter) {
   for (const char* reference : {"&#0;", "&#x0;", "&#x1;", "&#xD800;", "&#xDFFF;", "&#xFFFE;", "&#xFFFF;",
                                 "&#x110000;", "&#99999999999;", "&#;", "&#x;", "&#-1;"}) {
     EXPECT_THROW(Read("<a>" + std::string(reference) + "</a>"), ParseException) << reference;
-    EXPECT_THROW(Read("<a b='" + std::string(reference) + "'/>", kUntrusted, Attributes::Ignore),
+    EXPECT_THROW(Read("<a b='" + std::string(reference) + "'/>", kUntrusted, Attributes::RefuseOnData),
                  ParseException)
         << reference;
   }
@@ -380,7 +380,7 @@ TEST(XmlReader, RefusesBrokenUtf8WhereverItStands) {
          {"<a>" + bytes + "</a>", "<a>" + bytes + " x</a>", "<a><![CDATA[" + bytes + "]]></a>",
           "<a><!--" + bytes + "--></a>", "<a b='" + bytes + "'/>", "<a xmlns='" + bytes + "'/>",
           "<a" + bytes + "/>", "<a/><!--" + bytes + "-->", "<a/>" + bytes, bytes + "<a/>"}) {
-      EXPECT_THROW(Read(text, kUntrusted, Attributes::Ignore), ParseException)
+      EXPECT_THROW(Read(text, kUntrusted, Attributes::RefuseOnData), ParseException)
           << testing::PrintToString(text);
     }
   }
@@ -422,9 +422,9 @@ TEST(XmlReader, BoundsTheNumberOfElements) {
 TEST(XmlReader, BoundsTheAttributesOfAnElementDeclarationsIncluded) {
   Limits limits = Roomy();
   limits.attributes = 3;
-  const auto accepted = [&](const char* text) { ExpectAccepted(text, limits, Attributes::Ignore); };
+  const auto accepted = [&](const char* text) { ExpectAccepted(text, limits, Attributes::RefuseOnData); };
   const auto refused = [&](const char* text) {
-    ExpectRefused(text, "more than 3 attributes", limits, Attributes::Ignore);
+    ExpectRefused(text, "more than 3 attributes", limits, Attributes::RefuseOnData);
   };
   accepted("<a b='' c='' d=''><a b='' c='' d=''/></a>");
   accepted("<a xmlns='u' xmlns:p='u' c=''><a xmlns='v' c='' d=''/><a xmlns='v' c='' d=''/></a>");
@@ -438,9 +438,9 @@ TEST(XmlReader, BoundsTheAttributesOfAnElementDeclarationsIncluded) {
 TEST(XmlReader, BoundsNamesWithTheirNamespace) {
   Limits limits = Roomy();
   limits.nameBytes = 10;
-  const auto accepted = [&](const char* text) { ExpectAccepted(text, limits, Attributes::Ignore); };
+  const auto accepted = [&](const char* text) { ExpectAccepted(text, limits, Attributes::RefuseOnData); };
   const auto refused = [&](const char* text) {
-    ExpectRefused(text, "is longer than 10 bytes", limits, Attributes::Ignore);
+    ExpectRefused(text, "is longer than 10 bytes", limits, Attributes::RefuseOnData);
   };
   accepted("<a123456789/>");
   refused("<a1234567890/>");
@@ -472,9 +472,9 @@ TEST(XmlReader, BoundsTextsAsTheyAddUp) {
   ExpectAccepted("<a><![CDATA[12345678]]></a>", limits);
   ExpectRefused("<a><![CDATA[123456789]]></a>", "the text is longer than 8 bytes", limits);
   ExpectAccepted("<r><a>12345678</a><a>12345678</a></r>", limits);
-  ExpectAccepted("<a b='12345678' c='&#x10FFFF;5678'/>", limits, Attributes::Ignore);
-  ExpectRefused("<a b='123456789'/>", "longer than 8 bytes", limits, Attributes::Ignore);
-  ExpectRefused("<a c='&#x10FFFF;56789'/>", "longer than 8 bytes", limits, Attributes::Ignore);
+  ExpectAccepted("<a b='12345678' c='&#x10FFFF;5678'/>", limits, Attributes::RefuseOnData);
+  ExpectRefused("<a b='123456789'/>", "longer than 8 bytes", limits, Attributes::RefuseOnData);
+  ExpectRefused("<a c='&#x10FFFF;56789'/>", "longer than 8 bytes", limits, Attributes::RefuseOnData);
   ExpectAccepted("<a><!--12345678--><b/></a>", limits);
   ExpectRefused("<a><!--123456789--><b/></a>", "a comment is longer than 8 bytes", limits);
 }
@@ -483,8 +483,9 @@ TEST(XmlReader, MeetsTheExactBoundsOfUntrustedTexts) {
   const std::size_t text = kUntrusted.textBytes;
   ExpectAccepted("<a>" + std::string(text, 'x') + "</a>");
   ExpectRefused("<a>" + std::string(text + 1, 'x') + "</a>", "the text is longer");
-  ExpectAccepted("<a b='" + std::string(text, 'x') + "'/>", kUntrusted, Attributes::Ignore);
-  ExpectRefused("<a b='" + std::string(text + 1, 'x') + "'/>", "is longer", kUntrusted, Attributes::Ignore);
+  ExpectAccepted("<a b='" + std::string(text, 'x') + "'/>", kUntrusted, Attributes::RefuseOnData);
+  ExpectRefused("<a b='" + std::string(text + 1, 'x') + "'/>", "is longer", kUntrusted,
+                Attributes::RefuseOnData);
   ExpectAccepted("<a>" + Repeat("<i/>", kUntrusted.elements - 1) + "</a>");
   ExpectRefused("<a>" + Repeat("<i/>", kUntrusted.elements) + "</a>", "elements");
   const std::string unclosed = "<a>" + Repeat("<i></i>", 10);
@@ -505,7 +506,7 @@ TEST(XmlReader, AcceptsTokensOfManyChunksWithinTheBounds) {
     tag += "d" + std::to_string(i) + "='" + std::to_string(i) + "' \n";
   }
   ExpectAccepted(tag + "><!--" + std::string(limits.textBytes, 'x') + "--><b/></a>", limits,
-                 Attributes::Ignore);
+                 Attributes::RefuseOnData);
   EXPECT_EQ(Read("<a>&#" + std::string(300'000, '0') + "65;</a>", limits).Root().text, "A");
 }
 
@@ -517,7 +518,7 @@ TEST(XmlReader, RefusesGiantsWithoutReadingThemToTheEnd) {
   limits.attributes = 32;
   limits.depth = 64;
   const auto refused = [&](const std::string& text, std::string_view reason) {
-    ExpectRefused(text, reason, limits, Attributes::Ignore);
+    ExpectRefused(text, reason, limits, Attributes::RefuseOnData);
   };
   constexpr std::size_t kFifty = 50u << 20;
   refused("<a b='" + std::string(kFifty, 'x'), "the value of an attribute is too long");
@@ -554,8 +555,8 @@ TEST(XmlReader, ReadsDeepDocumentsWithoutRecursion) {
 
 TEST(XmlReader, GiantTokensWithinTheBoundsCostNoMoreThanTheirSize) {
   const std::string giant(50u << 20, 'x');
-  ExpectAccepted("<a b='" + giant + "'/>", Roomy(), Attributes::Ignore);
-  ExpectRefused("<a b='" + giant, "unclosed token", Roomy(), Attributes::Ignore);
+  ExpectAccepted("<a b='" + giant + "'/>", Roomy(), Attributes::RefuseOnData);
+  ExpectRefused("<a b='" + giant, "unclosed token", Roomy(), Attributes::RefuseOnData);
   ExpectRefused("<!DOCTYPE " + giant, "no element found", Roomy());
   ExpectAccepted(std::string(giant.size(), ' ') + "<a/>", Roomy());
 }
@@ -600,8 +601,9 @@ TEST(XmlReader, RefusesTypesThatAreNoQualifiedName) {
 
 TEST(XmlReader, AReboundXsiPrefixIsNoXsi) {
   ExpectRefused("<a xmlns:xsi='urn:other' xsi:type='T'/>", "attribute \"type\" is not known here");
-  EXPECT_EQ(Read("<a xmlns:xsi='urn:other' xsi:type='T'/>", kUntrusted, Attributes::Ignore).Root().type.name,
-            "");
+  EXPECT_EQ(
+      Read("<a xmlns:xsi='urn:other' xsi:type='T'/>", kUntrusted, Attributes::RefuseOnData).Root().type.name,
+      "");
 }
 
 TEST(XmlReader, ReadsNil) {
@@ -628,7 +630,7 @@ TEST(XmlReader, RefusesOrIgnoresEveryOtherAttributeAsTold) {
                                 "xsi:noNamespaceSchemaLocation='x.xsd'", "xsi:other='1'"}) {
     const std::string text = WithXsi(attribute);
     ExpectRefused(text, "is not known here");
-    EXPECT_EQ(Read(text, kUntrusted, Attributes::Ignore).Root().type.name, "");
+    EXPECT_EQ(Read(text, kUntrusted, Attributes::RefuseOnData).Root().type.name, "");
   }
 }
 

@@ -92,6 +92,36 @@ TEST(HostChange, AWrongChangeIsRefusedLikeAFileAndChangesNothing) {
   EXPECT_THAT(ErrorOf(R"({"disks": 1})", R"({"name": "naa.1"})"), StartsWith("disk.name: "));
 }
 
+TEST(HostChange, AWholeChangeIsOneText) {
+  HostDescription host = ThreeDisks();
+  ApplyChange(host, R"({"disk": {"name": "naa.2", "absent": true}, "set": {"autoMode": true}})");
+  EXPECT_TRUE(host.autoMode);
+  EXPECT_TRUE(host.disks[1].absent);
+  const HostDescription changed = host;
+  ApplyChange(host, "{}");
+  ApplyChange(host, R"({"set": null, "disk": null})");
+  EXPECT_EQ(host, changed);
+}
+
+TEST(HostChange, ATextThatIsNoChangeIsRefusedAndChangesNothing) {
+  const auto errorOf = [](std::string_view change) -> std::string {
+    HostDescription host = ThreeDisks();
+    try {
+      ApplyChange(host, change);
+    } catch (const HostDescriptionError& error) {
+      EXPECT_EQ(host, ThreeDisks());
+      return error.what();
+    }
+    return "accepted";
+  };
+  EXPECT_THAT(errorOf("{"), StartsWith("line 1"));
+  EXPECT_THAT(errorOf("[]"), StartsWith("document: "));
+  EXPECT_THAT(errorOf(R"({"autoMode": true})"), StartsWith("autoMode: is no known key"));
+  EXPECT_THAT(errorOf(R"({"set": {"autoMode": true}, "disk": {"name": "naa.9"}})"),
+              StartsWith("disk.name: "));
+  EXPECT_THAT(errorOf(R"({"set": {}, "set": {}})"), testing::HasSubstr("set"));
+}
+
 TEST(HostChange, TextsThatDidNotComeFromAFileAreCheckedToo) {
   HostDescription host = ThreeDisks();
   EXPECT_THROW(ApplyChange(host, json{{"faultDomain", "\xFF"}}, nullptr), HostDescriptionError);

@@ -121,6 +121,9 @@ std::string WriteHostDescription(const HostDescription& host);
 // with "name") replace those of that disk. Null stands for a missing object; `"verdict": null` takes a disk's
 // verdict away. The changed host is checked like a file; on HostDescriptionError `host` is as it was.
 void ApplyChange(HostDescription& host, const nlohmann::json& set, const nlohmann::json& disk);
+// The same for a text {"set": {..}, "disk": {..}} that nobody vouches for; either may be missing, other keys
+// are an error.
+void ApplyChange(HostDescription& host, std::string_view change);
 
 // Throws HostDescriptionError unless the description, written and read again, is accepted.
 void CheckHostDescription(const HostDescription& host);

@@ -1,3 +1,5 @@
+#include <algorithm>
+#include <array>
 #include <nlohmann/json.hpp>
 #include <type_traits>
 
@@ -5,6 +7,7 @@
 #include "otxctl/sim/CleanText.h"
 #include "otxctl/sim/HostDescription.h"
 #include "otxctl/sim/HostDescriptionFields.h"
+#include "otxctl/sim/JsonText.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -124,6 +127,20 @@ void ApplyChange(HostDescription& host, const json& set, const json& disk) {
     FindDisk(document, disk).update(disk);
   }
   host = ReadHostDescription(document);
+}
+
+void ApplyChange(HostDescription& host, std::string_view change) {
+  const json document = ParseJsonText(change, JsonLimits{});
+  if (!document.is_object()) {
+    throw HostDescriptionError("document: must be an object");
+  }
+  const std::array<const char*, 2> keys = {"set", "disk"};
+  for (const auto& [key, value] : document.items()) {
+    if (std::find(keys.begin(), keys.end(), key) == keys.end()) {
+      throw HostDescriptionError(Shortened(CleanText(key)) + ": is no known key; a change has set and disk");
+    }
+  }
+  ApplyChange(host, document.value("set", json()), document.value("disk", json()));
 }
 
 void CheckHostDescription(const HostDescription& host) {

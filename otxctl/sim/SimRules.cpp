@@ -116,14 +116,17 @@ void SimRules::QueryDisks(const std::vector<std::string>& names, std::vector<Dis
 }
 
 void SimRules::GetDiskMappings(std::vector<DiskMapping>& mappings, bool withUnmounted) const {
-  for (const HostGroup& group : _host.groups) {
+  for (Index index = 0; index < _host.groups.size(); ++index) {
+    const HostGroup& group = _host.groups[index];
     if (!group.mounted && !withUnmounted) {
       continue;
     }
+    const Members& members = _membersOfGroup[index];
     DiskMapping& mapping = mappings.emplace_back();
-    mapping.ssd = NameOf(DiskOf(group.ssd));
-    for (const std::string& name : group.capacity) {
-      mapping.capacityDisks.push_back(NameOf(DiskOf(name)));
+    mapping.ssd = NameOf(_host.disks[members.ssd]);
+    mapping.capacityDisks.reserve(members.capacity.size());
+    for (const Index disk : members.capacity) {
+      mapping.capacityDisks.push_back(NameOf(_host.disks[disk]));
     }
     mapping.formatVersion = group.formatVersion;
     mapping.allFlash = group.allFlash;
@@ -157,10 +160,7 @@ bool SimRules::FormatDiskMapping(const std::string& ssd, const std::vector<std::
   } else {
     _host.groups.push_back(std::move(group));
   }
-  const Index changed = extended ? *extended : _host.groups.size() - 1;
-  for (const std::string& name : joining) {
-    _groupOfDisk[_diskOfName.at(name)] = changed;
-  }
+  IndexGroup(extended ? *extended : _host.groups.size() - 1);
   return true;
 }
 
@@ -291,6 +291,7 @@ bool SimRules::TakeOut(Index disk, const std::string& named) {
   std::vector<std::string>& capacity = group.capacity;
   capacity.erase(std::find(capacity.begin(), capacity.end(), _host.disks[disk].name));
   _groupOfDisk[disk].reset();
+  IndexGroup(*groupIndex);
   Clear(_host.disks[disk]);
   return true;
 }
@@ -306,12 +307,22 @@ void SimRules::RemoveGroup(Index group) {
 
 void SimRules::IndexGroups() {
   _groupOfDisk.assign(_host.disks.size(), std::nullopt);
+  _membersOfGroup.clear();
   for (Index index = 0; index < _host.groups.size(); ++index) {
-    _groupOfDisk[_diskOfName.at(_host.groups[index].ssd)] = index;
-    for (const std::string& name : _host.groups[index].capacity) {
-      _groupOfDisk[_diskOfName.at(name)] = index;
-    }
+    IndexGroup(index);
   }
+}
+
+void SimRules::IndexGroup(Index group) {
+  _membersOfGroup.resize(_host.groups.size());
+  Members& members = _membersOfGroup[group];
+  members.ssd = _diskOfName.at(_host.groups[group].ssd);
+  members.capacity.clear();
+  for (const std::string& name : _host.groups[group].capacity) {
+    members.capacity.push_back(_diskOfName.at(name));
+    _groupOfDisk[members.capacity.back()] = group;
+  }
+  _groupOfDisk[members.ssd] = group;
 }
 
 std::optional<SimRules::Index> SimRules::FindDisk(const std::string& name) const {

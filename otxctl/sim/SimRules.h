@@ -48,6 +48,10 @@ class SimRules {
 
  private:
   using Index = std::size_t;
+  struct Members {
+    Index ssd = 0;
+    std::vector<Index> capacity;  // in the group's order
+  };
 
   // The disk that the kernel knows by this name; a disk that has left has no name any more.
   std::optional<Index> FindDisk(const std::string& name) const;
@@ -66,10 +70,12 @@ class SimRules {
   bool TakeOut(Index disk, const std::string& named);
   void RemoveGroup(Index group);
   void IndexGroups();
+  void IndexGroup(Index group);
 
   HostDescription _host;
   std::unordered_map<std::string, Index> _diskOfName;
   std::vector<std::optional<Index>> _groupOfDisk;
+  std::vector<Members> _membersOfGroup;
 };
 
 }  // namespace OtxCtl::Sim

@@ -80,8 +80,14 @@ class OneProcess(ProgramTest):
     def test_tells_how_it_is_used(self):
         outcome = self.kovactl("--help")
         self.assert_ended(outcome, 0)
-        for command in ("disks", "host", "replay"):
-            self.assertIn(command, outcome.out)
+        commands = ("disks", "groups", "config", "tasks", "add", "init", "remove", "remove-group", "unmount", "claim",
+                    "plan", "sim", "host", "replay")
+        for command in commands:
+            self.assertIn(f"\n  {command} ", outcome.out)
+            self.assert_ended(self.kovactl(command, "--help"), 0)
+        for command in ("add", "init", "remove", "remove-group", "unmount", "claim"):
+            self.assertIn(f"\n  {command} ", self.kovactl("plan", "--help").out)
+        self.assertIn("Exit status: 0 done", outcome.out)
 
     def test_lets_no_name_play_with_the_terminal(self):
         # A description may not hold such a name, so it can only come from the command line.

@@ -1,21 +1,56 @@
 """The programs as tests of them run them: agents that are gone when the test is, commands with their output."""
 
+import http.client
 import json
 import os
 import shutil
+import socket
 import subprocess
 import tempfile
 import time
 import unittest
 
 BIN = os.environ["KOVA_BIN"]
-EXAMPLES = os.environ["KOVA_EXAMPLE_HOSTS"]
+EXAMPLES = os.environ.get("KOVA_EXAMPLE_HOSTS", "")
 PATIENCE = 120  # seconds; generous, for builds with sanitizers on a busy machine
 
 
 def disk(name, ssd=False, **more):
     """A disk of a host description."""
     return {"name": name, "ssd": ssd, "bytes": 1 << 40, **more}
+
+
+class Agent(http.client.HTTPConnection):
+    """A client of an agent's JSON routes, on one connection."""
+
+    def __init__(self, path, timeout=PATIENCE):
+        super().__init__("localhost", timeout=timeout)
+        self.path = path
+
+    def connect(self):
+        self.sock = socket.socket(socket.AF_UNIX)
+        self.sock.settimeout(self.timeout)
+        self.sock.connect(self.path)
+
+    def ask(self, method, target, body=None):
+        """Status, and the answer as JSON."""
+        status, answer, _ = self.ask_fully(method, target, body)
+        return status, answer
+
+    def ask_fully(self, method, target, body=None):
+        """The same, and the headers. What is no text is sent as JSON."""
+        content = body if body is None or isinstance(body, str) else json.dumps(body)
+        self.request(method, target, content, {} if body is None else {"Content-Type": "application/json"})
+        response = self.getresponse()
+        text = response.read().decode()
+        is_json = response.headers["Content-Type"] == "application/json"
+        return response.status, json.loads(text) if is_json else text, response.headers
+
+    def get(self, target):
+        return self.ask("GET", "/api/v1/" + target)
+
+    def post(self, operation, **parameters):
+        return self.ask("POST", "/api/v1/" + operation, parameters)
 
 
 class Outcome:
@@ -66,6 +101,12 @@ class ProgramTest(unittest.TestCase):
 
     def ask_agent(self, *arguments):
         return self.kovactl("--agent", "unix:" + self.socket, *arguments)
+
+    def http(self):
+        """A connection to the agent."""
+        agent = Agent(self.socket)
+        self.addCleanup(agent.close)
+        return agent
 
     def agentd(self, *arguments):
         """An agent that is not expected to stay."""

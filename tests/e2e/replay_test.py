@@ -6,9 +6,14 @@ import unittest
 
 from programs import ProgramTest, disk
 
+THREE_DISKS = {"disks": [disk("naa.1", True), disk("naa.2"), disk("naa.3")]}
+ADD = {"operation": "AddDisks", "disks": ["naa.1", "naa.2"], "requestTag": "t1"}
+GROUP = {"ssd": "naa.1", "nonSsd": ["naa.2"]}
 TWO_DISKS = {"disks": [disk("naa.1", True), disk("naa.2")]}
 QUERY = {"operation": "QueryDisksForKova"}
 REFRESH = {"operation": "RefreshKovaInfo", "arguments": [], "outcome": "ok"}
+GET_ALL_GROUPS = {"operation": "GetDiskMappings", "arguments": [True], "outcome": "ok"}
+GET_GROUPS = {"operation": "GetDiskMappings", "arguments": [False], "outcome": "ok"}
 QUERY_DISKS = {"operation": "QueryDisks", "arguments": [[], True], "outcome": "ok"}
 
 
@@ -61,6 +66,105 @@ class Replay(ProgramTest):
         self.assertEqual(list(self.states(found[10])), ["naa.2"])
         self.assertEqual(found[11], {"operation": "host", "fault": None, "result": None, "ended": None,
                                      "log": [], "calls": []})
+
+    @staticmethod
+    def call(operation, *arguments, outcome="ok"):
+        return {"operation": operation, "arguments": list(arguments), "outcome": outcome}
+
+    @staticmethod
+    def groups(answer):
+        """Names of each group of the result, and what kind of error it has."""
+        return [([result["mapping"]["ssd"]["canonicalName"]]
+                 + [one["canonicalName"] for one in result["mapping"]["nonSsd"]],
+                 result.get("error", {}).get("@type")) for result in answer["result"]]
+
+    def test_changes_the_host_from_line_to_line(self):
+        added, made, removed, unmounted, claimed, gone, all_of_them, storage = self.answers(
+            ADD,
+            {"operation": "InitializeDisks", "mappings": [{"ssd": "naa.1", "nonSsd": ["naa.3"]}],
+             "requestTag": "t2"},
+            {"operation": "RemoveDisk", "disk": "naa.3", "passThrough": "p", "optionText": "o", "optionFirst": 1,
+             "optionSecond": 2},
+            {"operation": "UnmountDiskMapping", "mappings": [GROUP], "requestTag": "t3"},
+            {"operation": "ClaimUnmountedDiskgroup"},
+            {"operation": "RemoveDiskMapping", "mapping": GROUP, "passThrough": "p", "optionText": "o",
+             "optionFirst": 3, "optionSecond": 4},
+            {"operation": "AddAllEligibleDisks", "requestTag": "t4"},
+            {"operation": "GetStorageInfo"}, host=THREE_DISKS)
+        refresh = [REFRESH, QUERY_DISKS]
+        self.assertEqual(self.groups(added), [(["naa.1", "naa.2"], None)])
+        self.assertEqual(added["calls"], [*refresh, GET_ALL_GROUPS, GET_ALL_GROUPS,
+                                          self.call("FormatDiskMapping", "naa.1", ["naa.2"], ["t1", 1, 0]), *refresh])
+        self.assertEqual(self.groups(made), [(["naa.1", "naa.3"], None)])
+        self.assertEqual(made["calls"],
+                         [*refresh, self.call("FormatDiskMapping", "naa.1", ["naa.3"], ["t2", 1, 0]), *refresh])
+        self.assertEqual((removed["fault"], removed["result"]), (None, None))
+        self.assertEqual(removed["calls"], [*refresh, self.call("RemoveDisk", "naa.3", "p", ["o", 1, 2])])
+        self.assertEqual(self.groups(unmounted), [(["naa.1", "naa.2"], None)])
+        self.assertEqual(unmounted["calls"], [*refresh, GET_GROUPS, self.call("UnmountDiskMapping", "naa.1")])
+        self.assertEqual(claimed["calls"], [self.call("ClaimUnmountedDiskgroups")])
+        self.assertEqual(gone["calls"],
+                         [*refresh, GET_GROUPS, self.call("RemoveDiskMapping", "naa.1", "p", ["o", 3, 4])])
+        self.assertEqual(self.groups(all_of_them), [(["naa.1", "naa.2", "naa.3"], None)])
+        self.assertEqual(len(storage["result"]["diskMapInfo"]), 1)
+
+    def test_shows_faults_as_the_plug_in_gives_them(self):
+        wanting, unknown, refused, partial = self.answers(
+            {"operation": "AddDisks", "disks": ["naa.2"]},
+            {"operation": "RemoveDiskMapping", "mapping": GROUP},
+            {"operation": "RemoveDisk", "disk": "naa.9"},
+            ADD, host={**TWO_DISKS, "faults": [{"operation": "FormatDiskMapping", "disk": "naa.2",
+                                                "exception": "KovaExceptionHasPartition"}]})
+        self.assertEqual((wanting["fault"]["@type"], wanting["result"]), ("InsufficientDisks", []))
+        self.assertEqual((unknown["fault"]["@type"], unknown["result"]), ("InvalidArgument", None))
+        self.assertEqual(unknown["fault"]["faultMessage"][0]["arg"][0]["value"]["@value"],
+                         "SSD: naa.1, Disks: naa.2")
+        self.assertEqual(refused["fault"]["@type"], "SystemError")
+        self.assertEqual(partial["fault"], {"@type": "DiskHasPartitions", "device": "naa.2"})
+        self.assertEqual(self.groups(partial), [(["naa.1", "naa.2"], "DiskHasPartitions")])
+
+    def test_goes_on_after_an_exception_that_left_the_hook(self):
+        boom = {"operation": "FormatDiskMapping", "call": 1, "exception": "std::runtime_error", "message": "boom"}
+        found = self.answers(ADD, ADD, host={**TWO_DISKS, "faults": [boom]})
+        self.assertEqual([answer["ended"] for answer in found], ["exception: std::runtime_error: boom", None])
+        self.assertEqual((found[0]["fault"], found[0]["result"]), (None, None))
+        self.assertEqual(found[0]["calls"][-1], self.call("FormatDiskMapping", "naa.1", ["naa.2"], ["t1", 1, 0],
+                                                          outcome="std::runtime_error: boom"))
+        self.assertEqual(found[0]["log"][-1]["format"], "Formatting KOVA disks")
+        self.assertEqual(self.groups(found[1]), [(["naa.1", "naa.2"], None)])
+
+    def assert_panics(self, request, told, host=None):
+        """The request ends the process; its answer is the last."""
+        outcome = self.replay(QUERY, request, QUERY, host=host)
+        self.assert_ended(outcome, 70, told)
+        found = outcome.lines()
+        self.assertEqual(len(found), 2)
+        self.assertEqual(found[1]["ended"], "panic: " + told)
+        return found[1]
+
+    def test_ends_over_a_raw_text_of_the_wrong_type(self):
+        text = ('<object xmlns="urn:nox" xmlns:xsi="http://www.w3.org/2001/XMLSchema-instance" xsi:type="%s">'
+                '</object>')
+        self.assert_panics({"operation": "raw", "hook": "AddDisksHookFn", "texts": [text % "KovaFault"]},
+                           "NOT_REACHED kova/agentd/KovaLibManager:1908")
+        self.assert_panics({"operation": "raw", "hook": "InitializeDisksHookFn", "texts": [text % "KovaFault"]},
+                           "NOT_REACHED kova/agentd/KovaLibManager:2070")
+        self.assert_panics({"operation": "raw", "hook": "RemoveDiskMappingHookFn", "texts": [text % "KovaFault"]},
+                           "NOT_REACHED kova/agentd/KovaLibManager:2280")
+        self.assert_panics({"operation": "raw", "hook": "UnmountDiskMappingHookFn", "texts": [text % "KovaFault"]},
+                           "NOT_REACHED kova/agentd/KovaLibManager:2549")
+        answer = self.assert_panics({"operation": "raw", "hook": "AddDisksHookFn", "texts": ["<cut"]},
+                                    "/, line 1: unclosed token")
+        self.assertEqual((answer["operation"], answer["calls"], answer["log"]), ("raw", [], []))
+
+    def test_ends_over_a_half_filled_request_with_what_came_about_before(self):
+        answer = self.assert_panics({"operation": "AddDisks", "disks": [{"ssd": True}]}, "Not initialized")
+        self.assertEqual((answer["fault"], answer["result"], answer["calls"]), (None, None, []))
+        boom = {"operation": "RemoveDisk", "exception": "std::runtime_error", "message": "boom"}
+        answer = self.assert_panics({"operation": "RemoveDisk", "disk": "naa.2"}, "boom",
+                                    host={**TWO_DISKS, "faults": [boom]})
+        self.assertEqual(answer["calls"],
+                         [self.call("RemoveDisk", "naa.2", "", ["", 0, 0], outcome="std::runtime_error: boom")])
 
     def test_gives_the_same_answers_every_time(self):
         lines = (QUERY, {"operation": "host", "disk": {"name": "naa.2", "partitions": 1}}, QUERY)

@@ -2,6 +2,9 @@
 
 import os
 
+import emit_xsd
+from schema import Field, Type
+
 BANNER = "// Generated from {origin}. Changes here are lost; change the schema.\n"
 
 SCALARS = {
@@ -264,14 +267,57 @@ def header(schema, module, file_, types, needs):
     return lines + ["}  // namespace Orbis"]
 
 
-def source(schema, module, file_, types):
+def source(schema, module, file_, types, registered=True):
     lines = [BANNER.format(origin=types[0].origin_name), f'#include "{module}/{file_}.h"', "", "#include <utility>", ""]
     lines += ['#include "orbis/FaultText.h"', '#include "orbis/FieldAccess.h"', '#include "tessa/Throwable.h"', ""]
     lines += ["namespace Orbis {"] + [f"template class DataArray<::{t.cpp}>;" for t in types] + ["}  // namespace Orbis", ""]
     lines += wrapped(schema, in_order(schema, types), lambda t: define_class(schema, t))
+    if not registered:
+        return lines
     names = ",\n    ".join(f"&::{t.cpp}::StaticType" for t in types)
     lines += ["", "namespace {", f"const ::Orbis::TypeRegistration registration({{\n    {names}}});", "}  // namespace"]
     return lines
+
+
+def messages(schema, origin):
+    """The elements that carry an operation's parameters and answers, as types that no text can name."""
+    types = []
+    for o in schema.operations:
+        request = Type(o.name, f"Nox::Operation::{o.name}", "DataObject", False, False, "Operations", origin, o.doc)
+        request.fields = o.parameters
+        answer = Type(f"{o.name}Response", f"{request.cpp}Response", "DataObject", False, False, "Operations", origin)
+        if o.returns:
+            answer.fields.append(Field("returnval", o.returns, not o.returns_list, o.returns_list))
+        answer.fields.append(Field("fault", "MethodFault", True, False))
+        types += [request, answer]
+    return types
+
+
+def documents_header(origin):
+    return [
+        BANNER.format(origin=origin),
+        "#pragma once",
+        "",
+        "#include <string_view>",
+        "",
+        '#include "tessa/Api.h"',
+        "",
+        "namespace Nox {",
+        "",
+        "// The service as clients of other makes need it described. Texts that live for ever; threads: any.",
+        "TESSA_API std::string_view WsdlText() noexcept;",
+        "TESSA_API std::string_view XsdText() noexcept;",
+        "",
+        "}  // namespace Nox",
+    ]
+
+
+def documents_source(schema, origin):
+    lines = [BANNER.format(origin=origin), '#include "nox/Documents.h"', "", "namespace Nox {"]
+    for name, document in (("Wsdl", emit_xsd.wsdl(schema)), ("Xsd", emit_xsd.xsd(schema))):
+        lines += ["", f"std::string_view {name}Text() noexcept {{", '  return R"document(' + document[0]]
+        lines += document[1:] + [')document";', "}"]
+    return lines + ["", "}  // namespace Nox"]
 
 
 def write(path, lines):
@@ -301,6 +347,13 @@ def emit(schema, origin, module, out_dir):
         write(f"{out_dir}/{module}/{file_}.h", header(schema, module, file_, types, needs))
         write(f"{out_dir}/{module}/{file_}.cpp", source(schema, module, file_, types))
         needs = needs + [f"{module}/{file_}.h"]
+    if wrappers := messages(schema, origin):
+        for type_ in wrappers:
+            type_.origin_name = f"{module}/schema/{os.path.basename(origin)}"
+        write(f"{out_dir}/{module}/Operations.h", header(schema, module, "Operations", wrappers, needs))
+        write(f"{out_dir}/{module}/Operations.cpp", source(schema, module, "Operations", wrappers, registered=False))
+        write(f"{out_dir}/{module}/Documents.h", documents_header(wrappers[0].origin_name))
+        write(f"{out_dir}/{module}/Documents.cpp", documents_source(schema, wrappers[0].origin_name))
     if module != "orbis":
         lines = [BANNER.format(origin=mine[0].origin_name), "#pragma once", ""] + forward_declarations(schema, mine)
         write(f"{out_dir}/{module}/Fwd.h", lines)

@@ -106,4 +106,11 @@ def wsdl(schema):
             '      <wsdl:fault name="fault"><soap:fault name="fault" use="literal"/></wsdl:fault>',
             "    </wsdl:operation>",
         ]
-    return lines + ["  </wsdl:binding>", "</wsdl:definitions>"]
+    return lines + [
+        "  </wsdl:binding>",
+        '  <wsdl:service name="KovaService">',
+        "    <wsdl:documentation>The address is where an agent is told to listen; this one stands for it.</wsdl:documentation>",
+        '    <wsdl:port name="KovaPort" binding="nox:KovaBinding"><soap:address location="http://localhost/soap"/></wsdl:port>',
+        "  </wsdl:service>",
+        "</wsdl:definitions>",
+    ]

@@ -2,6 +2,7 @@
 
 #include <utility>
 
+#include "kova/agentd/query/NameSet.h"
 #include "nox/Host.h"
 #include "tessa/Throwable.h"
 
@@ -29,16 +30,30 @@ void GetScsiDiskFromArray(const std::string& canonicalName, const Ref<DataArray<
 }
 
 DiskInventory::DiskInventory(Ref<DataArray<ScsiDisk>> disks) : _disks(std::move(disks)) {
+  if (_disks) {
+    _named.reserve(_disks->Size());
+  }
+  Index([](const std::string&) { return true; });
+}
+
+DiskInventory::DiskInventory(Ref<DataArray<ScsiDisk>> disks, NameSet& names) : _disks(std::move(disks)) {
+  Index([&names](const std::string& name) { return names.Contains(name); });
+}
+
+template <class IsWanted>
+void DiskInventory::Index(IsWanted isWanted) {
   if (!_disks) {
     return;
   }
-  _named.reserve(_disks->Size());
   for (ScsiDisk* disk : *_disks) {
     if (disk == nullptr || !disk->HasCanonicalName()) {
       _endsUnnamed = true;
       return;
     }
-    _named.emplace(disk->GetCanonicalName(), disk);  // of two with one name the first counts
+    const std::string& name = disk->GetCanonicalName();
+    if (isWanted(name)) {
+      _named.emplace(name, disk);  // of two with one name the first counts
+    }
   }
 }
 

@@ -1,6 +1,7 @@
 // Finding disks of the agent's inventory by canonical name.
 #pragma once
 
+#include <memory_resource>
 #include <string>
 #include <string_view>
 #include <unordered_map>
@@ -10,6 +11,8 @@
 #include "tessa/Ref.h"
 
 namespace Kovasvc {
+
+class NameSet;
 
 // Walks the disks from the first: stores a reference to the disk of that name in `disk`, or leaves it as
 // it was. A disk without a canonical name (or a null) met before the match throws
@@ -23,13 +26,21 @@ void GetScsiDiskFromArray(const std::string& canonicalName,
 class DiskInventory {
  public:
   explicit DiskInventory(Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> disks);
+  // For look-ups of these names only; cheaper when they are few.
+  DiskInventory(Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> disks, NameSet& names);
   ~DiskInventory();
 
   void Find(const std::string& canonicalName, Tessa::Ref<Nox::Host::ScsiDisk>& disk) const;
 
  private:
+  template <class IsWanted>
+  void Index(IsWanted isWanted);
+
   Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> _disks;
-  std::unordered_map<std::string_view, Nox::Host::ScsiDisk*> _named;  // those before the first unnamed one
+  // Entries side by side in memory, and all freed at once.
+  std::pmr::monotonic_buffer_resource _memory;
+  // Those before the first unnamed one.
+  std::pmr::unordered_map<std::string_view, Nox::Host::ScsiDisk*> _named{&_memory};
   bool _endsUnnamed = false;  // a walk that finds nothing meets a disk without a name
 };
 

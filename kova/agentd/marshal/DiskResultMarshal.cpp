@@ -5,6 +5,8 @@
 #include "kova/agentd/marshal/AbsentDisk.h"
 #include "kova/agentd/marshal/DiskInventory.h"
 #include "kova/agentd/marshal/ExceptionMarshal.h"
+#include "kova/agentd/query/DiskQuery.h"
+#include "kova/agentd/query/NameSet.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
@@ -133,7 +135,8 @@ void MarshalHostCtlDiskResults(Logger& logger, const std::vector<HostCtl::Kova::
     LogInternal(logger, LogLevel::Warning, "GetDisksFromAgentd %1", ReasonOf(exception));
     throw;
   }
-  const DiskInventory inventory(disks);
+  NameSet names(NamesOfRecords(records));
+  const DiskInventory inventory(disks, names);
   for (const HostCtl::Kova::DiskResult& record : records) {
     Ref<DiskResult> result;
     MarshalHostCtlDiskResult(logger, record, inventory, result, queryMode);

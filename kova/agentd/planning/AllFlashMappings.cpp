@@ -3,15 +3,13 @@
 // The kernel tags flash disks that are meant for capacity; marshalled for planning they are no cache disks,
 // so the planner of hybrid groups deals them out like hard disks.
 
-#include <string_view>
-#include <unordered_set>
-
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/planning/pure/AllFlashPlan.h"
 #include "kova/agentd/query/DiskQuery.h"
+#include "kova/agentd/query/NameSet.h"
 #include "nox/Kova.h"
 #include "orbis/Types.h"
 
@@ -48,9 +46,8 @@ Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryEligibleFlash(const DataArray<Scs
       return flash;  // a query without names would answer for every disk of the host
     }
     std::vector<DiskResult> records;
-    LimitQueryDisksForKova(*_logger, names, eligible, _diskCache, records);
-    std::erase_if(records, [](const DiskResult& record) {
-      return !Planning::IsFlash(record.isSsd, record.capacityFlash);
+    LimitQueryDisksForKova(*_logger, names, eligible, _diskCache, records, [](const DiskResult& record) {
+      return Planning::IsFlash(record.isSsd, record.capacityFlash);
     });
     MarshalHostCtlDiskResults(*_logger, records, results, false);
   }
@@ -105,10 +102,10 @@ void KovaManagerImpl::AllFlashDiskMappingSwitch(DataArray<ScsiDisk>* candidates,
     mappings = nullptr;
     return;
   }
-  const std::unordered_set<std::string_view> taken(takenNames.begin(), takenNames.end());
+  NameSet taken(takenNames);
   if (candidates != nullptr) {
     for (ScsiDisk* disk : *candidates) {
-      if (!taken.contains(NameOf(disk))) {
+      if (!taken.Contains(NameOf(disk))) {
         left->Append(disk);
       }
     }

@@ -51,7 +51,7 @@ std::string JoinNames(const std::vector<std::string>& names) {
   return joined;
 }
 
-void AppendDeviceNames(const DiskMapping& mapping, std::vector<std::string>& names) {
+void AppendDeviceNames(const DiskMapping& mapping, std::vector<std::string_view>& names) {
   const auto appendNameOf = [&names](const ScsiDisk* disk) {
     const std::string& name = NameOf(disk);
     if (!name.empty()) {
@@ -67,7 +67,9 @@ void AppendDeviceNames(const DiskMapping& mapping, std::vector<std::string>& nam
 }
 
 void DiskMappingToDeviceNames(const Tessa::Ref<DiskMapping>& mapping, std::vector<std::string>& names) {
-  AppendDeviceNames(*mapping, names);
+  std::vector<std::string_view> own;
+  AppendDeviceNames(*mapping, own);
+  names.insert(names.end(), own.begin(), own.end());
   std::sort(names.begin(), names.end());
 }
 

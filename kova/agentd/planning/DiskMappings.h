@@ -5,6 +5,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "nox/Fwd.h"
@@ -25,10 +26,11 @@ std::vector<std::string> NamesOf(const Orbis::DataArray<Nox::Host::ScsiDisk>* di
 // The names, separated by ", ".
 std::string JoinNames(const std::vector<std::string>& names);
 
-// Appends the canonical names of the group's disks, the cache disk's first; empty ones are left out.
-void AppendDeviceNames(const Nox::Kova::Host::DiskMapping& mapping, std::vector<std::string>& names);
+// Appends the canonical names of the group's disks, the cache disk's first; empty ones are left out. The
+// names stay the disks'.
+void AppendDeviceNames(const Nox::Kova::Host::DiskMapping& mapping, std::vector<std::string_view>& names);
 
-// The same, and sorts the whole list by bytes. Duplicates are kept.
+// Appends the same names, copied, and sorts the whole list by bytes. Duplicates are kept.
 void DiskMappingToDeviceNames(const Tessa::Ref<Nox::Kova::Host::DiskMapping>& mapping,
                               std::vector<std::string>& names);
 

@@ -113,8 +113,9 @@ TEST(DiskMappingToDeviceNames, NeedsANameOfEveryDisk) {
 }
 
 TEST(AppendDeviceNames, KeepsTheOrderOfTheGroup) {
-  std::vector<std::string> names = {"n"};
-  AppendDeviceNames(*AMapping(AScsiDisk("m"), {AScsiDisk("z"), AScsiDisk(""), AScsiDisk("a")}), names);
+  std::vector<std::string_view> names = {"n"};
+  const auto mapping = AMapping(AScsiDisk("m"), {AScsiDisk("z"), AScsiDisk(""), AScsiDisk("a")});
+  AppendDeviceNames(*mapping, names);
   EXPECT_THAT(names, ElementsAre("n", "m", "z", "a"));
 }
 

@@ -10,6 +10,7 @@
 #include "kova/agentd/marshal/DiskInventory.h"
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/query/DiskQuery.h"
+#include "kova/agentd/query/NameSet.h"
 #include "nox/Kova.h"
 
 namespace Kovasvc {
@@ -40,6 +41,10 @@ bool IsRequested(const HostCtl::Kova::DiskMapping& group, const std::string& ssd
   return group.ssd.deviceName == ssd && group.capacityDisks.size() == requestedCount &&
          std::all_of(group.capacityDisks.begin(), group.capacityDisks.end(),
                      [&](const DiskName& disk) { return requested.contains(RequestNameOf(disk)); });
+}
+
+bool IsOfflineSsd(const DiskResult& record) {
+  return record.isSsd && record.reason == DiskReason::GroupNotMounted;
 }
 
 // The group with the inventory's disks; null where the inventory has none.
@@ -95,15 +100,10 @@ void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candida
   std::vector<DiskResult> records;
   {
     const LockGuard guard(*_diskCacheLock);
-    LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), _diskCache, records);
+    LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), _diskCache, records, &IsOfflineSsd);
   }
-  std::unordered_set<std::string_view> notMounted;
-  for (const DiskResult& record : records) {
-    if (record.isSsd && record.reason == DiskReason::GroupNotMounted) {
-      notMounted.insert(record.name);
-    }
-  }
-  if (notMounted.empty()) {
+  NameSet notMounted(NamesOfRecords(records));
+  if (notMounted.IsEmpty()) {
     return;
   }
   const std::vector<HostCtl::Kova::DiskMapping> groups = KernelGroupsOrNone();
@@ -113,7 +113,7 @@ void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candida
   }
   const DiskInventory inventory(disks);
   for (const HostCtl::Kova::DiskMapping& group : groups) {
-    if (notMounted.contains(group.ssd.deviceName)) {
+    if (notMounted.Contains(group.ssd.deviceName)) {
       mappings->Append(FromInventory(group, inventory));
     }
   }

@@ -1,6 +1,8 @@
 // Plans disk groups from a set of disks: new ones round flash disks, or more disks for the groups there are.
 
 #include <algorithm>
+#include <string_view>
+#include <utility>
 
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/include/HostCtlException.h"
@@ -9,6 +11,7 @@
 #include "kova/agentd/marshal/ExceptionMarshal.h"
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/planning/pure/HybridPlan.h"
+#include "kova/agentd/query/NameSet.h"
 #include "nox/Kova.h"
 
 namespace Kovasvc {
@@ -52,11 +55,17 @@ struct Tally {
 
 // The kernel's groups that may be extended and whose cache disk is in the inventory.
 Tally ExtendableGroups(const std::vector<HostCtl::Kova::DiskMapping>& groups, bool allFlash,
-                       const DiskInventory& inventory) {
+                       const Ref<DataArray<ScsiDisk>>& disks) {
   std::vector<Planning::ExistingGroup> existing;
   for (const HostCtl::Kova::DiskMapping& group : groups) {
     existing.push_back({.allFlash = group.allFlash, .heldBack = group.thirdFlag});
   }
+  std::vector<std::string_view> ssdNames;
+  for (const HostCtl::Kova::DiskMapping& group : groups) {
+    ssdNames.push_back(group.ssd.deviceName);
+  }
+  NameSet wanted(std::move(ssdNames));
+  const DiskInventory inventory(disks, wanted);
   Tally tally;
   for (const std::size_t position : Planning::ExtendableGroups(existing, allFlash)) {
     const HostCtl::Kova::DiskMapping& group = groups[position];
@@ -153,7 +162,7 @@ void KovaManagerImpl::ComputeDiskMappings(DataArray<ScsiDisk>* candidates, bool 
   if (tally.ssds.empty() && !kernelGroups.empty()) {
     const Unlocked unlocked(*this);
     if (const Ref<DataArray<ScsiDisk>> inventory = InventoryOrNone()) {
-      tally = ExtendableGroups(kernelGroups, allFlash, DiskInventory(inventory));
+      tally = ExtendableGroups(kernelGroups, allFlash, inventory);
     }
   }
   const Planning::Deal deal = Planning::DealCapacityDisks(tally.counts, roles.capacity.size());

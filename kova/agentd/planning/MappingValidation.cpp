@@ -1,11 +1,13 @@
 // Requested disk groups are checked before anything is formatted: the request as a whole, then each group.
 
 #include <algorithm>
+#include <utility>
 
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/query/DiskQuery.h"
+#include "kova/agentd/query/NameSet.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 
@@ -87,22 +89,22 @@ Ref<MethodFault> CheckEligibility(Logger& logger, const KovaManagerImpl::DiskRes
 }  // namespace
 
 void KovaManagerImpl::ValidateDiskMappings(DataArray<DiskMapping>* mappings) {
-  Texts names;
+  std::vector<std::string_view> names;
   if (mappings != nullptr) {
     for (const DiskMapping* mapping : *mappings) {
       AppendDeviceNames(*mapping, names);
     }
   }
-  std::sort(names.begin(), names.end());  // once for all groups, not after each
   if (names.size() < fewestDisks) {
     LogInternal(_logger, LogLevel::Warning,
                 "Error checking disks (only found %1): insufficient disks in given mappings", names.size());
     throw InsufficientDisks::Exception(MakeRef<InsufficientDisks>(std::nullopt));
   }
-  if (const std::string* duplicate = FindDuplicate(names)) {
+  NameSet named(std::move(names));
+  if (const std::string_view* duplicate = named.FindRepeated()) {
     LogInternal(_logger, LogLevel::Warning,
                 "Error checking disk uniqueness, duplicate disks found in mappings: %1", *duplicate);
-    throw DuplicateDisks::Exception(MakeRef<DuplicateDisks>(*duplicate));
+    throw DuplicateDisks::Exception(MakeRef<DuplicateDisks>(std::string(*duplicate)));
   }
 }
 

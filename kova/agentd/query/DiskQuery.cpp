@@ -1,9 +1,7 @@
 #include "kova/agentd/query/DiskQuery.h"
 
-#include <string_view>
-#include <unordered_set>
-
 #include "kova/agentd/include/HostCtlException.h"
+#include "kova/agentd/query/NameSet.h"
 
 namespace Kovasvc {
 
@@ -13,15 +11,16 @@ using Tessa::Service::LogLevel;
 void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<std::string>& names,
                             const DiskQueryLimit& limit,
                             const std::vector<HostCtl::Kova::DiskResult>& records,
-                            std::vector<HostCtl::Kova::DiskResult>& passed) {
+                            std::vector<HostCtl::Kova::DiskResult>& passed, RecordTest alsoWanted) {
   if (records.empty()) {
     return;
   }
-  const std::unordered_set<std::string_view> wanted(names.begin(), names.end());
+  NameSet wanted(names);
   const auto passes = [&](const HostCtl::Kova::DiskResult& record) {
-    return (wanted.empty() || wanted.contains(record.name)) &&
+    return (wanted.IsEmpty() || wanted.Contains(record.name)) &&
            (!limit.byState || record.state == limit.state) &&
-           (!limit.byReason || record.reason == limit.reason);
+           (!limit.byReason || record.reason == limit.reason) &&
+           (alsoWanted == nullptr || alsoWanted(record));
   };
   try {
     for (const HostCtl::Kova::DiskResult& record : records) {
@@ -33,6 +32,15 @@ void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<st
     LogInternal(logger, LogLevel::Warning, "%1: Error querying disks for KOVA: %2", "LimitQueryDisksForKova",
                 exception.Describe());
   }
+}
+
+std::vector<std::string_view> NamesOfRecords(const std::vector<HostCtl::Kova::DiskResult>& records) {
+  std::vector<std::string_view> names;
+  names.reserve(records.size());
+  for (const HostCtl::Kova::DiskResult& record : records) {
+    names.push_back(record.name);
+  }
+  return names;
 }
 
 }  // namespace Kovasvc

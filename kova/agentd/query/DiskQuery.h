@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "kova/agentd/include/KovaRecords.h"
@@ -18,11 +19,17 @@ struct DiskQueryLimit {
   bool fifthFlag = true;  // carried along; no filter reads it
 };
 
+// A caller's own test beside the limit.
+using RecordTest = bool (*)(const HostCtl::Kova::DiskResult& record);
+
 // Appends copies of the records that pass, in the order of the records. No names: every name passes; a
 // name that matches nothing is passed over. A failing kernel ends the walk with a warning.
 void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<std::string>& names,
                             const DiskQueryLimit& limit,
                             const std::vector<HostCtl::Kova::DiskResult>& records,
-                            std::vector<HostCtl::Kova::DiskResult>& passed);
+                            std::vector<HostCtl::Kova::DiskResult>& passed, RecordTest alsoWanted = nullptr);
+
+// The records' names, by reference, in order.
+std::vector<std::string_view> NamesOfRecords(const std::vector<HostCtl::Kova::DiskResult>& records);
 
 }  // namespace Kovasvc

@@ -67,6 +67,7 @@ void KovaUtil::GetDisksFromAgentd(Ref<DataArray<Nox::Host::ScsiDisk>>& disks) {
 void EnumScsiDiskDevice(Nox::Host::StorageDeviceInfo* info, Ref<DataArray<Nox::Host::ScsiDisk>>& disks) {
   const Ref<DataArray<Nox::Host::ScsiDisk>> found = MakeRef<DataArray<Nox::Host::ScsiDisk>>();
   if (info != nullptr && info->GetScsiLun()) {
+    found->Reserve(info->GetScsiLun()->Size());
     for (Nox::Host::ScsiLun* unit : *info->GetScsiLun()) {
       if (auto* const disk = dynamic_cast<Nox::Host::ScsiDisk*>(unit)) {
         found->Append(disk);

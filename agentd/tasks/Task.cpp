@@ -1,0 +1,61 @@
+#include "agentd/tasks/Task.h"
+
+#include <array>
+
+#include "orbis/Json.h"
+#include "orbis/Scalar.h"
+#include "orbis/json/JsonText.h"
+
+namespace Agentd {
+namespace {
+
+void AppendText(const char* key, const std::string& text, std::string& out) {
+  out.append(",\"").append(key).append("\":");
+  Orbis::Json::AppendString(text, out);
+}
+
+void AppendTime(const char* key, const std::optional<Orbis::DateTime>& time, std::string& out) {
+  if (time) {
+    std::string text;
+    Orbis::AppendScalar(Orbis::FieldKind::DateTime, &*time, text);
+    AppendText(key, text, out);
+  }
+}
+
+void AppendValue(const char* key, const Orbis::Any* value, std::string& out) {
+  out.append(",\"").append(key).append("\":");
+  if (value == nullptr) {
+    out += "null";
+  } else {
+    Orbis::WriteJson(*value, out);
+  }
+}
+
+}  // namespace
+
+const char* NameOf(TaskState state) {
+  static constexpr std::array<const char*, 4> names = {"waiting", "running", "done", "failed"};
+  return names.at(static_cast<std::size_t>(state));
+}
+
+void WriteJson(const Task& task, bool withResult, std::string& out) {
+  out += "{\"id\":";
+  Orbis::Json::AppendString(task.id, out);
+  AppendText("label", task.label, out);
+  AppendText("operation", task.operation, out);
+  AppendText("state", NameOf(task.state), out);
+  AppendTime("created", task.created, out);
+  AppendTime("started", task.started, out);
+  AppendTime("ended", task.ended, out);
+  out += ",\"percent\":" + std::to_string(task.percent);
+  AppendText("step", task.step, out);
+  if (task.ended) {
+    if (withResult) {
+      AppendValue("result", task.answer.result.Get(), out);
+    }
+    AppendValue("fault", task.answer.fault.Get(), out);
+  }
+  out += "}";
+}
+
+}  // namespace Agentd

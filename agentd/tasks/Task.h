@@ -1,0 +1,38 @@
+// One disk-changing request, from the moment the agent takes it on.
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "host/Answer.h"
+#include "orbis/Any.h"
+
+namespace Agentd {
+
+enum class TaskState {
+  Waiting,  // for the requests before it
+  Running,
+  Done,    // answered without a fault
+  Failed,  // answered with one, perhaps beside a result
+};
+
+struct Task {
+  std::string id;     // made by the agent; the kernel knows the request by it
+  std::string label;  // the client's own, may be empty
+  std::string operation;
+  TaskState state = TaskState::Waiting;
+  Orbis::DateTime created;
+  std::optional<Orbis::DateTime> started;
+  std::optional<Orbis::DateTime> ended;
+  int percent = 0;      // as the kernel last reported
+  std::string step;     // what it was doing then
+  Host::Answer answer;  // once it has ended
+};
+
+// "waiting", "running", "done", "failed".
+const char* NameOf(TaskState state);
+
+// Appends the task as a JSON object; `withResult` for the result of one that has ended, which may be long.
+void WriteJson(const Task& task, bool withResult, std::string& out);
+
+}  // namespace Agentd

@@ -1,0 +1,87 @@
+// The requests that change disks, one after the other.
+//
+// One worker carries them out in the order in which they came; as many may wait as the limits say. Round each
+// stands an OtxCtl::TaskScope with the task's id, through which the kernel reports progress. Tasks that have
+// ended are remembered, up to a number.
+//
+// Threads: every function from any thread; listeners are called without a lock.
+#pragma once
+
+#include <condition_variable>
+#include <deque>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "agentd/tasks/Task.h"
+
+namespace Agentd {
+
+struct TaskLimits {
+  std::size_t waiting = 64;      // beside the one that runs
+  std::size_t remembered = 256;  // that have ended
+};
+
+class TaskQueue {
+ public:
+  // Called on the worker. An exception is answered as a SystemError with its text.
+  using Work = std::function<Host::Answer()>;
+  // Told once that the task has ended, on the worker or, for one that was never begun, in Close.
+  using Listener = std::function<void(const Task&)>;
+  using Clock = std::function<Orbis::DateTime()>;
+
+  static Orbis::DateTime Now();
+
+  explicit TaskQueue(const TaskLimits& limits = {}, Clock clock = &TaskQueue::Now);
+  // As Close and Finish.
+  ~TaskQueue();
+  TaskQueue(const TaskQueue&) = delete;
+  TaskQueue& operator=(const TaskQueue&) = delete;
+
+  // The task as it was taken on. Throws Nox::Fault::Busy::Exception when too many wait, or after Close; the
+  // listener is not called then.
+  Task Submit(const std::string& operation, const std::string& label, Work work, Listener onEnded = {});
+
+  // Nothing when there never was one of that id, or it is forgotten.
+  std::optional<Task> Find(const std::string& id) const;
+  // In order of creation.
+  std::vector<Task> List() const;
+
+  // Takes on nothing more; tasks that wait end with a Busy fault, nothing of them done. The one that runs
+  // goes on.
+  void Close();
+  // Closes, and waits for the one that runs.
+  void Finish();
+
+ private:
+  struct Entry;
+  using Lock = std::unique_lock<std::mutex>;
+
+  void RunAll();
+  void Run(Entry& entry);
+  Host::Answer Carry(const Entry& entry);
+  std::shared_ptr<Entry> NextWaiting(Lock& lock);
+  // Ends the task, and tells its listener with the lock let go.
+  void End(Entry& entry, Host::Answer answer);
+  void ForgetOldest();
+
+  const TaskLimits _limits;
+  const Clock _clock;
+  const std::string _idPrefix;  // another in every process
+
+  mutable std::mutex _mutex;  // guards what follows, and the tasks in the entries
+  std::condition_variable _changed;
+  std::deque<std::shared_ptr<Entry>> _entries;  // in order of creation
+  std::deque<std::shared_ptr<Entry>> _waiting;
+  std::size_t _created = 0;
+  bool _closed = false;
+
+  std::once_flag _joined;
+  std::thread _worker;  // the last to be made
+};
+
+}  // namespace Agentd

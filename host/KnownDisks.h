@@ -1,0 +1,41 @@
+// The disks that the agent's inventory lists, by canonical name, as they were at one moment.
+//
+// Threads: any; a snapshot is not guarded, its objects are only read.
+#pragma once
+
+#include <string>
+#include <string_view>
+#include <unordered_map>
+
+#include "nox/Fwd.h"
+#include "tessa/Ref.h"
+
+namespace Host {
+
+class KnownDisks {
+ public:
+  // What the managed object "storageSystem" lists now; nothing while there is no such object.
+  static KnownDisks Now();
+
+  // Units that are no disks, nulls and disks without a name are passed over. Null: no disks.
+  explicit KnownDisks(Tessa::Ref<Nox::Host::StorageDeviceInfo> info);
+  ~KnownDisks();
+  KnownDisks(KnownDisks&&) noexcept;
+
+  // The inventory's own object, not to be changed; or null.
+  Tessa::Ref<Nox::Host::ScsiDisk> Find(std::string_view canonicalName) const;
+
+ private:
+  Tessa::Ref<Nox::Host::StorageDeviceInfo> _info;  // keeps the names and the disks
+  std::unordered_map<std::string_view, Nox::Host::ScsiDisk*> _named;
+};
+
+// A disk that has left the host but that the kernel remembers has no name any more. Requests and results
+// call it "kova:" and its KOVA UUID of 36 characters.
+bool IsAbsentName(std::string_view canonicalName);
+std::string AbsentName(const std::string& kovaUuid);
+
+// The object that stands for such a disk.
+Tessa::Ref<Nox::Host::ScsiDisk> AbsentDisk(const std::string& kovaUuid, bool ssd);
+
+}  // namespace Host

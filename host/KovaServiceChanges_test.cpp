@@ -1,0 +1,286 @@
+// The service's changing operations before hooks that only listen: what reaches the plug-in, and what does
+// not.
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <memory>
+
+#include "host/AgentApp.h"
+#include "host/HostError.h"
+#include "host/Inventory.h"
+#include "host/KovaService.h"
+#include "host/testing/Requests.h"
+#include "orbis/Soap.h"
+#include "otxctl/ProviderFactory.h"
+#include "otxctl/TaskScope.h"
+#include "otxctl/sim/HostBuilder.h"
+#include "otxctl/sim/SimProvider.h"
+
+namespace Host {
+namespace {
+
+using namespace Host::Testing;
+using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapping;
+using OtxCtl::Sim::AHost;
+using OtxCtl::Sim::HostDescription;
+using OtxCtl::Sim::SimHost;
+using Tessa::MakeRef;
+using Tessa::Ref;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::StartsWith;
+
+// What the hooks were called with, one line per call.
+std::vector<std::string> heard;
+// What the next hooks say.
+std::string saidFault;
+std::string saidResult;
+
+std::string Show(const ScsiDisk& disk) {
+  return disk.GetCanonicalName() + (disk.GetSsd() ? "!" : "");
+}
+
+std::string Show(const DiskMapping& mapping) {
+  std::string text = Show(*mapping.GetSsd()) + "<";
+  if (mapping.GetNonSsd()) {
+    for (const ScsiDisk* disk : *mapping.GetNonSsd()) {
+      text += Show(*disk);
+    }
+  }
+  return text + ">";
+}
+
+template <class Item>
+std::string ShowText(const std::string& text) {
+  Ref<Orbis::Any> value;
+  Orbis::DeserializeSoapToObject(text, value, nullptr, &Item::StaticType());
+  return Show(dynamic_cast<const Item&>(*value));
+}
+
+template <class Item>
+std::string ShowTexts(const Kovasvc::Texts& texts) {
+  std::string shown;
+  for (const std::string& text : texts) {
+    shown += " " + ShowText<Item>(text);
+  }
+  return shown;
+}
+
+void Say(std::string& fault, std::string& result) {
+  fault += saidFault;
+  result += saidResult;
+}
+
+PluginHooks Listeners() {
+  PluginHooks hooks{};
+  hooks.addDisks = [](const Kovasvc::Texts& disks, const std::string& tag, std::string& fault,
+                      std::string& result) {
+    heard.push_back("add" + ShowTexts<ScsiDisk>(disks) + " #" + tag);
+    Say(fault, result);
+  };
+  hooks.initializeDisks = [](const Kovasvc::Texts& mappings, const std::string& tag, std::string& fault,
+                             std::string& result) {
+    heard.push_back("init" + ShowTexts<DiskMapping>(mappings) + " #" + tag);
+    Say(fault, result);
+  };
+  hooks.unmountDiskMapping = [](const Kovasvc::Texts& mappings, const std::string& tag, std::string& fault,
+                                std::string& result) {
+    heard.push_back("unmount" + ShowTexts<DiskMapping>(mappings) + " #" + tag);
+    Say(fault, result);
+  };
+  hooks.addAllEligibleDisks = [](const std::string& tag, std::string& fault, std::string& result) {
+    heard.push_back("add all #" + tag);
+    Say(fault, result);
+  };
+  hooks.removeDisks = [](const std::string& disk, const std::string& passThrough, const std::string& text,
+                         int first, int second, std::string& fault) {
+    heard.push_back("remove " + disk + " " + passThrough + " " + text + " " + std::to_string(first) + " " +
+                    std::to_string(second));
+    fault += saidFault;
+  };
+  hooks.removeDiskMapping = [](const std::string& mapping, const std::string& passThrough,
+                               const std::string& text, int first, int second, std::string& fault) {
+    heard.push_back("remove group " + ShowText<DiskMapping>(mapping) + " " + passThrough + " " + text + " " +
+                    std::to_string(first) + " " + std::to_string(second));
+    fault += saidFault;
+  };
+  hooks.claimUnmountedDiskgroup = [] { heard.emplace_back("claim"); };
+  hooks.getStorageInfo = [](std::string&) { heard.emplace_back("storage info"); };
+  return hooks;
+}
+
+class KovaServiceChanges : public testing::Test {
+ protected:
+  KovaServiceChanges() {
+    heard.clear();
+    saidFault.clear();
+    saidResult.clear();
+    _inventory->Replace(DescribeInventory(_host->Snapshot()));
+    _app.SetObject("storageSystem", _inventory);
+    Tessa::Service::SetApp(&_app);
+    OtxCtl::Kova::SetProviderFactory(
+        [host = _host] { return std::make_unique<OtxCtl::Sim::SimProvider>(host); });
+  }
+  ~KovaServiceChanges() override {
+    OtxCtl::Kova::SetProviderFactory({});
+    Tessa::Service::SetApp(nullptr);
+  }
+
+  std::shared_ptr<SimHost> _host = std::make_shared<SimHost>(
+      AHost().WithSsd("naa.1").WithHdds({"naa.2", "naa.3"}).WithUnmountedGroup("naa.1", {"naa.3"}).Build());
+  Ref<Inventory> _inventory = MakeRef<Inventory>();
+  AgentApp _app;
+  const KovaService _service{Listeners(), _host.get()};
+};
+
+TEST_F(KovaServiceChanges, HandsDisksDownAsTheInventoryKnowsThem) {
+  EXPECT_EQ(Told(_service.AddDisks(*Disks({ADisk("naa.1"), ADisk("naa.2", true)})).fault.Get()), "done");
+  EXPECT_THAT(heard, ElementsAre("add naa.1! naa.2 #"));
+}
+
+TEST_F(KovaServiceChanges, HandsGroupsDownAsTheInventoryKnowsThem) {
+  const auto mappings = Mappings({MappingOf("naa.1", {"naa.2"}), MappingOf("naa.3", {})});
+  _service.InitializeDisks(*mappings);
+  _service.UnmountDiskMapping(*mappings);
+  EXPECT_THAT(heard, ElementsAre("init naa.1!<naa.2> naa.3<> #", "unmount naa.1!<naa.2> naa.3<> #"));
+}
+
+TEST_F(KovaServiceChanges, HandsRemovalsDownWithAllThatBelongsToThem) {
+  _service.RemoveDisk("naa.2", {"p", "o", -1, 2});
+  _service.RemoveDiskMapping(*MappingOf("naa.1", {"naa.9"}), {"q", "r", 3, -4});
+  EXPECT_THAT(heard, ElementsAre("remove naa.2 p o -1 2", "remove group naa.1!<naa.9> q r 3 -4"));
+}
+
+TEST_F(KovaServiceChanges, TakesTheTasksIdForTheRequestTag) {
+  const OtxCtl::TaskScope task("task-7", {});
+  _service.AddDisks(*DisksNamed({"naa.2"}));
+  _service.InitializeDisks(*Mappings({}));
+  _service.UnmountDiskMapping(*Mappings({}));
+  _service.AddAllEligibleDisks();
+  EXPECT_THAT(heard, ElementsAre("add naa.2 #task-7", "init #task-7", "unmount #task-7", "add all #task-7"));
+}
+
+TEST_F(KovaServiceChanges, HandsUpResultAndFault) {
+  Orbis::DataArray<Nox::Kova::Host::DiskMapResult> results;
+  Orbis::SerializeObjectToSoap(results, nullptr, saidResult);
+  Orbis::SerializeObjectToSoap(Orbis::Fault::SystemError("half of it failed"), nullptr, saidFault);
+  for (const Answer& answer :
+       {_service.AddDisks(*Disks({})), _service.AddAllEligibleDisks(),
+        _service.InitializeDisks(*Mappings({})), _service.UnmountDiskMapping(*Mappings({}))}) {
+    EXPECT_TRUE(answer.result);
+    EXPECT_EQ(Told(answer.fault.Get()), "half of it failed");
+  }
+  EXPECT_EQ(Told(_service.RemoveDisk("naa.2", {}).fault.Get()), "half of it failed");
+  EXPECT_EQ(Told(_service.RemoveDiskMapping(*MappingOf("naa.1", {}), {}).fault.Get()), "half of it failed");
+}
+
+TEST_F(KovaServiceChanges, AnswersWithNothingWhenThePluginSaysNothing) {
+  for (const Answer& answer : {_service.AddAllEligibleDisks(), _service.ClaimUnmountedDiskgroup(),
+                               _service.RemoveDisk("naa.2", {})}) {
+    EXPECT_FALSE(answer.result);
+    EXPECT_FALSE(answer.fault);
+  }
+  EXPECT_THAT(heard, ElementsAre("add all #", "claim", "remove naa.2   0 0"));
+}
+
+TEST_F(KovaServiceChanges, CallsNoHookForWhatTheGateRefuses) {
+  _host->Change([](HostDescription& host) { host.disks[2].absent = true; });
+  _inventory->Replace(DescribeInventory(_host->Snapshot()));
+  for (const auto& [answer, told] : std::vector<std::pair<Answer, const char*>>{
+           {_service.AddDisks(*DisksNamed({"naa.9"})), "disks[0] | "},
+           {_service.AddDisks(*DisksNamed({"naa.2", "naa.1"})), "disks[1] | "},
+           {_service.InitializeDisks(*Mappings({nullptr})), "mappings[0] | "},
+           {_service.InitializeDisks(*Mappings({MappingOf("naa.1", {"naa.9"})})), "mappings[0].nonSsd[0] | "},
+           {_service.UnmountDiskMapping(*Mappings({MappingOf("", {})})), "mappings[0].ssd | "},
+           {_service.RemoveDisk("", {}), "disk | "},
+           {_service.RemoveDisk("naa.2", {"\n", "", 0, 0}), "passThrough | "},
+           {_service.RemoveDiskMapping(*MappingOf("", {}), {}), "mapping.ssd | "},
+           {_service.RemoveDiskMapping(*MappingOf("naa.1", {}), {"", "\n", 0, 0}), "optionText | "}}) {
+    EXPECT_FALSE(answer.result);
+    EXPECT_THAT(Told(answer.fault.Get()), StartsWith(told));
+  }
+  EXPECT_THAT(heard, IsEmpty());
+}
+
+TEST_F(KovaServiceChanges, AnswersAnExceptionOfAHookByASystemErrorWithItsText) {
+  PluginHooks hooks = Listeners();
+  hooks.addAllEligibleDisks = [](const std::string&, std::string&, std::string&) {
+    throw std::runtime_error("the kernel is gone");
+  };
+  EXPECT_EQ(Told(KovaService(hooks).AddAllEligibleDisks().fault.Get()), "the kernel is gone");
+}
+
+TEST_F(KovaServiceChanges, AnswersWithoutAProviderByASystemError) {
+  OtxCtl::Kova::SetProviderFactory({});
+  EXPECT_THAT(Told(_service.AddDisks(*DisksNamed({"naa.1"})).fault.Get()), HasSubstr("No kernel provider"));
+  EXPECT_THAT(heard, IsEmpty());
+}
+
+TEST_F(KovaServiceChanges, GroupsAreThoseOfStorageInfoAndTheUnmountedOnes) {
+  PluginHooks hooks = Listeners();
+  hooks.getStorageInfo = [](std::string& result) {
+    Nox::Kova::Host::ConfigInfo::StorageInfo info;
+    info.SetAutoClaim(true);
+    Orbis::SerializeObjectToSoap(info, nullptr, result);
+  };
+  const KovaService service(hooks, _host.get());
+  Answer answer = service.GetDiskGroups();
+  const auto* info = dynamic_cast<const Nox::Kova::Host::ConfigInfo::StorageInfo*>(answer.result.Get());
+  ASSERT_NE(info, nullptr);
+  EXPECT_FALSE(answer.fault);
+  EXPECT_TRUE(info->GetAutoClaim());
+  ASSERT_EQ(info->GetDiskMapInfo()->Size(), 1u);
+  EXPECT_EQ(Show(*(*info->GetDiskMapInfo())[0]->GetMapping()), "naa.1!<naa.3>");
+
+  _host->Change([](HostDescription& host) {
+    host.faults = {
+        {.operation = "GetDiskMappings", .exception = "HostCtlException", .message = "busy", .disk = {}}};
+  });
+  answer = service.GetDiskGroups();
+  EXPECT_TRUE(answer.result) << "what could be read is answered";
+  EXPECT_EQ(Told(answer.fault.Get()), "busy");
+}
+
+TEST_F(KovaServiceChanges, DescribesTheHostAsAFileWould) {
+  EXPECT_EQ(OtxCtl::Sim::ParseHostDescription(_service.DescribeHost()), _host->Snapshot());
+}
+
+TEST_F(KovaServiceChanges, ChangesTheHostAndThenRefreshesThePlugin) {
+  const Answer answer = _service.ChangeHost(R"({"disk": {"name": "naa.2", "absent": true}})");
+  EXPECT_EQ(Told(answer.fault.Get()), "done");
+  EXPECT_FALSE(answer.result);
+  EXPECT_TRUE(_host->Snapshot().disks[1].absent);
+  EXPECT_THAT(heard, ElementsAre("storage info"));
+}
+
+TEST_F(KovaServiceChanges, RefusesAChangeThatTheHostWouldNotAccept) {
+  const HostDescription before = _host->Snapshot();
+  for (const auto& [change, told] : std::vector<std::pair<std::string, const char*>>{
+           {R"({"disk": {"name": "naa.2", "ssd": 1}})", "disks[1].ssd | disks[1].ssd: "},
+           {R"({"disk": {"name": "naa.9"}})", "disk.name | "},
+           {R"({"autoMode": true})", "autoMode | "},
+           {"[]", "document | "},
+           {"", "line 1"}}) {
+    EXPECT_THAT(Told(_service.ChangeHost(change).fault.Get()), StartsWith(told));
+  }
+  EXPECT_EQ(_host->Snapshot(), before);
+  EXPECT_THAT(heard, IsEmpty());
+}
+
+TEST_F(KovaServiceChanges, AnswersAChangeThatCannotBeSavedByASystemError) {
+  _host->SetSaver([](const HostDescription&) { throw std::runtime_error("no room"); });
+  EXPECT_EQ(Told(_service.ChangeHost(R"({"set": {"autoMode": true}})").fault.Get()), "no room");
+  EXPECT_FALSE(_host->Snapshot().autoMode);
+}
+
+TEST_F(KovaServiceChanges, SaysThatAHostWhichIsNotSimulatedHasNoDescription) {
+  const KovaService service(Listeners());
+  EXPECT_THROW(service.DescribeHost(), HostError);
+  EXPECT_THROW(service.ChangeHost("{}"), HostError);
+}
+
+}  // namespace
+}  // namespace Host

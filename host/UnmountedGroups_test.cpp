@@ -1,0 +1,105 @@
+#include "host/UnmountedGroups.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "host/Inventory.h"
+#include "host/KnownDisks.h"
+#include "nox/Host.h"
+#include "otxctl/sim/HostBuilder.h"
+#include "otxctl/sim/SimHost.h"
+
+namespace Host {
+namespace {
+
+using Nox::Kova::Host::DiskMapInfo;
+using OtxCtl::Sim::AHost;
+using OtxCtl::Sim::HostBuilder;
+using OtxCtl::Sim::SimHost;
+using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+HostBuilder FourDisks() {
+  return AHost().WithSsd("naa.1").WithHdd("naa.2").WithSsd("naa.3").WithHdds({"naa.4", "naa.5"});
+}
+
+std::vector<std::string> CacheDisksOf(const std::vector<HostCtl::Kova::DiskMapping>& groups) {
+  std::vector<std::string> names;
+  for (const auto& group : groups) {
+    names.push_back(group.ssd.deviceName);
+  }
+  return names;
+}
+
+// "SSD: DISK DISK", and "+" in front of one that is mounted.
+std::vector<std::string> Listed(const StorageInfo& info) {
+  std::vector<std::string> lines;
+  for (const DiskMapInfo* group : *info.GetDiskMapInfo()) {
+    std::string line =
+        (group->GetMounted() ? "+" : "") + group->GetMapping()->GetSsd()->GetCanonicalName() + ":";
+    for (const Nox::Host::ScsiDisk* disk : *group->GetMapping()->GetNonSsd()) {
+      line += " " + disk->GetCanonicalName();
+    }
+    lines.push_back(line);
+  }
+  return lines;
+}
+
+StorageInfo InfoAbout(const HostBuilder& builder) {
+  SimHost host(builder.Build());
+  StorageInfo info;
+  AppendUnmounted(UnmountedGroups(host), KnownDisks(DescribeInventory(host.Snapshot())), info);
+  return info;
+}
+
+TEST(UnmountedGroups, AreThoseThatTheKernelHasButDoesNotCallMounted) {
+  SimHost host(FourDisks().WithGroup("naa.1", {"naa.2"}).WithUnmountedGroup("naa.3", {"naa.4"}).Build());
+  EXPECT_THAT(CacheDisksOf(UnmountedGroups(host)), ElementsAre("naa.3"));
+  host.UnmountDiskMapping("naa.1");
+  EXPECT_THAT(CacheDisksOf(UnmountedGroups(host)), ElementsAre("naa.1", "naa.3"));
+  host.ClaimUnmountedDiskgroups();
+  EXPECT_THAT(UnmountedGroups(host), IsEmpty());
+}
+
+TEST(UnmountedGroups, StandBehindTheMountedOnes) {
+  SimHost host(
+      FourDisks().WithGroup("naa.1", {"naa.2"}).WithUnmountedGroup("naa.3", {"naa.4", "naa.5"}).Build());
+  const KnownDisks known(DescribeInventory(host.Snapshot()));
+  StorageInfo info;
+  std::vector<HostCtl::Kova::DiskMapping> mounted;
+  host.GetDiskMappings(mounted, false);
+  AppendUnmounted(mounted, known, info);
+  (*info.GetDiskMapInfo())[0]->SetMounted(true);
+  AppendUnmounted(UnmountedGroups(host), known, info);
+  EXPECT_THAT(Listed(info), ElementsAre("+naa.1: naa.2", "naa.3: naa.4 naa.5"));
+  AppendUnmounted(mounted, known, info);
+  EXPECT_THAT(Listed(info), ElementsAre("+naa.1: naa.2", "naa.3: naa.4 naa.5")) << "none is listed twice";
+}
+
+TEST(UnmountedGroups, ShowTheInventorysDisksWithTheirKovaUuid) {
+  const StorageInfo info = InfoAbout(FourDisks().WithUnmountedGroup("naa.1", {"naa.2"}));
+  const auto ssd = (*info.GetDiskMapInfo())[0]->GetMapping()->GetSsd();
+  EXPECT_TRUE(ssd->GetSsd());
+  EXPECT_EQ(ssd->GetCapacity()->GetBlock(), HostBuilder::kDiskBytes / 512);
+  EXPECT_EQ(ssd->GetKovaDiskInfo()->GetKovaUuid(), "uuid-of-naa.1");
+}
+
+TEST(UnmountedGroups, ShowADiskThatHasLeftByItsUuid) {
+  const StorageInfo info =
+      InfoAbout(FourDisks().WithUnmountedGroup("naa.1", {"naa.2"}).Without("naa.1").Without("naa.2"));
+  EXPECT_THAT(Listed(info), ElementsAre("kova:uuid-of-naa.1: kova:uuid-of-naa.2"));
+  EXPECT_TRUE((*info.GetDiskMapInfo())[0]->GetMapping()->GetSsd()->GetSsd());
+}
+
+TEST(UnmountedGroups, ShowADiskThatTheInventoryLacksByItsName) {
+  const StorageInfo info =
+      InfoAbout(AHost()
+                    .WithSsd("naa.1")
+                    .WithDisk("naa.2", false, [](OtxCtl::Sim::HostDisk& disk) { disk.inInventory = false; })
+                    .WithUnmountedGroup("naa.1", {"naa.2"}));
+  EXPECT_THAT(Listed(info), ElementsAre("naa.1: naa.2"));
+}
+
+}  // namespace
+}  // namespace Host

@@ -1,0 +1,36 @@
+// Looking up many names in a list of names.
+#pragma once
+
+#include <memory_resource>
+#include <string>
+#include <string_view>
+#include <unordered_set>
+#include <vector>
+
+namespace Kovasvc {
+
+// The names of a list, by reference: the list must outlive the set.
+//
+// Made for names that are asked for in the order of the list, as they mostly are, since requests, records and
+// inventory come from one host: such a name is found without a search. The first other one makes an index.
+// For one thread.
+class NameSet {
+ public:
+  explicit NameSet(const std::vector<std::string>& names) : _names(names.begin(), names.end()) {}
+  explicit NameSet(std::vector<std::string_view> names) : _names(std::move(names)) {}
+
+  bool IsEmpty() const noexcept { return _names.empty(); }
+  bool Contains(std::string_view name);
+
+  // Of the names that stand twice in the list the first by bytes; null when there is none.
+  const std::string_view* FindRepeated();
+
+ private:
+  std::vector<std::string_view> _names;
+  std::size_t _next = 0;  // the name that is expected to be asked for
+  // Entries side by side in memory, and all freed at once.
+  std::pmr::monotonic_buffer_resource _memory;
+  std::pmr::unordered_set<std::string_view> _index{&_memory};
+};
+
+}  // namespace Kovasvc

@@ -1,0 +1,118 @@
+#include "kovactl/FaultWords.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <set>
+
+#include "nox/Faults.h"
+#include "orbis/Any.h"
+#include "orbis/TypeDescriptor.h"
+
+namespace Kovactl {
+namespace {
+
+using Orbis::LocalizableMessage;
+using Orbis::MethodFault;
+using Tessa::MakeRef;
+using Tessa::Ref;
+using testing::HasSubstr;
+using testing::Not;
+
+// Every fault class there is, made without anything set.
+std::vector<Ref<MethodFault>> EveryFault() {
+  std::vector<Ref<MethodFault>> faults;
+  for (const Orbis::TypeDescriptor* type : Orbis::AllTypes()) {
+    if (type->kind == Orbis::TypeKind::DataObject && type->IsA(MethodFault::StaticType()) &&
+        !type->IsAbstract()) {
+      faults.emplace_back(static_cast<MethodFault*>(type->create().Get()));
+    }
+  }
+  return faults;
+}
+
+TEST(FaultWords, StandForEveryFaultThatThereIs) {
+  std::set<std::string> words;
+  std::size_t count = 0;
+  for (const auto& fault : EveryFault()) {
+    const std::string& type = fault->GetType().name;
+    EXPECT_THAT(Explain(*fault), Not(HasSubstr(type))) << "the bare name of a class tells people nothing";
+    words.insert(Explain(*fault));
+    ++count;
+  }
+  EXPECT_GE(count, 15u);
+  EXPECT_EQ(words.size(), count) << "no two faults sound the same";
+}
+
+TEST(FaultWords, OfAFaultGoOnWithWhatItCarries) {
+  EXPECT_EQ(Explain(Orbis::Fault::SystemError("no cable")), "something in the host failed: no cable");
+  EXPECT_EQ(Explain(Nox::Fault::DiskTooSmall("naa.1")), "too small: naa.1");
+  EXPECT_EQ(Explain(Nox::Fault::DiskTooSmall()), "too small");
+  Nox::Fault::NotPermitted notPermitted;
+  notPermitted.SetRole("operator");
+  EXPECT_EQ(Explain(notPermitted), "the caller's role does not allow this: operator");
+}
+
+TEST(FaultWords, OfAFaultEndWithItsMessagesOrTheirKeys) {
+  Nox::Fault::KovaFault fault;
+  const auto told = MakeRef<Orbis::LocalizableMessage>();
+  told->SetKey("a.b");
+  told->SetMessage("first");
+  const auto untold = MakeRef<Orbis::LocalizableMessage>();
+  untold->SetKey("c.d");
+  fault.GetFaultMessage()->Append(told);
+  fault.GetFaultMessage()->Append(untold);
+  EXPECT_EQ(Explain(fault), "the storage service refused; first; c.d");
+}
+
+// A fault with one message, which has only its key.
+template <class Fault>
+Ref<Fault> WithKey(const std::string& key) {
+  const auto message = MakeRef<LocalizableMessage>();
+  message->SetKey(key);
+  const auto fault = MakeRef<Fault>();
+  fault->GetFaultMessage()->Append(message);
+  return fault;
+}
+
+TEST(FaultWords, StandForTheKeysThatSayWhichLimitStoppedPlanning) {
+  const auto allFlash = WithKey<Nox::Fault::KovaFault>("nox.agentd.kovaDiskOperation.allFlashExceed");
+  EXPECT_THAT(Explain(*allFlash), HasSubstr("every all-flash disk group is full"));
+  EXPECT_THAT(Advise(*allFlash), HasSubstr("make room"));
+  const auto hybrid = WithKey<Nox::Fault::KovaFault>("nox.agentd.kovaDiskOperation.hybridExceed");
+  EXPECT_THAT(Explain(*hybrid), HasSubstr("every hybrid disk group is full"));
+  EXPECT_THAT(Advise(*hybrid), HasSubstr("make room"));
+}
+
+TEST(FaultWords, OfAGroupThatIsNotThereGoOnWithTheGroup) {
+  const auto fault =
+      WithKey<Orbis::Fault::InvalidArgument>("nox.agentd.kovaDiskOperation.diskMappingNotFound");
+  const auto argument = MakeRef<Orbis::KeyAnyValue>();
+  argument->SetKey("diskMap");
+  argument->SetValue(MakeRef<Orbis::Boxed<std::string>>("SSD: naa.1, Disks: naa.2"));
+  const auto arguments = MakeRef<Orbis::DataArray<Orbis::KeyAnyValue>>();
+  arguments->Append(argument);
+  (*fault->GetFaultMessage())[0]->SetArg(arguments);
+  EXPECT_THAT(Explain(*fault),
+              HasSubstr("; the host has no such disk group mounted (SSD: naa.1, Disks: naa.2)"));
+  EXPECT_THAT(Advise(*fault), HasSubstr("kovactl claim"));
+}
+
+TEST(FaultWords, AdviseWhatToDoAboutEachKindOfFault) {
+  for (const auto& fault : EveryFault()) {
+    const bool isBare = &fault->GetType() == &Nox::Fault::KovaFault::StaticType();
+    EXPECT_EQ(Advise(*fault).empty(), isBare) << fault->GetType().name;
+  }
+  EXPECT_THAT(Advise(Nox::Fault::DiskHasPartitions("naa.1")), HasSubstr("lsblk"));
+  EXPECT_THAT(Advise(Nox::Fault::DiskIsLastRemainingNonSSD("naa.1")), HasSubstr("kovactl remove-group"));
+}
+
+TEST(FaultWords, SayWhenABusyHostMayBeAskedAgain) {
+  Nox::Fault::Busy busy;
+  EXPECT_EQ(Advise(busy), "Try again later.");
+  busy.SetRetryAfterSeconds(30);
+  EXPECT_EQ(Advise(busy), "Try again in 30 s.");
+}
+
+}  // namespace
+}  // namespace Kovactl

@@ -1,0 +1,46 @@
+#include "kovactl/change/Consent.h"
+
+#include <istream>
+#include <ostream>
+
+#include "host/Text.h"
+#include "kovactl/ExitStatus.h"
+
+namespace Kovactl {
+
+Consent Consent::Given() {
+  return {true, nullptr, nullptr};
+}
+
+Consent Consent::AskedFor(std::istream& in, std::ostream& err) {
+  return {false, &in, &err};
+}
+
+Consent Consent::OfNobody() {
+  return {false, nullptr, nullptr};
+}
+
+void Consent::Demand() const {
+  if (!_given && _in == nullptr) {
+    throw BadInput("this destroys data, and nobody is at the terminal to be asked: give --yes to go on");
+  }
+}
+
+bool Consent::AskFor(const std::vector<std::string>& disks) const {
+  Demand();
+  if (_given) {
+    return true;
+  }
+  *_err << "What is on these disks may be lost:\n";
+  for (const std::string& disk : disks) {
+    *_err << "  " << Host::Printable(disk) << "\n";
+  }
+  *_err << "Go on? [y/N] " << std::flush;
+  std::string reply;
+  if (!std::getline(*_in, reply)) {
+    *_err << "\n";
+  }
+  return reply == "y" || reply == "Y" || reply == "yes";
+}
+
+}  // namespace Kovactl

@@ -1,0 +1,28 @@
+// Commands that show what a change would do.
+
+#include "kovactl/plan/PlanCommand.h"
+
+#include <iostream>
+
+#include "kovactl/cli/CommandLine.h"
+
+namespace Kovactl {
+
+void AddPlanCommands(CLI::App& app, CommandLine& line) {
+  auto* const plan = app.add_subcommand(
+      "plan", "Show what a change would do, on a copy of a simulated host; changes nothing");
+  plan->require_subcommand(1);
+  AddChanges(*plan, [&line](CLI::App& command, const MakeChange& make) {
+    command.callback([&line, make] {
+      line.action = [&line, make] {
+        if (line.global.output == "soap") {
+          throw BadInput("a plan is printed as a table or as json");
+        }
+        const ChangeRef change = make();
+        return RunPlan(*ConnectToCopy(line.global), *change, line.global.output, std::cout, std::cerr);
+      };
+    });
+  });
+}
+
+}  // namespace Kovactl

@@ -1,0 +1,141 @@
+#include "kovactl/plan/LeftOvers.h"
+
+#include <array>
+#include <map>
+#include <optional>
+
+#include "host/HostError.h"
+#include "host/Inventory.h"
+#include "kova/agentd/planning/pure/AddPlan.h"
+#include "kovactl/Table.h"
+#include "kovactl/Words.h"
+#include "nox/Kova.h"
+#include "otxctl/sim/SimRules.h"
+
+namespace Kovactl {
+namespace {
+
+using Kovasvc::Planning::LeftOver;
+using Nox::Kova::Host::DiskResult;
+using OtxCtl::Sim::HostDescription;
+using Names = std::vector<std::string>;
+using NameSet = std::set<std::string>;
+
+// The names of the disks that the host's agent lists.
+NameSet Listed(const HostDescription& host) {
+  NameSet names;
+  const auto inventory = Host::DescribeInventory(host);
+  for (const Nox::Host::ScsiLun* unit : *inventory->GetScsiLun()) {
+    if (const auto* disk = dynamic_cast<const Nox::Host::ScsiDisk*>(unit)) {
+      names.insert(NameOf(*disk));
+    }
+  }
+  return names;
+}
+
+std::vector<Kovasvc::Planning::HostGroup> GroupsOf(const OtxCtl::Sim::SimRules& kernel,
+                                                   const NameSet& listed) {
+  std::vector<HostCtl::Kova::DiskMapping> records;
+  kernel.GetDiskMappings(records, true);
+  std::vector<Kovasvc::Planning::HostGroup> groups;
+  groups.reserve(records.size());
+  for (const HostCtl::Kova::DiskMapping& record : records) {
+    groups.push_back({.group = {.allFlash = record.allFlash, .heldBack = record.thirdFlag},
+                      .capacityDisks = record.capacityDisks.size(),
+                      .cacheListed = listed.count(record.ssd.deviceName) != 0});
+  }
+  return groups;
+}
+
+using Reasons = std::map<std::string, std::optional<LeftOver>>;  // nothing: planning would use the disk
+
+// What planning says of each offered disk that the kernel knows.
+Reasons AskPlanning(const HostDescription& host, const Names& offered) {
+  const OtxCtl::Sim::SimRules kernel(host);
+  const NameSet listed = Listed(host);
+  std::vector<HostCtl::Kova::DiskResult> records;
+  kernel.QueryDisks(offered, records);
+  std::vector<Kovasvc::Planning::OfferedDisk> disks;
+  disks.reserve(records.size());
+  for (const HostCtl::Kova::DiskResult& record : records) {
+    // Only the addition of every eligible disk minds a reason beside the state.
+    const bool isFree = !offered.empty() || record.reason == HostCtl::Kova::DiskReason::None;
+    disks.push_back({.eligible = record.state == HostCtl::Kova::DiskState::Eligible && isFree &&
+                                 listed.count(record.name) != 0,
+                     .isSsd = record.isSsd,
+                     .capacityFlash = record.capacityFlash});
+  }
+  const auto plan = Kovasvc::Planning::PlanAddition(disks, GroupsOf(kernel, listed));
+  Reasons reasons;
+  for (std::size_t i = 0; i < records.size(); ++i) {
+    reasons.emplace(records[i].name, plan.leftOver[i]);
+  }
+  return reasons;
+}
+
+const char* WordFor(LeftOver reason) {
+  constexpr std::array<const char*, 5> words = {"notEligible", "noCacheDisk", "noCapacityDisk", "groupsFull",
+                                                "tooManyGroups"};
+  return words.at(static_cast<std::size_t>(reason));
+}
+
+// Why a disk that the kernel offers, or does not, is in no group.
+LeftOverDisk Explain(const DiskResult& verdict, const std::optional<LeftOver>& reason) {
+  const std::string name = NameOf(*verdict.GetDisk());
+  if (!reason) {
+    return {name, "requestFailed", "the request failed before it came to this disk"};
+  }
+  std::string text = Kovasvc::Planning::Describe(*reason);
+  if (*reason == LeftOver::NotEligible && verdict.GetState() == DiskResult::STATE_INUSE) {
+    text = "in use already";
+  } else if (*reason == LeftOver::NotEligible && !ReasonOf(verdict).empty()) {
+    text = ReasonOf(verdict);
+  }
+  return {name, WordFor(*reason), text};
+}
+
+}  // namespace
+
+std::vector<LeftOverDisk> FindLeftOvers(const Host::ManagementApi& host, const HostDescription& before,
+                                        const Names& offered, const NameSet& placed) {
+  const Host::Answer answer = host.QueryDisksForKova(offered);
+  const auto* const verdicts = dynamic_cast<const Orbis::DataArray<DiskResult>*>(answer.result.Get());
+  std::vector<LeftOverDisk> leftOver;
+  if (verdicts == nullptr) {
+    return leftOver;
+  }
+  const Reasons reasons = AskPlanning(before, offered);
+  for (const DiskResult* verdict : *verdicts) {
+    const std::string name = NameOf(*verdict->GetDisk());
+    const bool isUsed = offered.empty() && verdict->GetState() == DiskResult::STATE_INUSE;
+    if (isUsed || placed.count(name) != 0) {
+      continue;
+    }
+    const auto reason = reasons.find(name);
+    leftOver.push_back(Explain(*verdict, reason == reasons.end() ? LeftOver::NotEligible : reason->second));
+  }
+  return leftOver;
+}
+
+std::vector<LeftOverDisk> ExplainLeftOvers(const Host::ManagementApi& host, const Names& offered) {
+  std::string description;
+  try {
+    description = host.DescribeHost();
+  } catch (const Host::HostError&) {
+    return {};
+  }
+  return FindLeftOvers(host, OtxCtl::Sim::ParseHostDescription(description), offered, {});
+}
+
+void PrintLeftOvers(const std::vector<LeftOverDisk>& disks, std::ostream& out) {
+  if (disks.empty()) {
+    return;
+  }
+  Table table({{"LEFT OVER"}, {"WHY"}});
+  for (const LeftOverDisk& disk : disks) {
+    table.AddRow({disk.disk, disk.text});
+  }
+  table.Print(out);
+}
+
+}  // namespace Kovactl

@@ -1,0 +1,21 @@
+// kovactl plan: what a change would do, shown before anybody makes it.
+#pragma once
+
+#include <iosfwd>
+#include <string>
+
+#include "kovactl/ExitStatus.h"
+#include "kovactl/change/Change.h"
+#include "kovactl/plan/Plan.h"
+
+namespace Kovactl {
+
+// Makes the change on a host that may be spoiled, a copy in memory, and compares. Throws BadInput as the
+// change does, and for an answer that cannot be a simulated host's.
+Plan MakePlan(const Host::ManagementApi& copy, Change& change);
+
+// The same, printed. Fault when the host would answer with one.
+ExitStatus RunPlan(const Host::ManagementApi& copy, Change& change, const std::string& output,
+                   std::ostream& out, std::ostream& err);
+
+}  // namespace Kovactl

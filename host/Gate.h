@@ -28,6 +28,7 @@ inline constexpr std::size_t longestName = 1024;    // bytes
 inline constexpr std::size_t longestOption = 4096;  // bytes
 inline constexpr std::size_t mostNames = 100'000;   // or disks, of a whole request
 inline constexpr std::size_t mostMappings = 10'000;
+inline constexpr std::size_t mostDisksOfGroup = 1000;  // beside its cache disk
 
 // Names must be there, not too long, UTF-8 without control characters, and not too many. `property` is what
 // the client calls them.

@@ -205,8 +205,18 @@ TEST_F(GateWithHost, LetsInTheMostGroupsAndNoMore) {
   EXPECT_EQ(VerdictOnNewGroups(std::vector<MappingRef>(mostMappings, mapping)), "let in");
   EXPECT_THAT(VerdictOnNewGroups(std::vector<MappingRef>(mostMappings + 1, mapping)),
               HasSubstr("10000 disk groups"));
-  const MappingRef large = MappingOf("naa.1", Names(mostNames / 2, "naa.2"));
-  EXPECT_THAT(VerdictOnNewGroups({large, large}), HasSubstr("100000 disks"));
+  const MappingRef large = MappingOf("naa.1", Names(mostDisksOfGroup, "naa.2"));
+  EXPECT_THAT(VerdictOnNewGroups(std::vector<MappingRef>(mostNames / mostDisksOfGroup, large)),
+              HasSubstr("100000 disks"));
+}
+
+TEST_F(GateWithHost, LetsInTheMostDisksOfAGroupAndNoMore) {
+  const MappingRef largest = MappingOf("naa.1", Names(mostDisksOfGroup, "naa.2"));
+  const MappingRef larger = MappingOf("naa.1", Names(mostDisksOfGroup + 1, "naa.2"));
+  EXPECT_EQ(VerdictOnNewGroups({largest}), "let in");
+  EXPECT_THAT(VerdictOnNewGroups({largest, larger}),
+              AllOf(StartsWith("mappings[1].nonSsd | "), HasSubstr("more than 1000 disks")));
+  EXPECT_THAT(VerdictOn([&] { AdmitGroup(*larger, Known()); }), StartsWith("mapping.nonSsd | "));
 }
 
 TEST_F(GateWithHost, LetsGroupsThatAreThereNameDisksThatTheInventoryLacks) {

@@ -41,7 +41,7 @@ void CheckOption(const std::string& property, const std::string& text) {
   }
 }
 
-// What is done with a disk that the inventory does not know and that has no ssd flag of its own.
+// What is done with a disk that the inventory does not know, whatever flag it brings.
 enum class Unknown {
   Refused,
   RefusedUnlessAbsent,  // "kova:UUID" is let in
@@ -62,8 +62,7 @@ Ref<ScsiDisk> AdmitDisk(const std::string& place, const ScsiDisk* disk, const Kn
   if (Ref<ScsiDisk> found = known.Find(name)) {
     return found;
   }
-  const bool isLetIn =
-      disk->HasSsd() || unknown == Unknown::LetIn || (unknown != Unknown::Refused && IsAbsentName(name));
+  const bool isLetIn = unknown == Unknown::LetIn || (unknown != Unknown::Refused && IsAbsentName(name));
   if (!isLetIn) {
     Refuse(place, "this host has no disk '" + name + "'");
   }

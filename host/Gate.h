@@ -38,7 +38,8 @@ void CheckNames(const std::string& property, const std::vector<std::string>& nam
 void CheckRemoval(const std::string& disk, const RemovalArguments& arguments);
 void CheckRemovalArguments(const RemovalArguments& arguments);
 
-// The disks of an AddDisks. One that the inventory lacks is let in only with its ssd flag.
+// The disks of an AddDisks. One that the inventory lacks is refused, whatever flag it brings: the kernel may
+// know it, but nobody has vouched for what it is.
 Tessa::Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known);
 
 // Groups to be made: as AdmitDisks, but absent disks may be named too.

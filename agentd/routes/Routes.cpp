@@ -7,9 +7,12 @@
 #include <utility>
 
 #include "agentd/http/HttpTarget.h"
+#include "agentd/http/Shown.h"
 #include "agentd/routes/JsonAnswers.h"
 #include "agentd/routes/Operations.h"
+#include "agentd/routes/Permission.h"
 #include "agentd/routes/RequestReader.h"
+#include "agentd/routes/SoapAnswer.h"
 #include "agentd/routes/SoapEndpoint.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "host/HostError.h"
@@ -40,7 +43,7 @@ bool HasOnly(std::string_view known, const Call& call) {
   for (const auto& [name, value] : call.target.parameters) {
     if (name != known) {
       call.responder.Answer(PlainText(
-          400, "unknown parameter '" + name + "'" +
+          400, "unknown parameter '" + Shown(name) + "'" +
                    (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'")));
       return false;
     }
@@ -82,6 +85,10 @@ void Submit(const Call& call, const std::string& operation, const ReadRequest& r
 
 void PostOperation(const Call& call) {
   const Operation& operation = *FindOperation(call.rest);
+  if (const auto refusal = RefusalOf(call.request, operation.changes ? HttpRole::Change : HttpRole::Read)) {
+    call.responder.Answer(ToHttp(*refusal));
+    return;
+  }
   ReadRequest request = ReadJsonRequest(operation, call.request.body);
   if (!operation.changes) {
     call.responder.Answer(ToHttp(operation.call(call.api, request.arguments)));
@@ -149,6 +156,7 @@ bool IsOperation(std::string_view rest) {
 }
 
 struct Route {
+  HttpRole role;              // what it takes at least; an operation may take more
   std::string_view bodyType;  // what a POST must be; empty for a GET
   std::string_view path;
   bool (*takes)(std::string_view rest);  // what stands behind the path
@@ -156,18 +164,18 @@ struct Route {
 };
 
 constexpr std::array<Route, 12> routes = {{
-    {"", "/healthz", &IsNothing, &Health},
-    {"", "/api/v1/disks", &IsNothing, &GetDisks},
-    {"", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
-    {"", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
-    {"", "/api/v1/openapi.json", &IsNothing, &GetDescription},
-    {"", "/api/v1/tasks", &IsNothing, &GetTasks},
-    {"", "/api/v1/tasks/", &IsId, &GetTask},
-    {"", "/api/v1/host", &IsNothing, &GetHost},
-    {jsonType, "/api/v1/host", &IsNothing, &PostHost},
-    {jsonType, "/api/v1/", &IsOperation, &PostOperation},
-    {"", "/soap", &IsNothing, &GetSoap},
-    {xmlType, "/soap", &IsNothing, &PostSoap},
+    {HttpRole::None, "", "/healthz", &IsNothing, &Health},
+    {HttpRole::Read, "", "/api/v1/disks", &IsNothing, &GetDisks},
+    {HttpRole::Read, "", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
+    {HttpRole::Read, "", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
+    {HttpRole::Read, "", "/api/v1/openapi.json", &IsNothing, &GetDescription},
+    {HttpRole::Read, "", "/api/v1/tasks", &IsNothing, &GetTasks},
+    {HttpRole::Read, "", "/api/v1/tasks/", &IsId, &GetTask},
+    {HttpRole::Read, "", "/api/v1/host", &IsNothing, &GetHost},
+    {HttpRole::Change, jsonType, "/api/v1/host", &IsNothing, &PostHost},
+    {HttpRole::Read, jsonType, "/api/v1/", &IsOperation, &PostOperation},
+    {HttpRole::Read, "", "/soap", &IsNothing, &GetSoap},
+    {HttpRole::Read, xmlType, "/soap", &IsNothing, &PostSoap},
 }};
 
 bool Leads(const Route& route, std::string_view path) {
@@ -184,7 +192,15 @@ bool IsOfType(std::string_view wanted, std::string_view contentType) {
   return type == wanted;
 }
 
+void Refuse(const Route& route, const Call& call, const Host::Answer& refusal) {
+  call.responder.Answer(route.bodyType == xmlType ? ToSoap("", refusal) : ToHttp(refusal));
+}
+
 void Follow(const Route& route, const Call& call) {
+  if (const auto refusal = RefusalOf(call.request, route.role)) {
+    Refuse(route, call, *refusal);
+    return;
+  }
   if (!route.bodyType.empty() && !IsOfType(route.bodyType, call.request.contentType)) {
     call.responder.Answer(PlainText(415, "the body must be " + std::string(route.bodyType)));
     return;

@@ -5,6 +5,7 @@
 
 #include "agentd/http/HttpTarget.h"
 #include "agentd/routes/JsonAnswers.h"
+#include "agentd/routes/Permission.h"
 #include "agentd/routes/SoapAnswer.h"
 #include "agentd/routes/SoapRequest.h"
 #include "agentd/tasks/TaskQueue.h"
@@ -45,6 +46,10 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
     const Operation& operation = *read.operation;
     if (!operation.changes) {
       responder.Answer(Written(operation.name, operation.call(api, read.arguments)));
+      return;
+    }
+    if (const auto refusal = RefusalOf(request, HttpRole::Change)) {
+      responder.Answer(ToSoap("", *refusal));
       return;
     }
     tasks.Submit(

@@ -38,7 +38,7 @@ class TaskRoutes : public testing::Test {
   }
   // Hands the request over without waiting for an answer.
   void Start(const std::string& operation, const std::string& body) const {
-    _router.Serve({"POST", "/api/v1/" + operation, "application/json", body},
+    _router.Serve(Testing::By(HttpRole::Change, {"POST", "/api/v1/" + operation, "application/json", body}),
                   HttpResponder([](const HttpAnswer&) {}));
   }
   // The worker stays in the first operation until the gate is opened.
@@ -145,7 +145,8 @@ TEST_F(TaskRoutes, AChangeBeyondTheLimitIsBusyAndSaysWhenToComeBack) {
 TEST_F(TaskRoutes, AChangeThatWaitsWhenTheAgentStopsIsBusy) {
   HoldTheWorker();
   std::promise<HttpAnswer> answered;
-  _router.Serve({"POST", "/api/v1/RemoveDisk", "application/json", R"({"disk": "naa.1"})"},
+  _router.Serve(Testing::By(HttpRole::Change,
+                            {"POST", "/api/v1/RemoveDisk", "application/json", R"({"disk": "naa.1"})"}),
                 HttpResponder([&answered](HttpAnswer answer) { answered.set_value(std::move(answer)); }));
   _tasks.Close();
   const HttpAnswer answer = answered.get_future().get();

@@ -16,7 +16,7 @@ void AddGlobalOptions(CLI::App& app, CommandLine& line) {
     global.agent = usualAgent;
   }
   auto* const agent = app.add_option("--agent", global.agent,
-                                     "Agent to ask: unix:PATH; the environment's KOVA_AGENT unless given")
+                                     "Agent to ask: unix:PATH or tcp:ADDRESS:PORT; the environment's KOVA_AGENT unless given")
                           ->capture_default_str();
   app.add_option("--host", global.runtime.hostFile,
                  "Host description to work on in this process, without an agent")

@@ -165,7 +165,7 @@ class AgentStarts(ProgramTest):
         self.assertEqual(self.read("agentd.sock"), "precious")
 
     def test_not_on_an_address_or_host_or_option_it_does_not_know(self):
-        self.assert_ended(self.agentd("--listen", "tcp:127.0.0.1:0"), 2)
+        self.assert_ended(self.agentd("--listen", "tcp:localhost:0"), 2, "tcp:ADDRESS:PORT")
         self.assert_ended(self.agentd("--host", self.path("none.json")), 2, "none.json")
         broken = self.write("broken.json", {"disks": [{"name": "naa.1", "ssd": 1, "bytes": 1}]})
         self.assert_ended(self.agentd("--host", broken), 2, "disks[0].ssd")

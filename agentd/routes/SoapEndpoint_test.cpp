@@ -214,5 +214,16 @@ TEST_F(SoapEndpoint, IsBusyWhenTooManyChangesWait) {
               AllOf(HasSubstr("xsi:type=\"Busy\""), HasSubstr("<faultcode>soapenv:Server</faultcode>")));
 }
 
+TEST_F(SoapEndpoint, RefusesTooLargeAGroupBeforeItWaits) {
+  std::string mapping = Disk("ssd", "naa.1");
+  for (int i = 0; i <= 1000; ++i) {
+    mapping += Disk("nonSsd", "naa.2");
+  }
+  const HttpAnswer answer = Ask("UnmountDiskMapping", "<mappings>" + mapping + "</mappings>");
+  EXPECT_THAT(answer.body, AllOf(HasSubstr("InvalidArgument"), HasSubstr("mappings[0].nonSsd")));
+  EXPECT_THAT(_tasks.List(), IsEmpty());
+  EXPECT_THAT(_api.Asked(), IsEmpty());
+}
+
 }  // namespace
 }  // namespace Agentd

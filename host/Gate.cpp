@@ -61,6 +61,10 @@ Ref<ScsiDisk> AdmitDisk(const std::string& place, const ScsiDisk* disk, const Kn
     return found;
   }
   const bool isLetIn = unknown == Unknown::LetIn || (unknown != Unknown::Refused && IsAbsentName(name));
+  if (!isLetIn && !known.IsThere()) {
+    throw SystemError::Exception(
+        MakeRef<SystemError>("The disks of the host could not be read: the agent has no inventory."));
+  }
   if (!isLetIn) {
     Refuse(place, "this host has no disk '" + name + "'");
   }

@@ -44,6 +44,7 @@ void CheckRemovalArguments(const RemovalArguments& arguments);
 
 // The disks of an AddDisks. One that the inventory lacks is refused, whatever flag it brings: the kernel may
 // know it, but nobody has vouched for what it is.
+// Without an inventory nobody can tell: a SystemError, here and below.
 Tessa::Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known);
 
 // Groups to be made: as AdmitDisks, but absent disks may be named too.

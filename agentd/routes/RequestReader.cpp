@@ -92,13 +92,8 @@ Ref<DiskMapping> ReadMapping(const Value& value, const std::string& path) {
 }
 
 std::string ReadLabel(const Value& value, const std::string& path) {
-  const std::string label = ReadText(value, path);
-  if (label.size() > longestLabel) {
-    Refuse(value, path, "a label of more than " + std::to_string(longestLabel) + " bytes");
-  }
-  if (!Host::IsClean(label)) {
-    Refuse(value, path, "a label has no control characters");
-  }
+  std::string label = ReadText(value, path);
+  CheckLabel(label, value.line);
   return label;
 }
 
@@ -173,6 +168,16 @@ std::string ParametersOf(const Operation& operation) {
 }
 
 }  // namespace
+
+void CheckLabel(const std::string& label, int line) {
+  if (label.size() > longestLabel) {
+    throw Orbis::ParseException("label", line,
+                                "a label of more than " + std::to_string(longestLabel) + " bytes");
+  }
+  if (!Host::IsClean(label)) {
+    throw Orbis::ParseException("label", line, "a label has no control characters");
+  }
+}
 
 ReadRequest ReadJsonRequest(const Operation& operation, std::string_view body) {
   const Value root = Orbis::Json::Parse(body, Orbis::Limits::Untrusted());

@@ -101,7 +101,11 @@ TEST_F(SoapEndpoint, AChangeIsATaskOfTheClientsLabel) {
   EXPECT_EQ(_tasks.List()[0].operation, "AddAllEligibleDisks");
   EXPECT_EQ(_tasks.List()[0].label, "rack 3");
   EXPECT_THAT(Ask("AddAllEligibleDisks", "<label>" + std::string(longestLabel + 1, 'x') + "</label>").body,
-              HasSubstr("longer than"));
+              HasSubstr("more than 256 bytes"));
+  for (const char* control : {"&#10;", "\x7f", "&#x85;"}) {
+    EXPECT_THAT(Ask("AddAllEligibleDisks", "<label>a" + std::string(control) + "b</label>").body,
+                HasSubstr("no control characters"));
+  }
 }
 
 TEST_F(SoapEndpoint, AnswersWithTheResult) {

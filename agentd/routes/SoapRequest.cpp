@@ -134,9 +134,7 @@ SoapRequest ReadSoapRequest(std::string_view body, std::string_view action) {
   CheckAction(action, row.name);
   SoapRequest read{.operation = FindOperation(row.name), .arguments = {}, .label = {}};
   row.read(message, read);
-  if (read.label.size() > longestLabel) {
-    throw Orbis::ParseException("label", 0, "longer than " + std::to_string(longestLabel) + " bytes");
-  }
+  CheckLabel(read.label);
   return read;
 }
 

@@ -24,9 +24,7 @@ void CheckName(const std::string& place, const std::string& name) {
   if (name.empty()) {
     Refuse(place, "the name of a disk is empty");
   }
-  if (name.size() > longestName) {
-    Refuse(place, "a name of more than " + std::to_string(longestName) + " bytes");
-  }
+  CheckLength(place, name);
   if (!IsClean(name)) {
     Refuse(place, "the name '" + Printable(name) + "' holds control characters or is not UTF-8");
   }
@@ -63,10 +61,15 @@ Ref<ScsiDisk> AdmitDisk(const std::string& place, const ScsiDisk* disk, const Kn
     return found;
   }
   const bool isLetIn = unknown == Unknown::LetIn || (unknown != Unknown::Refused && IsAbsentName(name));
+  if (!isLetIn && !known.IsThere()) {
+    throw SystemError::Exception(
+        MakeRef<SystemError>("The disks of the host could not be read: the agent has no inventory."));
+  }
   if (!isLetIn) {
     Refuse(place, "this host has no disk '" + name + "'");
   }
-  const auto copy = MakeRef<ScsiDisk>(*disk);
+  const auto copy = MakeRef<ScsiDisk>();  // nothing else of an unknown disk is believed
+  copy->SetCanonicalName(name);
   copy->SetSsd(disk->HasSsd() ? disk->GetSsd() : isCacheDisk);
   return copy;
 }
@@ -75,9 +78,7 @@ Ref<DiskList> AdmitList(const std::string& place, const DiskList* disks, std::si
                         const KnownDisks& known, Unknown unknown) {
   const auto admitted = MakeRef<DiskList>();
   const std::size_t count = disks == nullptr ? 0 : disks->Size();
-  if (count > most) {
-    Refuse(place, "more than " + std::to_string(most) + " disks");
-  }
+  CheckCount(place, count, most, "disks");
   admitted->Reserve(count);
   for (std::size_t i = 0; i < count; ++i) {
     admitted->Append(AdmitDisk(Indexed(place, i), (*disks)[i], known, unknown, false));
@@ -98,17 +99,13 @@ Ref<DiskMapping> AdmitMapping(const std::string& place, const DiskMapping* mappi
 }
 
 Ref<MappingList> AdmitMappings(const MappingList& mappings, const KnownDisks& known, Unknown unknown) {
-  if (mappings.Size() > mostMappings) {
-    Refuse("mappings", "more than " + std::to_string(mostMappings) + " disk groups");
-  }
+  CheckCount("mappings", mappings.Size(), mostMappings, "disk groups");
   const auto admitted = MakeRef<MappingList>();
   std::size_t disks = 0;
   for (std::size_t i = 0; i < mappings.Size(); ++i) {
     admitted->Append(AdmitMapping(Indexed("mappings", i), mappings[i], known, unknown));
     disks += 1 + (*admitted)[i]->GetNonSsd()->Size();
-    if (disks > mostNames) {
-      Refuse("mappings", "more than " + std::to_string(mostNames) + " disks");
-    }
+    CheckCount("mappings", disks, mostNames, "disks");
   }
   return admitted;
 }
@@ -165,10 +162,20 @@ std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDi
 
 }  // namespace
 
-void CheckNames(const std::string& property, const std::vector<std::string>& names) {
-  if (names.size() > mostNames) {
-    Refuse(property, "more than " + std::to_string(mostNames) + " names");
+void CheckCount(const std::string& place, std::size_t count, std::size_t most, const char* what) {
+  if (count > most) {
+    Refuse(place, "more than " + std::to_string(most) + " " + what);
   }
+}
+
+void CheckLength(const std::string& place, const std::string& name) {
+  if (name.size() > longestName) {
+    Refuse(place, "a name of more than " + std::to_string(longestName) + " bytes");
+  }
+}
+
+void CheckNames(const std::string& property, const std::vector<std::string>& names) {
+  CheckCount(property, names.size(), mostNames, "names");
   for (std::size_t i = 0; i < names.size(); ++i) {
     CheckName(Indexed(property, i), names[i]);
   }

@@ -50,6 +50,10 @@ KnownDisks::KnownDisks(Ref<StorageDeviceInfo> info) : _info(std::move(info)) {
 KnownDisks::~KnownDisks() = default;
 KnownDisks::KnownDisks(KnownDisks&&) noexcept = default;
 
+bool KnownDisks::IsThere() const noexcept {
+  return static_cast<bool>(_info);
+}
+
 Ref<ScsiDisk> KnownDisks::Find(std::string_view canonicalName) const {
   const auto at = _named.find(canonicalName);
   if (at == _named.end()) {

@@ -22,6 +22,9 @@ class KnownDisks {
   ~KnownDisks();
   KnownDisks(KnownDisks&&) noexcept;
 
+  // Whether there was an inventory at all, if only an empty one.
+  bool IsThere() const noexcept;
+
   // The inventory's disk, not to be changed; or null. It comes without what no answer shows and what may make
   // it large: durable name, alternate names and standard inquiry.
   Tessa::Ref<Nox::Host::ScsiDisk> Find(std::string_view canonicalName) const;

@@ -88,7 +88,7 @@ Answer KovaService::GetDiskGroups() const {
     return answer;
   }
   const Answer more = Guarded([&] {
-    AppendUnmounted(UnmountedGroups(*Kernel()), KnownDisks::Now(), *info);
+    AppendUnlisted(GroupsOf(*Kernel()), KnownDisks::Now(), *info);
     return Answer();
   });
   answer.fault = more.fault;  // beside the groups that could be read

@@ -44,6 +44,7 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
   try {
     SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
     const Operation& operation = *read.operation;
+    Bound(read.arguments);
     if (!operation.changes) {
       responder.Answer(Written(operation.name, operation.call(api, read.arguments)));
       return;
@@ -52,14 +53,15 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
       responder.Answer(ToSoap("", *refusal));
       return;
     }
+    const std::size_t bytes = WeightOf(read.arguments);
     tasks.Submit(
         std::string(operation.name), read.label,
         [&api, &operation, arguments = std::move(read.arguments)] { return operation.call(api, arguments); },
-        [responder](const Task& ended) { responder.Answer(Written(ended.operation, ended.answer)); });
+        [responder](const Task& ended) { responder.Answer(Written(ended.operation, ended.answer)); }, bytes);
   } catch (const Orbis::ParseException& refused) {
     responder.Answer(ToSoap(refused));
-  } catch (const Orbis::MethodFault::Exception& busy) {
-    responder.Answer(ToSoap("", {.result = nullptr, .fault = busy.GetFault()}));
+  } catch (const Orbis::MethodFault::Exception& refused) {
+    responder.Answer(ToSoap("", {.result = nullptr, .fault = refused.GetFault()}));
   }
 }
 

@@ -82,6 +82,7 @@ TEST_F(Permission, ARefusalNamesTheRoleAndCallsNothing) {
   EXPECT_THAT(answer.body, AllOf(HasSubstr(R"("@type":"NotPermitted")"), HasSubstr(R"("role":"change")"),
                                  HasSubstr("a test has the role 'read'")));
   EXPECT_THAT(Get(HttpRole::None, "/api/v1/disks").body, HasSubstr(R"("role":"read")"));
+  EXPECT_THAT(Post(HttpRole::None, "/api/v1/RemoveDisk").body, HasSubstr(R"("role":"change")"));
   EXPECT_THAT(_api.Asked(), IsEmpty());
   EXPECT_THAT(_tasks.List(), IsEmpty());
 }

@@ -3,10 +3,12 @@
 
 #include <arpa/inet.h>
 #include <netinet/in.h>
+#include <poll.h>
 #include <sys/socket.h>
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <cstring>
 #include <stdexcept>
 #include <string>
@@ -54,6 +56,12 @@ class RawClient {
       text.remove_prefix(static_cast<std::size_t>(sent));
     }
     return true;
+  }
+
+  // Whether there is something to read, or nothing more will come; waits so long for it.
+  bool HasAnswer(std::chrono::milliseconds patience) const {
+    pollfd waiting{_socket, POLLIN, 0};
+    return poll(&waiting, 1, static_cast<int>(patience.count())) > 0;
   }
 
   void EndSending() const { shutdown(_socket, SHUT_WR); }

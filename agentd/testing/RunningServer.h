@@ -48,7 +48,8 @@ class RunningServer {
   explicit RunningServer(HttpHandler handler = &Echo, const HttpLimits& limits = {})
       : _server(OnSocket(_path, limits), std::move(handler)),
         _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
-  RunningServer(const HttpOptions& options, HttpHandler handler)
+  template <class Handler>
+  RunningServer(const HttpOptions& options, Handler handler)
       : _server(options, std::move(handler)),
         _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
   explicit RunningServer(HttpDeferringHandler handler, const HttpLimits& limits = {},

@@ -54,7 +54,7 @@ void Health(const Call& call) {
 
 void GetDisks(const Call& call) {
   if (HasOnly("names", call)) {
-    call.responder.Answer(ToHttp(call.api.QueryDisksForKova(call.target.ValuesOf("names"))));
+    call.responder.Answer(ToHttp(call.api.QueryDisksWritten(call.target.ValuesOf("names"))));
   }
 }
 
@@ -83,6 +83,10 @@ void Submit(const Call& call, const std::string& operation, const ReadRequest& r
 void PostOperation(const Call& call) {
   const Operation& operation = *FindOperation(call.rest);
   ReadRequest request = ReadJsonRequest(operation, call.request.body);
+  if (operation.callWritten != nullptr) {
+    call.responder.Answer(ToHttp(operation.callWritten(call.api, request.arguments)));
+    return;
+  }
   if (!operation.changes) {
     call.responder.Answer(ToHttp(operation.call(call.api, request.arguments)));
     return;

@@ -17,7 +17,8 @@ namespace {
 constexpr std::string_view schemaFile = "nox.xsd";
 
 // An answer that cannot be written is the host's mistake, and still an answer.
-HttpAnswer Written(std::string_view operation, const Host::Answer& answer) {
+template <class Answer>
+HttpAnswer Written(std::string_view operation, const Answer& answer) {
   try {
     return ToSoap(operation, answer);
   } catch (const std::exception& mistake) {
@@ -43,6 +44,10 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
   try {
     SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
     const Operation& operation = *read.operation;
+    if (operation.callWritten != nullptr) {
+      responder.Answer(Written(operation.name, operation.callWritten(api, read.arguments)));
+      return;
+    }
     if (!operation.changes) {
       responder.Answer(Written(operation.name, operation.call(api, read.arguments)));
       return;
@@ -54,7 +59,7 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
   } catch (const Orbis::ParseException& refused) {
     responder.Answer(ToSoap(refused));
   } catch (const Orbis::MethodFault::Exception& busy) {
-    responder.Answer(ToSoap("", {.result = nullptr, .fault = busy.GetFault()}));
+    responder.Answer(ToSoap("", Host::Answer{.result = nullptr, .fault = busy.GetFault()}));
   }
 }
 

@@ -2,6 +2,7 @@
 
 #include <exception>
 #include <memory>
+#include <utility>
 
 #include "host/Gate.h"
 #include "host/HostError.h"
@@ -64,14 +65,25 @@ std::unique_ptr<HostCtl::Kova::KovaInfo> Kernel() {
 }  // namespace
 
 Answer KovaService::QueryDisksForKova(const std::vector<std::string>& names) const {
-  return Guarded([&] {
+  return Read(QueryDisksWritten(names));
+}
+
+WrittenAnswer KovaService::QueryDisksWritten(const std::vector<std::string>& names) const {
+  WrittenAnswer written;
+  const Answer rest = Guarded([&] {
     Gate::CheckNames("names", names);
-    return OrFailed(Ask([&](std::string& faultText, std::string& resultText) {
-                      std::vector<std::string> wanted = names;
-                      _hooks.queryDisksForKova(wanted, faultText, resultText);
-                    }),
-                    "The disks of the host could not be read; the agent's log says why.");
+    std::vector<std::string> wanted = names;
+    std::string faultText;
+    std::string resultText;
+    _hooks.queryDisksForKova(wanted, faultText, resultText);
+    const Answer read = ReadAnswer(faultText, "");
+    written.result = std::move(resultText);
+    return written.result.empty()
+               ? OrFailed(read, "The disks of the host could not be read; the agent's log says why.")
+               : read;
   });
+  written.fault = rest.fault;
+  return written;
 }
 
 Answer KovaService::GetStorageInfo() const {

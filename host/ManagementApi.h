@@ -35,6 +35,10 @@ class ManagementApi {
 
   // No names: every disk. The result is a list of KovaHostDiskResult.
   virtual Answer QueryDisksForKova(const std::vector<std::string>& names) const = 0;
+  // The same, with the list as the plug-in wrote it.
+  virtual WrittenAnswer QueryDisksWritten(const std::vector<std::string>& names) const {
+    return Written(QueryDisksForKova(names));
+  }
   // The mounted disk groups: a KovaHostConfigInfoStorageInfo.
   virtual Answer GetStorageInfo() const = 0;
   // The same, and behind them in `diskMapInfo` the other groups that the kernel has: those not mounted.

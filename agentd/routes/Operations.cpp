@@ -25,6 +25,10 @@ Answer QueryDisks(const ManagementApi& api, const Arguments& arguments) {
   return api.QueryDisksForKova(arguments.names);
 }
 
+Host::WrittenAnswer QueryDisksWritten(const ManagementApi& api, const Arguments& arguments) {
+  return api.QueryDisksWritten(arguments.names);
+}
+
 Answer AddDisks(const ManagementApi& api, const Arguments& arguments) {
   return api.AddDisks(*arguments.disks);
 }
@@ -49,7 +53,7 @@ const std::vector<Operation>& Operations() {
   constexpr bool query = false;
   constexpr bool change = true;
   static const std::vector<Operation> operations = {
-      {"QueryDisksForKova", query, {{"names"}}, &QueryDisks},
+      {"QueryDisksForKova", query, {{"names"}}, &QueryDisks, &QueryDisksWritten},
       {"GetStorageInfo", query, {}, &CallPlain<&Api::GetStorageInfo>},
       {"GetDiskGroups", query, {}, &CallPlain<&Api::GetDiskGroups>},
       {"GetConfigInfo", query, {}, &CallPlain<&Api::GetConfigInfo>},

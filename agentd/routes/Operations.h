@@ -32,6 +32,8 @@ struct Operation {
   bool changes = false;  // runs as a task
   std::vector<Parameter> parameters;
   Host::Answer (*call)(const Host::ManagementApi& api, const Arguments& arguments);
+  // The same with the result as the plug-in wrote it; null for most.
+  Host::WrittenAnswer (*callWritten)(const Host::ManagementApi& api, const Arguments& arguments) = nullptr;
 };
 
 // Null for an unknown name.

@@ -58,7 +58,7 @@ void Health(const Call& call) {
 
 void GetDisks(const Call& call) {
   if (HasOnly("names", call)) {
-    call.responder.Answer(ToHttp(call.api.QueryDisksForKova(call.target.ValuesOf("names"))));
+    call.responder.Answer(ToHttp(call.api.QueryDisksWritten(call.target.ValuesOf("names"))));
   }
 }
 
@@ -90,6 +90,10 @@ void PostOperation(const Call& call) {
   }
   ReadRequest request = ReadJsonRequest(operation, call.request.body);
   Bound(request.arguments);
+  if (operation.callWritten != nullptr) {
+    call.responder.Answer(ToHttp(operation.callWritten(call.api, request.arguments)));
+    return;
+  }
   if (!operation.changes) {
     call.responder.Answer(ToHttp(operation.call(call.api, request.arguments)));
     return;

@@ -18,7 +18,8 @@ namespace {
 constexpr std::string_view schemaFile = "nox.xsd";
 
 // An answer that cannot be written is the host's mistake, and still an answer.
-HttpAnswer Written(std::string_view operation, const Host::Answer& answer) {
+template <class Answer>
+HttpAnswer Written(std::string_view operation, const Answer& answer) {
   try {
     return ToSoap(operation, answer);
   } catch (const std::exception& mistake) {
@@ -45,6 +46,10 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
     SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
     const Operation& operation = *read.operation;
     Bound(read.arguments);
+    if (operation.callWritten != nullptr) {
+      responder.Answer(Written(operation.name, operation.callWritten(api, read.arguments)));
+      return;
+    }
     if (!operation.changes) {
       responder.Answer(Written(operation.name, operation.call(api, read.arguments)));
       return;
@@ -61,7 +66,7 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
   } catch (const Orbis::ParseException& refused) {
     responder.Answer(ToSoap(refused));
   } catch (const Orbis::MethodFault::Exception& refused) {
-    responder.Answer(ToSoap("", {.result = nullptr, .fault = refused.GetFault()}));
+    responder.Answer(ToSoap("", Host::Answer{.result = nullptr, .fault = refused.GetFault()}));
   }
 }
 

@@ -79,7 +79,7 @@ Ref<DiskMapping> ReadMapping(const Value& value, const std::string& path) {
     Refuse(value, path + ".ssd", "is missing");
   }
   for (const auto& [key, member] : value.members) {
-    const std::string place = path + "." + key;
+    const std::string place = path + "." + Host::Printable(key);
     if (key == "ssd") {
       mapping->SetSsd(ReadDisk(member, place));
     } else if (key == "nonSsd") {
@@ -185,7 +185,7 @@ ReadRequest ReadJsonRequest(const Operation& operation, std::string_view body) {
   ReadRequest request;
   for (const auto& [key, value] : root.members) {
     if (!Takes(operation, key)) {
-      Refuse(value, key,
+      Refuse(value, Host::Printable(key),
              "unknown parameter; " + std::string(operation.name) + " takes " + ParametersOf(operation));
     }
     const auto reader = std::find_if(readers.begin(), readers.end(),

@@ -14,6 +14,7 @@
 #include "agentd/tasks/TaskQueue.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
+#include "host/Text.h"
 #include "nox/Documents.h"
 #include "orbis/ParseException.h"
 
@@ -40,7 +41,7 @@ bool HasOnly(std::string_view known, const Call& call) {
   for (const auto& [name, value] : call.target.parameters) {
     if (name != known) {
       call.responder.Answer(PlainText(
-          400, "unknown parameter '" + name + "'" +
+          400, "unknown parameter '" + Host::Printable(name) + "'" +
                    (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'")));
       return false;
     }

@@ -1,12 +1,8 @@
 #include "host/Gate.h"
 
-#include <unordered_map>
-
 #include "host/KnownDisks.h"
 #include "host/Refusal.h"
 #include "host/Text.h"
-#include "kova/agentd/include/HostCtlException.h"
-#include "kova/agentd/include/KovaInfo.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
 
@@ -110,56 +106,6 @@ Ref<MappingList> AdmitMappings(const MappingList& mappings, const KnownDisks& kn
   return admitted;
 }
 
-using Positions = std::unordered_map<std::string, std::size_t>;
-
-// Which of the flash disks belong to groups that are not mounted, as the kernel says; and where each stands.
-Positions CacheDisksOffline(const DiskList& disks, HostCtl::Kova::KovaInfo& kernel) {
-  Positions flash;
-  std::vector<std::string> names;
-  for (std::size_t i = 0; i < disks.Size(); ++i) {
-    if (disks[i]->GetSsd() && flash.emplace(disks[i]->GetCanonicalName(), i).second) {
-      names.push_back(disks[i]->GetCanonicalName());
-    }
-  }
-  if (names.empty()) {
-    return {};  // a query without names would answer for every disk of the host
-  }
-  std::vector<HostCtl::Kova::DiskResult> records;
-  kernel.QueryDisks(names, records, true);
-  Positions offline;
-  for (const HostCtl::Kova::DiskResult& record : records) {
-    const auto at = flash.find(record.name);
-    if (record.isSsd && record.reason == HostCtl::Kova::DiskReason::GroupNotMounted && at != flash.end()) {
-      offline.insert(*at);
-    }
-  }
-  return offline;
-}
-
-// How requests name one of the kernel's disks when the inventory lacks it; empty when it does not.
-std::string NameIfMissing(const HostCtl::Kova::DiskName& disk, const KnownDisks& known) {
-  if (disk.deviceName.empty()) {
-    return AbsentName(disk.kovaUuid);
-  }
-  return known.Find(disk.deviceName) ? std::string() : disk.deviceName;
-}
-
-// The first of the group's disks that the inventory lacks; empty when all are there.
-std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDisks& known) {
-  std::string missing = NameIfMissing(group.ssd, known);
-  for (auto disk = group.capacityDisks.begin(); missing.empty() && disk != group.capacityDisks.end();
-       ++disk) {
-    missing = NameIfMissing(*disk, known);
-  }
-  return missing;
-}
-
-[[noreturn]] void RefuseBrokenGroup(const std::string& place, const std::string& ssd,
-                                    const std::string& missing) {
-  Refuse(place, "'" + ssd + "' heads a disk group that is not mounted and lacks its disk '" + missing +
-                    "'; bring that disk back, or remove it from the group first");
-}
-
 }  // namespace
 
 void CheckCount(const std::string& place, std::size_t count, std::size_t most, const char* what) {
@@ -209,27 +155,6 @@ Ref<DiskMapping> AdmitGroup(const DiskMapping& mapping, const KnownDisks& known)
 
 void RefuseChange(const std::string& error) {
   RefuseWith(error.substr(0, error.find(": ")), error);
-}
-
-void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel) {
-  try {
-    const Positions offline = CacheDisksOffline(disks, kernel);
-    if (offline.empty()) {
-      return;
-    }
-    std::vector<HostCtl::Kova::DiskMapping> groups;
-    kernel.GetDiskMappings(groups, true);
-    for (const HostCtl::Kova::DiskMapping& group : groups) {
-      const auto at = offline.find(group.ssd.deviceName);
-      const std::string missing = at == offline.end() ? std::string() : MissingMember(group, known);
-      if (!missing.empty()) {
-        RefuseBrokenGroup(Indexed("disks", at->second), at->first, missing);
-      }
-    }
-  } catch (const HostCtl::Lib::HostCtlException& failed) {
-    throw SystemError::Exception(MakeRef<SystemError>(
-        "Whether the disks belong to groups that lack a disk could not be found out: " + failed.Describe()));
-  }
 }
 
 }  // namespace Host::Gate

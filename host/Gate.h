@@ -61,6 +61,15 @@ Tessa::Ref<Nox::Kova::Host::DiskMapping> AdmitGroup(const Nox::Kova::Host::DiskM
 // kernel that cannot be asked is a SystemError, thrown as well.
 void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel);
 
+// The kernel must be able to tell about its disks before groups are made: the plug-in takes one that fails
+// for one without disks to refuse. A SystemError otherwise.
+void DemandAnswers(HostCtl::Kova::KovaInfo& kernel);
+
+// A group to be removed whose cache disk is named as one that has left: the kernel must have a group of that
+// cache disk, for it would take out any other absent disk of that name just as well. Nothing is asked about
+// other groups.
+void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::Kova::KovaInfo& kernel);
+
 // A change of a simulated host that the host would not accept; `error` begins with the path.
 [[noreturn]] void RefuseChange(const std::string& error);
 

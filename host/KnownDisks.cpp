@@ -69,9 +69,12 @@ Ref<ScsiDisk> KnownDisks::Find(std::string_view canonicalName) const {
   return entry.found;
 }
 
+bool HasAbsentPrefix(std::string_view canonicalName) {
+  return canonicalName.substr(0, absentPrefix.size()) == absentPrefix;
+}
+
 bool IsAbsentName(std::string_view canonicalName) {
-  return canonicalName.size() == absentPrefix.size() + uuidLength &&
-         canonicalName.substr(0, absentPrefix.size()) == absentPrefix;
+  return canonicalName.size() == absentPrefix.size() + uuidLength && HasAbsentPrefix(canonicalName);
 }
 
 std::string AbsentName(const std::string& kovaUuid) {

@@ -39,6 +39,8 @@ class KnownDisks {
 // A disk that has left the host but that the kernel remembers has no name any more. Requests and results
 // call it "kova:" and its KOVA UUID of 36 characters.
 bool IsAbsentName(std::string_view canonicalName);
+// Whether it begins like one; the plug-in takes that for enough.
+bool HasAbsentPrefix(std::string_view canonicalName);
 std::string AbsentName(const std::string& kovaUuid);
 
 // The object that stands for such a disk.

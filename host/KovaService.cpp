@@ -137,6 +137,7 @@ Answer KovaService::AddAllEligibleDisks() const {
 Answer KovaService::InitializeDisks(const MappingList& mappings) const {
   return Guarded([&] {
     const Kovasvc::Texts texts = ToTexts(*Gate::AdmitNewGroups(mappings, KnownDisks::Now()));
+    Gate::DemandAnswers(*Kernel());
     return Ask([&](std::string& faultText, std::string& resultText) {
       _hooks.initializeDisks(texts, RequestTag(), faultText, resultText);
     });
@@ -165,7 +166,9 @@ Answer KovaService::RemoveDisk(const std::string& disk, const RemovalArguments& 
 Answer KovaService::RemoveDiskMapping(const DiskMapping& mapping, const RemovalArguments& arguments) const {
   return Guarded([&] {
     Gate::CheckRemovalArguments(arguments);
-    const std::string text = ToText(*Gate::AdmitGroup(mapping, KnownDisks::Now()));
+    const Ref<DiskMapping> admitted = Gate::AdmitGroup(mapping, KnownDisks::Now());
+    Gate::DemandGroupIfAbsent(*admitted, *Kernel());
+    const std::string text = ToText(*admitted);
     return Ask([&](std::string& faultText, std::string&) {
       _hooks.removeDiskMapping(text, arguments.passThrough, arguments.optionText, arguments.optionFirst,
                                arguments.optionSecond, faultText);

@@ -3,6 +3,7 @@
 #include <unordered_map>
 
 #include "host/KnownDisks.h"
+#include "host/Refusal.h"
 #include "host/Text.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
@@ -13,32 +14,11 @@ namespace Host::Gate {
 
 using Nox::Host::ScsiDisk;
 using Nox::Kova::Host::DiskMapping;
-using Orbis::Fault::InvalidArgument;
 using Orbis::Fault::SystemError;
 using Tessa::MakeRef;
 using Tessa::Ref;
 
 namespace {
-
-constexpr const char* separator = ": ";
-
-// `text` begins with the property.
-[[noreturn]] void RefuseWith(const std::string& property, const std::string& text) {
-  const auto fault = MakeRef<InvalidArgument>(property);
-  const auto message = MakeRef<Orbis::LocalizableMessage>();
-  message->SetKey("nox.agentd.gate.invalidArgument");
-  message->SetMessage(text);
-  fault->GetFaultMessage()->Append(message);
-  throw InvalidArgument::Exception(fault);
-}
-
-[[noreturn]] void Refuse(const std::string& property, const std::string& reason) {
-  RefuseWith(property, property + separator + reason);
-}
-
-std::string Indexed(const std::string& list, std::size_t index) {
-  return list + "[" + std::to_string(index) + "]";
-}
 
 void CheckName(const std::string& place, const std::string& name) {
   if (name.empty()) {
@@ -61,7 +41,7 @@ void CheckOption(const std::string& property, const std::string& text) {
   }
 }
 
-// What is done with a disk that the inventory does not know and that has no ssd flag of its own.
+// What is done with a disk that the inventory does not know, whatever flag it brings.
 enum class Unknown {
   Refused,
   RefusedUnlessAbsent,  // "kova:UUID" is let in
@@ -82,8 +62,7 @@ Ref<ScsiDisk> AdmitDisk(const std::string& place, const ScsiDisk* disk, const Kn
   if (Ref<ScsiDisk> found = known.Find(name)) {
     return found;
   }
-  const bool isLetIn =
-      disk->HasSsd() || unknown == Unknown::LetIn || (unknown != Unknown::Refused && IsAbsentName(name));
+  const bool isLetIn = unknown == Unknown::LetIn || (unknown != Unknown::Refused && IsAbsentName(name));
   if (!isLetIn) {
     Refuse(place, "this host has no disk '" + name + "'");
   }
@@ -92,12 +71,12 @@ Ref<ScsiDisk> AdmitDisk(const std::string& place, const ScsiDisk* disk, const Kn
   return copy;
 }
 
-Ref<DiskList> AdmitList(const std::string& place, const DiskList* disks, const KnownDisks& known,
-                        Unknown unknown) {
+Ref<DiskList> AdmitList(const std::string& place, const DiskList* disks, std::size_t most,
+                        const KnownDisks& known, Unknown unknown) {
   const auto admitted = MakeRef<DiskList>();
   const std::size_t count = disks == nullptr ? 0 : disks->Size();
-  if (count > mostNames) {
-    Refuse(place, "more than " + std::to_string(mostNames) + " disks");
+  if (count > most) {
+    Refuse(place, "more than " + std::to_string(most) + " disks");
   }
   admitted->Reserve(count);
   for (std::size_t i = 0; i < count; ++i) {
@@ -113,7 +92,8 @@ Ref<DiskMapping> AdmitMapping(const std::string& place, const DiskMapping* mappi
   }
   const auto admitted = MakeRef<DiskMapping>();
   admitted->SetSsd(AdmitDisk(place + ".ssd", mapping->GetSsd().Get(), known, unknown, true));
-  admitted->SetNonSsd(AdmitList(place + ".nonSsd", mapping->GetNonSsd().Get(), known, unknown));
+  admitted->SetNonSsd(
+      AdmitList(place + ".nonSsd", mapping->GetNonSsd().Get(), mostDisksOfGroup, known, unknown));
   return admitted;
 }
 
@@ -205,7 +185,7 @@ void CheckRemovalArguments(const RemovalArguments& arguments) {
 }
 
 Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known) {
-  return AdmitList("disks", &disks, known, Unknown::Refused);
+  return AdmitList("disks", &disks, mostNames, known, Unknown::Refused);
 }
 
 Ref<MappingList> AdmitNewGroups(const MappingList& mappings, const KnownDisks& known) {
@@ -221,7 +201,7 @@ Ref<DiskMapping> AdmitGroup(const DiskMapping& mapping, const KnownDisks& known)
 }
 
 void RefuseChange(const std::string& error) {
-  RefuseWith(error.substr(0, error.find(separator)), error);
+  RefuseWith(error.substr(0, error.find(": ")), error);
 }
 
 void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel) {

@@ -28,6 +28,7 @@ inline constexpr std::size_t longestName = 1024;    // bytes
 inline constexpr std::size_t longestOption = 4096;  // bytes
 inline constexpr std::size_t mostNames = 100'000;   // or disks, of a whole request
 inline constexpr std::size_t mostMappings = 10'000;
+inline constexpr std::size_t mostDisksOfGroup = 1000;  // beside its cache disk
 
 // Names must be there, not too long, UTF-8 without control characters, and not too many. `property` is what
 // the client calls them.
@@ -37,7 +38,8 @@ void CheckNames(const std::string& property, const std::vector<std::string>& nam
 void CheckRemoval(const std::string& disk, const RemovalArguments& arguments);
 void CheckRemovalArguments(const RemovalArguments& arguments);
 
-// The disks of an AddDisks. One that the inventory lacks is let in only with its ssd flag.
+// The disks of an AddDisks. One that the inventory lacks is refused, whatever flag it brings: the kernel may
+// know it, but nobody has vouched for what it is.
 Tessa::Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known);
 
 // Groups to be made: as AdmitDisks, but absent disks may be named too.

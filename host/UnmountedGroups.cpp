@@ -28,9 +28,6 @@ namespace {
 // As storage info shows the disk of a mounted group.
 Ref<ScsiDisk> ShowKnown(const Ref<ScsiDisk>& found, const std::string& kovaUuid) {
   const Ref<ScsiDisk> disk = Orbis::Clone(found);
-  disk->SetDurableName(nullptr);
-  disk->SetAlternateName(nullptr);
-  disk->SetStandardInquiry(nullptr);
   const auto info = MakeRef<KovaDiskInfo>();
   info->SetKovaUuid(kovaUuid);
   disk->SetKovaDiskInfo(info);

@@ -17,6 +17,7 @@
 #include "agentd/tasks/TaskQueue.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
+#include "nox/Documents.h"
 #include "orbis/ParseException.h"
 
 namespace Agentd {
@@ -128,6 +129,12 @@ void PostHost(const Call& call) {
          [&api = call.api, change = call.request.body] { return api.ChangeHost(change); });
 }
 
+void GetDescription(const Call& call) {
+  if (HasOnly("", call)) {
+    call.responder.Answer({200, std::string(jsonType), std::string(Nox::OpenApiText())});
+  }
+}
+
 void PostSoap(const Call& call) {
   ServeSoap(call.api, call.tasks, call.request, call.responder);
 }
@@ -156,11 +163,12 @@ struct Route {
   void (*serve)(const Call& call);
 };
 
-constexpr std::array<Route, 11> routes = {{
+constexpr std::array<Route, 12> routes = {{
     {HttpRole::None, "", "/healthz", &IsNothing, &Health},
     {HttpRole::Read, "", "/api/v1/disks", &IsNothing, &GetDisks},
     {HttpRole::Read, "", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
     {HttpRole::Read, "", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
+    {HttpRole::Read, "", "/api/v1/openapi.json", &IsNothing, &GetDescription},
     {HttpRole::Read, "", "/api/v1/tasks", &IsNothing, &GetTasks},
     {HttpRole::Read, "", "/api/v1/tasks/", &IsId, &GetTask},
     {HttpRole::Read, "", "/api/v1/host", &IsNothing, &GetHost},

@@ -9,6 +9,7 @@
 //   GET  /api/v1/tasks/ID            one of them, with its result
 //   GET  /api/v1/host                the description of a simulated host
 //   POST /api/v1/host                changes it: {"set": {..}, "disk": {"name": .., ..}}
+//   GET  /api/v1/openapi.json        how all of these are described
 //   POST /soap                       the operations of the management API as SOAP 1.1 messages
 //   GET  /soap?wsdl, ?xsd=nox.xsd    how they are described
 //

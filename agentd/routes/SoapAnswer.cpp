@@ -75,9 +75,20 @@ const char* CodeOf(const MethodFault& fault) {
   return server ? "Server" : "Client";
 }
 
+// For whoever reads the fault's text alone: its first message in words, if it has one.
+std::string TextOf(const MethodFault& fault) {
+  const auto messages = fault.GetFaultMessage();
+  for (const Orbis::LocalizableMessage* message : *messages) {
+    if (message->HasMessage()) {
+      return fault.GetType().name + ": " + message->GetMessage();
+    }
+  }
+  return Orbis::FaultText(fault);
+}
+
 HttpAnswer TypedFault(const MethodFault& fault) {
   HttpAnswer http = Xml(500);
-  Orbis::AppendSoapFault(CodeOf(fault), Orbis::FaultText(fault), &fault, http.body);
+  Orbis::AppendSoapFault(CodeOf(fault), TextOf(fault), &fault, http.body);
   return http;
 }
 

@@ -164,8 +164,10 @@ TEST_F(SoapEndpoint, AResultThatIsOfAnotherTypeIsTheHostsMistake) {
 TEST_F(SoapEndpoint, AWrongParameterIsAFaultThatNamesIt) {
   const HttpAnswer answer = Ask("RemoveDisk", "<disk>naa.1</disk><optionFirst>x</optionFirst>");
   EXPECT_EQ(answer.status, 500u);
-  EXPECT_THAT(answer.body, AllOf(HasSubstr("xsi:type=\"InvalidArgument\""), HasSubstr("optionFirst"),
-                                 HasSubstr("<faultcode>soapenv:Client</faultcode>")));
+  EXPECT_THAT(answer.body,
+              AllOf(HasSubstr("xsi:type=\"InvalidArgument\""),
+                    HasSubstr("<faultstring>InvalidArgument: /Envelope/Body/RemoveDisk/optionFirst"),
+                    HasSubstr("<faultcode>soapenv:Client</faultcode>")));
   EXPECT_THAT(_api.Asked(), IsEmpty());
 }
 

@@ -8,6 +8,7 @@
 
 #include "nox/Faults.h"
 #include "otxctl/TaskScope.h"
+#include "tessa/Logger.h"
 
 namespace Agentd {
 
@@ -175,8 +176,17 @@ void TaskQueue::End(Entry& entry, Host::Answer answer) {
     ended = entry.task;
     ForgetOldest();
   }
-  if (onEnded) {
+  if (!onEnded) {
+    return;
+  }
+  try {
     onEnded(ended);
+  } catch (const std::exception& exception) {
+    // The change is what counts: whoever waits for word of it must not end the worker.
+    if (const Ref<Tessa::Service::Logger> logger = Tessa::Service::GetDefaultLogger()) {
+      LogInternal(logger, Tessa::Service::LogLevel::Warning, "Nobody could be told what became of %1: %2",
+                  ended.id, exception.what());
+    }
   }
 }
 

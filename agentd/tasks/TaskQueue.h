@@ -30,7 +30,8 @@ class TaskQueue {
  public:
   // Called on the worker. An exception is answered as a SystemError with its text.
   using Work = std::function<Host::Answer()>;
-  // Told once that the task has ended, on the worker or, for one that was never begun, in Close.
+  // Told once that the task has ended (what it throws is logged), on the worker or, for one that was never
+  // begun, in Close.
   using Listener = std::function<void(const Task&)>;
   using Clock = std::function<Orbis::DateTime()>;
 

@@ -140,6 +140,12 @@ TEST(TaskQueue, AnswersAnExceptionOfTheWorkAndGoesOn) {
   EXPECT_EQ(Await(queue, &Nothing).state, TaskState::Done);
 }
 
+TEST(TaskQueue, GoesOnAfterAListenerThatFails) {
+  TaskQueue queue;
+  queue.Submit("Op", "", &Nothing, [](const Task&) { throw std::runtime_error("cannot be told"); });
+  EXPECT_EQ(Await(queue, &Nothing).state, TaskState::Done);
+}
+
 TEST(TaskQueue, LetsAsManyWaitAsItsLimitSaysBesideTheOneThatRuns) {
   TaskQueue queue({.waiting = 2, .remembered = 10});
   Gate gate;

@@ -151,13 +151,21 @@ TEST_P(ProviderContract, RefusesPartitionedDisksWithAnExceptionOfTheirOwn) {
 
 // Whatever a group that is not mounted holds may be somebody's only copy.
 TEST_P(ProviderContract, NeverFormatsADiskOfAnUnmountedGroup) {
-  Start(AHost().WithSsd("naa.1").WithHdds({"naa.2", "naa.3"}).WithSsd("naa.4"));
+  Start(AHost()
+            .WithSsd("naa.1")
+            .WithHdds({"naa.2", "naa.3"})
+            .WithSsd("naa.4")
+            .WithSsd("naa.5")
+            .WithHdd("naa.6"));
   Format("naa.1", {"naa.2"});
+  Format("naa.5", {"naa.6"});
   Provider().UnmountDiskMapping("naa.1");
   const std::vector<RefusalRow> rows = {
       {"its cache disk with a free disk", "naa.1", {"naa.3"}, "naa.1"},
       {"its cache disk with its own member", "naa.1", {"naa.2"}, "naa.1"},
       {"its member in a new group", "naa.4", {"naa.2"}, "naa.2"},
+      {"its member in a group that is extended", "naa.5", {"naa.3", "naa.2"}, "naa.2"},
+      {"its cache disk in a group that is extended", "naa.5", {"naa.1"}, "naa.1"},
       {"its cache disk as capacity disk", "naa.4", {"naa.3", "naa.1"}, "naa.1"},
       {"its member as cache disk", "naa.2", {"naa.3"}, "naa.2"},
   };

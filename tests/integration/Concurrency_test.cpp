@@ -26,7 +26,6 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::Not;
 using testing::SizeIs;
-using testing::StartsWith;
 using Names = std::vector<std::string>;
 
 // ---- whatever comes

@@ -3,7 +3,6 @@
 #include <algorithm>
 #include <sstream>
 
-#include "otxctl/sim/KovaUuid.h"
 #include "tests/support/PlainRules.h"
 
 namespace Integration {
@@ -22,16 +21,7 @@ using Names = std::vector<std::string>;
 
 namespace {
 
-constexpr std::size_t mostCapacityDisks = 7;
 const std::string lostMark = "kova:";
-const std::string kernelWords = "(kernel)";
-
-// The kernel says no; the fault by which that is told.
-struct KernelRefusal {
-  std::string fault;
-};
-const KernelRefusal refused = {"SystemError: " + kernelWords};
-const KernelRefusal claimsOnItsOwn = {"KovaDiskFault " + kernelWords};
 
 bool Contains(const Names& names, const std::string& name) {
   return std::find(names.begin(), names.end(), name) != names.end();
@@ -339,11 +329,7 @@ Answer HostModel::RemoveGroup(const NamedGroup& group) {
     } else if (!Exists(group)) {
       answer.fault = "InvalidArgument [nox.agentd.kovaDiskOperation.diskMappingNotFound]";
     } else {
-      Enter("RemoveDiskMapping");
-      if (_host.autoMode) {
-        throw claimsOnItsOwn;
-      }
-      EraseGroup(*GroupOf(group.ssd));
+      RemoveHeadedGroup(group.ssd);
     }
   } catch (const KernelRefusal& refusal) {
     answer.fault = refusal.fault;
@@ -433,7 +419,7 @@ RandomHost HostModel::PlanningHost(const Disks& candidates) const {
     }
     mapping.allFlash = group.allFlash;
     mapping.thirdFlag = group.busy || !group.mounted;
-    (group.mounted ? planning.mounted : planning.unmounted).push_back(mapping);
+    planning.mounted.push_back(mapping);  // planners see all groups, in the kernel's order
   }
   return planning;
 }
@@ -489,215 +475,6 @@ Names HostModel::PlanNotMounted(RandomHost& planning) {
   });
   planning.kernelFails = isAsked && IsInjected("GetDiskMappings");
   return PlainRules(planning).NotMounted();
-}
-
-// ---- the kernel
-
-void HostModel::Refresh() {
-  if (_isKnown) {
-    return;
-  }
-  const bool fails = IsInjected("RefreshKovaInfo") || IsInjected("QueryDisks");
-  _records = fails ? Records() : KernelRecords();
-  _isKnown = !fails;
-}
-
-HostModel::Records HostModel::KernelRecords() const {
-  Records records;
-  for (const HostDisk& disk : _host.disks) {
-    records.push_back(RecordOf(disk));
-  }
-  return records;
-}
-
-HostCtl::Kova::DiskResult HostModel::RecordOf(const Disk& disk) const {
-  HostCtl::Kova::DiskResult record;
-  record.name = disk.absent ? "" : disk.name;
-  record.kovaUuid = disk.kovaUuid;
-  record.isSsd = disk.ssd;
-  record.isPdl = disk.absent;
-  record.capacityFlash = disk.capacityFlash;
-  const HostGroup* const group = GroupOf(disk.name);
-  record.state = DiskState::Ineligible;
-  if (group != nullptr && group->mounted) {
-    record.state = DiskState::InUse;
-  } else if (disk.absent && group == nullptr) {
-    record.reason = DiskReason::None;
-  } else if (disk.partitions > 0) {
-    record.reason = DiskReason::HasPartitions;
-  } else if (disk.transport == "usb") {
-    record.reason = DiskReason::Usb;
-  } else if (group != nullptr) {
-    record.reason = DiskReason::GroupNotMounted;
-  } else {
-    record.state = DiskState::Eligible;
-  }
-  return record;
-}
-
-bool HostModel::IsInjected(const std::string& operation) {
-  const int call = ++_calls[operation];
-  return _fault && _fault->operation == operation && _fault->call == call;
-}
-
-void HostModel::Enter(const std::string& operation) {
-  if (IsInjected(operation)) {
-    throw KernelRefusal{_fault->exception.FaultText("injected", "offender")};
-  }
-}
-
-void HostModel::Format(const NamedGroup& named) {
-  Enter("FormatDiskMapping");
-  HostGroup* const headed = GroupOf(named.ssd);
-  Names members = named.capacity;
-  members.insert(members.begin(), named.ssd);
-  for (const std::string& name : members) {
-    const HostDisk* const disk = FindPresent(name);
-    const HostGroup* const group = GroupOf(name);
-    const bool extends = name == named.ssd && group != nullptr && group->ssd == name && group->mounted;
-    if (disk == nullptr || (group != nullptr && !extends)) {
-      throw refused;
-    }
-    if (disk->partitions > 0) {
-      throw KernelRefusal{"DiskHasPartitions " + name};
-    }
-  }
-  if ((headed == nullptr ? 0 : headed->capacity.size()) + named.capacity.size() > mostCapacityDisks) {
-    throw refused;
-  }
-  HostGroup group = headed == nullptr ? HostGroup() : *headed;
-  if (headed == nullptr) {
-    group.ssd = named.ssd;
-    group.allFlash =
-        std::all_of(named.capacity.begin(), named.capacity.end(),
-                    [this](const std::string& name) { return Find(name)->ssd || Find(name)->capacityFlash; });
-  } else {
-    members.erase(members.begin());
-  }
-  group.capacity.insert(group.capacity.end(), named.capacity.begin(), named.capacity.end());
-  for (const std::string& name : members) {
-    Find(name)->kovaUuid = OtxCtl::Sim::KovaUuidOf(_host.name, name);
-    Find(name)->formatVersion = group.formatVersion;
-  }
-  if (headed == nullptr) {
-    _host.groups.push_back(group);
-  } else {
-    *headed = group;
-  }
-}
-
-void HostModel::Restamp(const std::string& ssd) {
-  Enter("RestampDiskMapping");
-  if (FindPresent(ssd) == nullptr || GroupOf(ssd) == nullptr || GroupOf(ssd)->ssd != ssd) {
-    throw refused;
-  }
-}
-
-void HostModel::Mount(const std::string& ssd) {
-  Enter("MountDiskMapping");
-  GroupOf(ssd)->mounted = true;
-}
-
-void HostModel::RestampByUuid(const std::string& uuid) {
-  Enter("RestampDiskMappingByUuid");
-  for (const HostGroup& group : _host.groups) {
-    if (!uuid.empty() && Find(group.ssd)->kovaUuid == uuid) {
-      return;
-    }
-  }
-  throw refused;
-}
-
-void HostModel::TakeOut(const std::string& disk) {
-  Enter("RemoveDisk");
-  if (_host.autoMode) {
-    throw claimsOnItsOwn;
-  }
-  if (FindPresent(disk) == nullptr || GroupOf(disk) == nullptr) {
-    throw refused;
-  }
-  TakeOutMember(*Find(disk), disk);
-}
-
-void HostModel::TakeOutByUuid(const std::string& uuid) {
-  Enter("RemoveDiskByUuid");
-  for (HostDisk& disk : _host.disks) {
-    if (disk.absent && !uuid.empty() && disk.kovaUuid == uuid) {
-      return TakeOutMember(disk, uuid);
-    }
-  }
-  throw refused;
-}
-
-void HostModel::TakeOutMember(Disk& disk, const std::string& named) {
-  HostGroup* const group = GroupOf(disk.name);
-  if (group != nullptr && group->ssd == disk.name) {
-    return EraseGroup(*group);
-  }
-  if (group != nullptr) {
-    if (group->capacity.size() == 1) {
-      throw KernelRefusal{"DiskIsLastRemainingNonSSD " + named};
-    }
-    std::erase(group->capacity, disk.name);
-  }
-  disk.kovaUuid.clear();
-  disk.formatVersion = 0;
-}
-
-void HostModel::EraseGroup(Group& group) {
-  Names members = group.capacity;
-  members.push_back(group.ssd);
-  for (const std::string& name : members) {
-    Find(name)->kovaUuid.clear();
-    Find(name)->formatVersion = 0;
-  }
-  std::erase_if(_host.groups, [&](const HostGroup& one) { return one.ssd == members.back(); });
-}
-
-// Among the mounted groups, as requests name their disks. A group without its cache disk is never found.
-bool HostModel::Exists(const NamedGroup& named) {
-  if (named.capacity.empty() || IsInjected("GetDiskMappings")) {
-    return false;
-  }
-  return std::any_of(_host.groups.begin(), _host.groups.end(), [&](const HostGroup& group) {
-    return group.mounted && !Find(group.ssd)->absent && group.ssd == named.ssd &&
-           group.capacity.size() == named.capacity.size() &&
-           std::all_of(group.capacity.begin(), group.capacity.end(),
-                       [&](const std::string& disk) { return Contains(named.capacity, RequestName(disk)); });
-  });
-}
-
-// ---- looking up
-
-HostDisk* HostModel::Find(const std::string& name) {
-  return const_cast<HostDisk*>(std::as_const(*this).Find(name));
-}
-const HostDisk* HostModel::Find(const std::string& name) const {
-  for (const HostDisk& disk : _host.disks) {
-    if (disk.name == name) {
-      return &disk;
-    }
-  }
-  return nullptr;
-}
-HostDisk* HostModel::FindPresent(const std::string& name) {
-  HostDisk* const disk = Find(name);
-  return disk != nullptr && !disk->absent ? disk : nullptr;
-}
-bool HostModel::IsListed(const std::string& name) const {
-  const HostDisk* const disk = Find(name);
-  return disk != nullptr && disk->inInventory && !disk->absent;
-}
-HostGroup* HostModel::GroupOf(const std::string& disk) {
-  return const_cast<HostGroup*>(std::as_const(*this).GroupOf(disk));
-}
-const HostGroup* HostModel::GroupOf(const std::string& disk) const {
-  for (const HostGroup& group : _host.groups) {
-    if (group.ssd == disk || Contains(group.capacity, disk)) {
-      return &group;
-    }
-  }
-  return nullptr;
 }
 
 }  // namespace Integration

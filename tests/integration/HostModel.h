@@ -28,6 +28,14 @@ struct InjectedFault {
   KernelException exception = kernelExceptions[0];
 };
 
+// What stands for the kernel's own words.
+inline constexpr const char* kernelWords = "(kernel)";
+
+// The kernel says no; the fault by which that is told.
+struct KernelRefusal {
+  std::string fault;
+};
+
 // An answer in which the kernel's own words are left out.
 Answer WithoutTheKernelsWords(Answer answer);
 
@@ -81,6 +89,7 @@ class HostModel {
   HostCtl::Kova::DiskResult RecordOf(const Disk& disk) const;
 
   // The kernel's calls. Throw KernelRefusal.
+  void RemoveHeadedGroup(const std::string& ssd);
   bool IsInjected(const std::string& operation);
   void Enter(const std::string& operation);
   void Format(const NamedGroup& group);

@@ -22,7 +22,6 @@
 namespace Integration {
 namespace {
 
-using OtxCtl::Fault::FaultRule;
 using OtxCtl::Sim::AHost;
 using OtxCtl::Sim::HostDescription;
 using OtxCtl::Sim::HostGroup;
@@ -483,7 +482,7 @@ class KernelFailures : public testing::TestWithParam<Scenario> {
     EXPECT_EQ(_injected, 1) << "the call was not made";
     plugin.Calls().ClearFaults();
     // On the host as it was, the same request now does all it can. Nobody tells the plug-in of the way back.
-    plugin.Host().Change([this](HostDescription& host) { host = GetParam().host; });
+    plugin.Host().Change([](HostDescription& host) { host = GetParam().host; });
     ExpectForecast(plugin, {});
   }
 
@@ -522,7 +521,7 @@ TEST_P(KernelFailures, AreSurvivedOneAfterTheOtherOnOneHost) {
     plugin.Calls().Inject({operation, 0, "KovaStorageException", "injected", "offender", 0});
     plugin.Run(GetParam().request);
     plugin.Calls().ClearFaults();
-    plugin.Host().Change([this](HostDescription& host) { host = GetParam().host; });
+    plugin.Host().Change([](HostDescription& host) { host = GetParam().host; });
     EXPECT_THAT(plugin.Locks().HeldHere(), IsEmpty()) << operation;
   }
   plugin.Log().Clear();

@@ -31,6 +31,7 @@ using OtxCtl::Sim::HostBuilder;
 using OtxCtl::Sim::HostDescription;
 using OtxCtl::Sim::HostDisk;
 using OtxCtl::Sim::HostGroup;
+using OtxCtl::Sim::HostVerdict;
 using Names = std::vector<std::string>;
 
 constexpr int requestsOfASequence = 25;
@@ -158,10 +159,15 @@ HostDescription SequenceDraw::Host() {
     const bool ssd = Chance(3);
     const bool tagged = Chance(4) && (ssd || Chance(6));
     const bool usb = Chance(20);
+    // Eligible, but too small; eligible, but of an unmounted group; ineligible for no reason; in use by
+    // nobody.
+    constexpr std::array<HostVerdict, 4> odd = {{{1, 5}, {1, 6}, {2, 0}, {0, 0}}};
+    const bool isOdd = Chance(20);
     host.WithDisk(name, ssd, [&](HostDisk& disk) {
       disk.capacityFlash = tagged;
       disk.partitions = Chance(15) ? 1 : 0;
       disk.transport = usb ? std::optional<std::string>("usb") : std::nullopt;
+      disk.verdict = isOdd ? std::optional<HostVerdict>(Pick(odd)) : std::nullopt;
     });
     (ssd && !tagged ? ssds : others).push_back(name);
   }
@@ -502,31 +508,61 @@ bool Fails(const Sequence& sequence) {
   return !RunSequence(sequence, dropped).empty();
 }
 
-// Takes steps away, and what else is beside their requests, as long as the sequence still fails.
-Sequence Shortest(Sequence sequence) {
-  const auto keepIfFails = [&](const Sequence& smaller) {
-    const bool fails = Fails(smaller);
-    if (fails) {
-      sequence = smaller;
-    }
-    return fails;
-  };
-  bool shorter = true;
-  while (shorter) {
-    shorter = false;
-    for (std::size_t index = sequence.steps.size(); index-- > 0;) {
-      Sequence smaller = sequence;
-      smaller.steps.erase(smaller.steps.begin() + static_cast<std::ptrdiff_t>(index));
-      shorter = keepIfFails(smaller) || shorter;
-    }
-    for (std::size_t index = sequence.steps.size(); index-- > 0;) {
-      Sequence smaller = sequence;
-      smaller.steps[index].fault.reset();
-      shorter = (sequence.steps[index].fault && keepIfFails(smaller)) || shorter;
+// Takes steps away, and then parts of those that are left, as long as the sequence still fails.
+class Shortener {
+ public:
+  explicit Shortener(Sequence sequence) : _sequence(std::move(sequence)) {}
+
+  Sequence Shortest() {
+    do {
+      _isShorter = false;
+      TryWithoutEach([](Sequence & sequence) -> auto& { return sequence.steps; });
+      for (std::size_t index = 0; index < _sequence.steps.size(); ++index) {
+        TryWithoutEach([index](Sequence & sequence) -> auto& { return sequence.steps[index].request.disks; });
+        TryWithoutEach([index](Sequence & sequence) -> auto& {
+          return sequence.steps[index].request.groups;
+        });
+        Try([index](Sequence& sequence) { return Reset(sequence.steps[index].change); });
+        Try([index](Sequence& sequence) { return Reset(sequence.steps[index].fault); });
+      }
+    } while (_isShorter);
+    return _sequence;
+  }
+
+ private:
+  template <class Part>
+  static bool Reset(std::optional<Part>& part) {
+    const bool isThere = part.has_value();
+    part.reset();
+    return isThere;
+  }
+  // `cut` makes a sequence smaller, or says that it cannot.
+  template <class Cut>
+  void Try(Cut cut) {
+    Sequence smaller = _sequence;
+    if (cut(smaller) && Fails(smaller)) {
+      _sequence = std::move(smaller);
+      _isShorter = true;
     }
   }
-  return sequence;
-}
+  // One element stays: some requests need it.
+  template <class ListOf>
+  void TryWithoutEach(ListOf listOf) {
+    for (std::size_t index = listOf(_sequence).size(); index-- > 0;) {
+      Try([&](Sequence& sequence) {
+        auto& list = listOf(sequence);
+        if (list.size() == 1) {
+          return false;
+        }
+        list.erase(list.begin() + static_cast<std::ptrdiff_t>(index));
+        return true;
+      });
+    }
+  }
+
+  Sequence _sequence;
+  bool _isShorter = false;
+};
 
 Sequence DrawSequence(unsigned seed) {
   SequenceDraw draw(seed);
@@ -549,7 +585,7 @@ unsigned long FromEnvironment(const char* name, unsigned long otherwise) {
 }
 
 void Report(const Sequence& sequence, unsigned seed) {
-  const Sequence shortest = Shortest(sequence);
+  const Sequence shortest = Shortener(sequence).Shortest();
   std::ostringstream text;
   for (std::size_t index = 0; index < shortest.steps.size(); ++index) {
     text << index + 1 << ". " << shortest.steps[index] << "\n";

@@ -7,7 +7,7 @@
 
 #include <gmock/gmock.h>
 
-#include <functional>
+#include <algorithm>
 #include <string>
 #include <vector>
 
@@ -103,6 +103,15 @@ class OperationFixture : public PluginFixture {
       }
     }
     return texts;
+  }
+  // The events of the timeline from the first one that is this, or the last so many.
+  std::vector<std::string> EventsFrom(const std::string& first) const {
+    const std::vector<std::string> events = _timeline.Events();
+    return {std::find(events.begin(), events.end(), first), events.end()};
+  }
+  std::vector<std::string> LastEvents(std::size_t count) const {
+    const std::vector<std::string> events = _timeline.Events();
+    return {events.end() - static_cast<std::ptrdiff_t>(std::min(count, events.size())), events.end()};
   }
   // Whether the next refresh leaves the kernel alone.
   bool IsCacheValid() {

@@ -2,6 +2,7 @@
 
 import os
 
+import emit_openapi
 import emit_xsd
 from schema import Field, Type
 
@@ -307,6 +308,7 @@ def documents_header(origin):
         "// The service as clients of other makes need it described. Texts that live for ever; threads: any.",
         "TESSA_API std::string_view WsdlText() noexcept;",
         "TESSA_API std::string_view XsdText() noexcept;",
+        "TESSA_API std::string_view OpenApiText() noexcept;",
         "",
         "}  // namespace Nox",
     ]
@@ -314,7 +316,8 @@ def documents_header(origin):
 
 def documents_source(schema, origin):
     lines = [BANNER.format(origin=origin), '#include "nox/Documents.h"', "", "namespace Nox {"]
-    for name, document in (("Wsdl", emit_xsd.wsdl(schema)), ("Xsd", emit_xsd.xsd(schema))):
+    for name, document in (("Wsdl", emit_xsd.wsdl(schema)), ("Xsd", emit_xsd.xsd(schema)),
+                           ("OpenApi", emit_openapi.openapi(schema))):
         lines += ["", f"std::string_view {name}Text() noexcept {{", '  return R"document(' + document[0]]
         lines += document[1:] + [')document";', "}"]
     return lines + ["", "}  // namespace Nox"]

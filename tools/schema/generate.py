@@ -4,6 +4,7 @@
     generate.py cpp  MODULE OUT_DIR SCHEMA...    C++ types of the last schema
     generate.py xsd  OUT_FILE SCHEMA...          XML Schema of all types
     generate.py wsdl OUT_FILE SCHEMA...          the service: messages, port type, binding
+    generate.py openapi OUT_FILE SCHEMA...       the JSON API, OpenAPI 3.1
     generate.py page OUT_FILE SCHEMA...          reference page, Markdown
 
 Later schemas build on earlier ones.
@@ -12,13 +13,15 @@ Later schemas build on earlier ones.
 import sys
 
 import emit_cpp
+import emit_openapi
 import emit_page
 import emit_xsd
 import schema as schema_language
 
 
 def main(arguments):
-    kinds = {"xsd": emit_xsd.xsd, "wsdl": emit_xsd.wsdl, "page": emit_page.page}
+    kinds = {"xsd": emit_xsd.xsd, "wsdl": emit_xsd.wsdl, "openapi": emit_openapi.openapi,
+             "page": emit_page.page}
     if len(arguments) >= 4 and arguments[0] == "cpp":
         module, out_dir, paths = arguments[1], arguments[2], arguments[3:]
         emit_cpp.emit(schema_language.read(paths), paths[-1], module, out_dir)

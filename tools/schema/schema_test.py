@@ -1,6 +1,7 @@
 #!/usr/bin/env python3
 """Tests of the schema language and of what is generated from it."""
 
+import json
 import os
 import pathlib
 import re
@@ -17,6 +18,7 @@ API = ROOT / "nox/schema/nox.schema"
 
 sys.path.insert(0, str(HERE))
 sys.dont_write_bytecode = True
+import emit_openapi  # noqa: E402
 import emit_page  # noqa: E402
 import emit_xsd  # noqa: E402
 import schema as schema_language  # noqa: E402
@@ -268,6 +270,23 @@ class Documents(unittest.TestCase):
         self.assertEqual(headings, {n.lower() for n in self.schema.types} | {o.name.lower() for o in self.schema.operations})
         for link in re.findall(r"\]\(#([^)]*)\)", page):
             self.assertIn(link, headings)
+
+    def test_the_json_description_has_every_operation_and_refers_to_what_it_defines(self):
+        document = json.loads("\n".join(emit_openapi.openapi(self.schema)))
+        for operation in self.schema.operations:
+            body = document["paths"]["/api/v1/" + operation.name]["post"]["requestBody"]
+            properties = body["content"]["application/json"]["schema"]["properties"]
+            self.assertTrue({f.name for f in operation.parameters} <= set(properties), operation.name)
+        defined = document["components"]["schemas"]
+        references = re.findall(r'"#/components/schemas/([^"]*)"', json.dumps(document))
+        self.assertEqual(set(references) - set(defined), set())
+        self.assertEqual({n for n, t in self.schema.types.items() if not t.abstract} - set(defined), set())
+
+    def test_the_json_description_names_the_kinds_of_a_type_where_it_is_declared(self):
+        document = json.loads("\n".join(emit_openapi.openapi(self.schema)))
+        kinds = document["components"]["schemas"]["AnyMethodFault"]["oneOf"]
+        names = {kind["$ref"].rsplit("/", 1)[1] for kind in kinds}
+        self.assertEqual(names, {n for n, t in self.schema.types.items() if t.fault and not t.abstract})
 
 
 if __name__ == "__main__":

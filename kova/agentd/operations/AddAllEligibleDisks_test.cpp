@@ -18,7 +18,6 @@ namespace Kovasvc {
 namespace {
 
 using HostCtl::Kova::DiskReason;
-using HostCtl::Kova::DiskResult;
 using HostCtl::Lib::HostCtlException;
 using Nox::Fault::KovaFault;
 using Orbis::Fault::SystemError;
@@ -109,10 +108,8 @@ TEST_F(AddAllEligibleDisks, AsksUnderBothLocksAndPlansUnderNone) {
 TEST_F(AddAllEligibleDisks, SaysDoneAndThenForgetsTheCache) {
   LogIntoTimeline();
   AddAll();
-  const std::vector<std::string> events = _timeline.Events();
-  EXPECT_THAT(
-      std::vector<std::string>(events.end() - 4, events.end()),
-      ElementsAre("log verbose: DONE", takeCache, releaseCache, std::string("log verbose: ") + noFaultLine));
+  EXPECT_THAT(LastEvents(4), ElementsAre("log verbose: DONE", takeCache, releaseCache,
+                                         std::string("log verbose: ") + noFaultLine));
 }
 
 TEST_F(AddAllEligibleDisks, SaysWhatItFoundAndPlanned) {

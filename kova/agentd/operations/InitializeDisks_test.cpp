@@ -15,15 +15,14 @@
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 #include "orbis/ParseException.h"
-#include "tests/support/OperationFixture.h"
+#include "tests/support/InitializeFixture.h"
+#include "tests/support/KernelRefusals.h"
 #include "tests/support/SpyManager.h"
 
 namespace Kovasvc {
 namespace {
 
 using HostCtl::Kova::DiskReason;
-using HostCtl::Kova::DiskResult;
-using HostCtl::Kova::DiskState;
 using HostCtl::Lib::HostCtlException;
 using HostCtl::Lib::KovaExceptionHasPartition;
 using HostCtl::Lib::KovaStorageException;
@@ -56,6 +55,7 @@ using TestSupport::Hdd;
 using TestSupport::IsExactly;
 using TestSupport::IsSystemError;
 using TestSupport::KernelCall;
+using TestSupport::KernelRefusal;
 using TestSupport::LogLineIs;
 using TestSupport::Mappings;
 using TestSupport::NamesDevice;
@@ -79,42 +79,7 @@ SystemError::Exception AFault(const std::string& reason) {
   return SystemError::Exception(MakeRef<SystemError>(reason));
 }
 
-// Three groups could be made: of s1 and a, s2 and b, s3 and c.
-class InitializeDisks : public TestSupport::OperationFixture {
- protected:
-  InitializeDisks() {
-    SetHost({Ssd("s1"), Ssd("s2"), Ssd("s3"), Hdd("a"), Hdd("b"), Hdd("c")},
-            {ARecord("s1").Ssd(), ARecord("s2").Ssd(), ARecord("s3").Ssd(), ARecord("a"), ARecord("b"),
-             ARecord("c")});
-  }
-
-  void Initialize(const std::vector<Ref<DiskMapping>>& mappings) { InitializeTexts(SoapTexts(mappings)); }
-  void InitializeTexts(const std::vector<std::string>& texts) {
-    _manager->InitializeDisks(texts, "tag", _faultText, _resultText);
-  }
-  void InitializeAll() { Initialize({_first, _second, _third}); }
-  // What the kernel says of one disk from now on.
-  void SetRecord(const DiskResult& record) {
-    for (DiskResult& known : _kernel.records) {
-      if (known.name == record.name) {
-        known = record;
-      }
-    }
-  }
-  // The format of the group of that SSD does this.
-  void WhenFormatting(const std::string& ssd, const std::function<void()>& does) {
-    _kernel.onCall = [ssd, does](const KernelCall& call) {
-      if (call.text.starts_with("FormatDiskMapping(" + ssd + ",")) {
-        does();
-      }
-    };
-  }
-  std::vector<std::string> Formats() const { return Calls("FormatDiskMapping"); }
-
-  const Ref<DiskMapping> _first = AMapping(Ssd("s1"), {Hdd("a")});
-  const Ref<DiskMapping> _second = AMapping(Ssd("s2"), {Hdd("b")});
-  const Ref<DiskMapping> _third = AMapping(Ssd("s3"), {Hdd("c")});
-};
+using InitializeDisks = TestSupport::InitializeFixture;
 using InitializeDisksDeathTest = InitializeDisks;
 
 // ---- the steps
@@ -149,14 +114,12 @@ TEST_F(InitializeDisks, SaysWhatItDoes) {
 TEST_F(InitializeDisks, FormatsUnderTheOperationLockAloneAndLogsOutsideOfIt) {
   LogIntoTimeline();
   Initialize({_first});
-  const std::vector<std::string> events = _timeline.Events();
-  const auto begin =
-      std::find(events.begin(), events.end(), std::string("log verbose: Formatting KOVA disks"));
-  ASSERT_GE(events.end() - begin, 5);
-  EXPECT_THAT(std::vector<std::string>(begin, begin + 5),
-              ElementsAre("log verbose: Formatting KOVA disks", takeOperation,
-                          "FormatDiskMapping(s1, [a], {tag, 1, 0})", releaseOperation,
-                          "log verbose: Done formatting KOVA disks"));
+  std::vector<std::string> events = EventsFrom("log verbose: Formatting KOVA disks");
+  ASSERT_GE(events.size(), 5U);
+  events.resize(5);
+  EXPECT_THAT(events, ElementsAre("log verbose: Formatting KOVA disks", takeOperation,
+                                  "FormatDiskMapping(s1, [a], {tag, 1, 0})", releaseOperation,
+                                  "log verbose: Done formatting KOVA disks"));
 }
 
 TEST_F(InitializeDisks, HoldsTheOperationLockAtEveryCallOfTheKernelAndTheCacheLockAtRefreshes) {
@@ -303,40 +266,9 @@ TEST_F(InitializeDisks, WarnsOfAnInvalidGroupFromLevelWarningOn) {
 
 // ---- a kernel that refuses
 
-struct Refusal {
-  const char* name;
-  std::function<void(TestSupport::FakeKernel&, const std::string& operation)> fail;
-  testing::Matcher<const Ref<Orbis::MethodFault>&> fault;
-};
-void PrintTo(const Refusal& refusal, std::ostream* out) {
-  *out << refusal.name;
-}
-template <class Exception>
-Refusal ARefusal(const char* name, const Exception& exception,
-                 testing::Matcher<const Ref<Orbis::MethodFault>&> fault) {
-  return {name, [exception](auto& kernel, const auto& operation) { kernel.Fail(operation, exception); },
-          fault};
-}
-// The kernel's exceptions, each with the fault that it is told by.
-const Refusal refusals[] = {
-    ARefusal("HostCtlException", HostCtlException("no"), IsSystemError("no")),
-    ARefusal("KovaStorageException", KovaStorageException("no", "a"), IsSystemError("no")),
-    ARefusal("HasPartition", KovaExceptionHasPartition("no", "a"), NamesDevice("DiskHasPartitions", "a")),
-    ARefusal("LastRemainingHDD", HostCtl::Lib::KovaExceptionLastRemainingHDD("no", "a"),
-             NamesDevice("DiskIsLastRemainingNonSSD", "a")),
-    ARefusal("RescanError", HostCtl::Lib::KovaExceptionRescanError("no", "a"),
-             NamesDevice("KovaDiskFault", "no")),
-    ARefusal("RemoveMappingAutoMode", HostCtl::Lib::KovaExceptionRemoveMappingAutoModeEnabled("no", "a"),
-             NamesDevice("KovaDiskFault", "no")),
-    ARefusal("RemoveDiskAutoMode", HostCtl::Lib::KovaExceptionRemoveDiskAutoModeEnabled("no", "a"),
-             NamesDevice("KovaDiskFault", "no")),
-    ARefusal("IncompatibleDiskMapping", HostCtl::Lib::KovaExceptionIncompatibleDiskMapping("no"),
-             IsSystemError("no")),
-};
+class InitializeDisksRefused : public InitializeDisks, public testing::WithParamInterface<KernelRefusal> {};
 
-class InitializeDisksRefused : public InitializeDisks, public testing::WithParamInterface<Refusal> {};
-
-INSTANTIATE_TEST_SUITE_P(Kernel, InitializeDisksRefused, testing::ValuesIn(refusals),
+INSTANTIATE_TEST_SUITE_P(Kernel, InitializeDisksRefused, testing::ValuesIn(TestSupport::KernelRefusals()),
                          [](const auto& test) { return std::string(test.param.name); });
 
 TEST_P(InitializeDisksRefused, TellsItInTheGroupsResultAndStillCollectsItsDisks) {
@@ -365,10 +297,7 @@ TEST_P(InitializeDisksRefused, TellsARefusedRestampLikewise) {
 TEST_F(InitializeDisks, InvalidatesTheCacheAfterARefusedFormatBeforeItCollects) {
   _kernel.Fail("FormatDiskMapping", KovaStorageException("no", "a"));
   Initialize({_first});
-  const std::vector<std::string> events = _timeline.Events();
-  const auto format =
-      std::find(events.begin(), events.end(), std::string("FormatDiskMapping(s1, [a], {tag, 1, 0})"));
-  EXPECT_THAT(std::vector<std::string>(format, events.end()),
+  EXPECT_THAT(EventsFrom("FormatDiskMapping(s1, [a], {tag, 1, 0})"),
               ElementsAre("FormatDiskMapping(s1, [a], {tag, 1, 0})", releaseOperation, takeCache,
                           releaseCache, takeOperation, takeCache, "RefreshKovaInfo()", "QueryDisks([], true)",
                           "GetStorageDeviceInfo", releaseCache, releaseOperation, takeCache, releaseCache));
@@ -399,64 +328,6 @@ TEST_F(InitializeDisks, FoldsSeveralFaultsIntoOneWithAllTheirMessages) {
   ASSERT_THAT(Fault(), IsExactly<KovaFault>());
   EXPECT_THAT(TestSupport::MessageKeys(*Fault()), ElementsAre("s1.1", "s1.2", "s3.1", "s3.2"));
   EXPECT_THAT(ResultTexts(), ElementsAre("s1: a !DiskHasPartitions", "s2: b", "s3: c !DiskHasPartitions"));
-}
-
-// ---- groups that are there but off-line
-
-struct OfflineCase {
-  const char* name;
-  std::string ssd;
-  std::vector<DiskResult> records;
-  bool restamped;
-};
-void PrintTo(const OfflineCase& row, std::ostream* out) {
-  *out << row.name;
-}
-
-class InitializeGroup : public InitializeDisks, public testing::WithParamInterface<OfflineCase> {};
-
-const DiskReason offline = DiskReason::GroupNotMounted;
-INSTANTIATE_TEST_SUITE_P(
-    Offline, InitializeGroup,
-    testing::Values(
-        OfflineCase{"KnownAsOffline", "s1", {ARecord("s1").Ssd().Ineligible(offline)}, true},
-        OfflineCase{"KnownAsOfflineWhateverTheState", "s1", {ARecord("s1").Ssd().Reason(offline)}, true},
-        OfflineCase{"KnownAsOfflineWhateverTheKind", "s1", {ARecord("s1").Ineligible(offline)}, true},
-        OfflineCase{"LostDevice", "kova:" + uuid, {}, true},
-        OfflineCase{"LostDeviceThatTheKernelCallsEligible", "kova:x", {ARecord("kova:x")}, true},
-        OfflineCase{"TwoRecords",
-                    "s1",
-                    {ARecord("s1").Ssd().Ineligible(offline), ARecord("s1").Ssd().Ineligible(offline)},
-                    false},
-        OfflineCase{"NoRecord", "s1", {}, false}, OfflineCase{"Eligible", "s1", {ARecord("s1").Ssd()}, false},
-        OfflineCase{
-            "EligibleWithAnotherReason", "s1", {ARecord("s1").Ssd().Reason(DiskReason::TooSmall)}, false},
-        OfflineCase{"InUse", "s1", {ARecord("s1").Ssd().InUse(uuid)}, false},
-        OfflineCase{
-            "ItsCapacityDiskIsOffline", "s1", {ARecord("s1").Ssd(), ARecord("a").Ineligible(offline)}, false},
-        OfflineCase{"NameLikeALostDevices", "KOVA:x", {}, false},
-        OfflineCase{"NameWithTheMarkInside", "xkova:", {}, false}),
-    [](const auto& test) { return std::string(test.param.name); });
-
-TEST_P(InitializeGroup, IsRestampedOrFormatted) {
-  const OfflineCase& row = GetParam();
-  _kernel.records = row.records;
-  const auto spy = UseManager<SpyManager>();
-  Initialize({AMapping(Ssd(row.ssd), {Hdd("b"), Hdd("a")})});
-  EXPECT_THAT(spy->calls,
-              Contains("RestampDiskMapping(" + row.ssd + ", [b, a])").Times(row.restamped ? 1 : 0));
-  EXPECT_THAT(spy->calls,
-              Contains("FormatDiskMapping(" + row.ssd + ", [b, a], tag, 1, 0)").Times(row.restamped ? 0 : 1));
-  EXPECT_EQ(Formats().empty(), row.restamped);
-  EXPECT_FALSE(HasFault());
-}
-
-TEST_F(InitializeDisks, LooksUpTheSsdInWhatTheLastGroupLeftInTheCache) {
-  WhenFormatting("s1", [this] { SetRecord(ARecord("s2").Ssd().Ineligible(offline)); });
-  Initialize({_first, _second});
-  EXPECT_THAT(Formats(), ElementsAre("FormatDiskMapping(s1, [a], {tag, 2, 0})"));
-  EXPECT_THAT(Calls("RestampDiskMapping"), ElementsAre("RestampDiskMapping(s2, [b])"));
-  EXPECT_THAT(Calls("MountDiskMapping"), ElementsAre("MountDiskMapping(s2, false)"));
 }
 
 // ---- a run that is stopped by a fault
@@ -677,98 +548,6 @@ TEST_F(InitializeDisksCore, KeepsTheResultObjectThatAnOperationPutInPlace) {
   Run({_first});
   EXPECT_EQ(Filled()[0], other.Get());
   EXPECT_EQ(_fault, other->GetError()) << "a single fault is shared";
-}
-
-// ---- one group
-
-class InitializeOneGroup : public InitializeDisks {
- protected:
-  InitializeOneGroup() { _manager->RefreshKovaDiskCache(); }
-
-  void Run(const Ref<DiskMapping>& mapping) {
-    Forget();
-    _manager->InitializeMapping(mapping, "tag", 5, 4, _result);
-  }
-
-  Ref<DiskMapResult> _result = MakeRef<DiskMapResult>();
-};
-
-TEST_F(InitializeOneGroup, FillsTheResultItIsGiven) {
-  const Ref<DiskMapResult> given = _result;
-  Run(_first);
-  EXPECT_EQ(_result, given);
-  EXPECT_EQ(_result->GetMapping(), _first);
-  EXPECT_FALSE(_result->GetError());
-  EXPECT_THAT(DiskStates(*_result), ElementsAre("s1 eligible", "a eligible"));
-  EXPECT_THAT(Formats(), ElementsAre("FormatDiskMapping(s1, [a], {tag, 5, 4})"));
-}
-
-TEST_F(InitializeOneGroup, LeavesTheDisksOfTheCheckWhenTheCheckFails) {
-  SetRecord(ARecord("a").Ineligible(DiskReason::TooSmall));
-  _manager->InvalidateKovaDiskCache();
-  _manager->RefreshKovaDiskCache();
-  Run(_first);
-  EXPECT_THAT(_result->GetError(), NamesDevice("DiskTooSmall", "a"));
-  EXPECT_THAT(DiskStates(*_result), ElementsAre("s1 eligible", "a ineligible"));
-  EXPECT_THAT(_kernel.Calls(), IsEmpty());
-}
-
-TEST_F(InitializeOneGroup, AsksADerivedManagersCheckFirst) {
-  const auto spy = UseManager<SpyManager>();
-  spy->validateDiskMapping = [](const auto&, Ref<DiskMapResult>& result) {
-    result->SetError(MakeRef<DiskHasPartitions>("a"));
-  };
-  Run(_first);
-  EXPECT_THAT(spy->calls, ElementsAre("InitializeMapping(s1: a, tag, 5, 4)", "ValidateDiskMapping(s1: a)"));
-  EXPECT_THAT(_timeline.Events(), IsEmpty());
-  EXPECT_THAT(_logger->Lines(),
-              ElementsAre(LogLineIs(LogLevel::Warning, isInvalid, HasSubstr("DiskHasPartitions"))));
-}
-
-TEST_F(InitializeOneGroup, ReadsNamesAfterTheCheckAndLetsAMissingOneOut) {
-  const auto spy = UseManager<SpyManager>();
-  spy->validateDiskMapping = [](const auto&, auto&) {};
-  for (const Ref<DiskMapping>& mapping :
-       {AMapping(AScsiDisk("x").Unnamed(), {Hdd("a")}),
-        AMapping(Ssd("s1"), {Hdd("a"), AScsiDisk("x").Unnamed()}), AMapping(Ssd("s1"), {nullptr})}) {
-    EXPECT_THAT([&] { _manager->InitializeMapping(mapping, "tag", 1, 0, _result); },
-                ThrowsMessage<NotInitializedException>(StrEq("Not initialized")));
-  }
-  EXPECT_THAT(_kernel.Calls(), IsEmpty());
-}
-
-TEST_F(InitializeOneGroup, TurnsTheExceptionOfADerivedManagersFormatIntoTheGroupsFault) {
-  const auto spy = UseManager<SpyManager>();
-  spy->formatDiskMapping = [] { throw KovaExceptionHasPartition("parts", "a"); };
-  Run(_first);
-  EXPECT_THAT(_result->GetError(), NamesDevice("DiskHasPartitions", "a"));
-  EXPECT_THAT(_logger->Lines(LogLevel::Warning),
-              ElementsAre(LogLineIs(LogLevel::Warning, formatFailed, "parts")));
-}
-
-TEST_F(InitializeOneGroup, LetsAFaultOfTheFormatOut) {
-  const auto spy = UseManager<SpyManager>();
-  spy->formatDiskMapping = [] { throw AFault("stop"); };
-  EXPECT_THROW(Run(_first), SystemError::Exception);
-}
-
-// ---- the kernel's format
-
-TEST_F(InitializeDisks, HandsTheFormatToTheKernelAsItStands) {
-  std::vector<std::string> capacity = {"b", "", "a"};
-  _manager->FormatDiskMapping("", capacity, "a tag", -1, 77);
-  EXPECT_THAT(_timeline.Events(),
-              ElementsAre(takeOperation, "FormatDiskMapping(, [b, , a], {a tag, -1, 77})", releaseOperation));
-  EXPECT_THAT(_logger->Lines(),
-              ElementsAre(LogLineIs(LogLevel::Verbose, formatting), LogLineIs(LogLevel::Verbose, formatted)));
-}
-
-TEST_F(InitializeDisks, LetsTheKernelsExceptionsOutOfTheFormat) {
-  std::vector<std::string> capacity = {"a"};
-  _kernel.Fail("FormatDiskMapping", KovaExceptionHasPartition("parts", "a"));
-  EXPECT_THROW(_manager->FormatDiskMapping("s1", capacity, "", 1, 0), KovaExceptionHasPartition);
-  EXPECT_EQ(_timeline.Events().back(), releaseOperation);
-  EXPECT_THAT(_logger->Lines(), ElementsAre(LogLineIs(LogLevel::Verbose, formatting)));
 }
 
 }  // namespace

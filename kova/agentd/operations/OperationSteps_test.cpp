@@ -37,7 +37,6 @@ using TestSupport::LogLineIs;
 using TestSupport::NamesDevice;
 using TestSupport::panicStatus;
 using TestSupport::SoapText;
-using TestSupport::Ssd;
 
 class OperationSteps : public TestSupport::HostFixture {
  protected:

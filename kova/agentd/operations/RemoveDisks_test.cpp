@@ -14,6 +14,7 @@
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 #include "orbis/ParseException.h"
+#include "tests/support/KernelRefusals.h"
 #include "tests/support/OperationFixture.h"
 #include "tests/support/SpyManager.h"
 
@@ -30,7 +31,6 @@ using Tessa::MakeRef;
 using Tessa::NotInitializedException;
 using Tessa::Ref;
 using Tessa::Service::LogLevel;
-using testing::_;
 using testing::Contains;
 using testing::ElementsAre;
 using testing::ExitedWithCode;
@@ -44,8 +44,7 @@ using TestSupport::AScsiDisk;
 using TestSupport::groupLine;
 using TestSupport::Hdd;
 using TestSupport::IsExactly;
-using TestSupport::IsSystemError;
-using TestSupport::KernelCall;
+using TestSupport::KernelRefusal;
 using TestSupport::LogLineIs;
 using TestSupport::NamesDevice;
 using TestSupport::noFaultLine;
@@ -144,32 +143,7 @@ TEST_F(RemoveDisk, GoesOnWhenTheKernelCannotBeRead) {
   ExpectTextsUntouched();
 }
 
-struct Refusal {
-  const char* name;
-  std::function<void(TestSupport::FakeKernel&, const std::string& operation)> fail;
-  testing::Matcher<const Ref<Orbis::MethodFault>&> fault;
-};
-void PrintTo(const Refusal& refusal, std::ostream* out) {
-  *out << refusal.name;
-}
-template <class Exception>
-Refusal ARefusal(const char* name, const Exception& exception,
-                 testing::Matcher<const Ref<Orbis::MethodFault>&> fault) {
-  return {name, [exception](auto& kernel, const auto& operation) { kernel.Fail(operation, exception); },
-          fault};
-}
-const Refusal refusals[] = {
-    ARefusal("HostCtlException", HostCtlException("no"), IsSystemError("no")),
-    ARefusal("KovaStorageException", KovaStorageException("no", "a"), IsSystemError("no")),
-    ARefusal("LastRemainingHDD", KovaExceptionLastRemainingHDD("no", "a"),
-             NamesDevice("DiskIsLastRemainingNonSSD", "a")),
-    ARefusal("RemoveMappingAutoMode", HostCtl::Lib::KovaExceptionRemoveMappingAutoModeEnabled("no", "a"),
-             NamesDevice("KovaDiskFault", "no")),
-    ARefusal("RemoveDiskAutoMode", HostCtl::Lib::KovaExceptionRemoveDiskAutoModeEnabled("no", "a"),
-             NamesDevice("KovaDiskFault", "no")),
-};
-
-class RefusedRemoval : public RemoveDisk, public testing::WithParamInterface<Refusal> {
+class RefusedRemoval : public RemoveDisk, public testing::WithParamInterface<KernelRefusal> {
  protected:
   // The kernel's operation refused; the answer and the log say so.
   void ExpectRefused(const char* warning) {
@@ -181,7 +155,7 @@ class RefusedRemoval : public RemoveDisk, public testing::WithParamInterface<Ref
   }
 };
 
-INSTANTIATE_TEST_SUITE_P(Kernel, RefusedRemoval, testing::ValuesIn(refusals),
+INSTANTIATE_TEST_SUITE_P(Kernel, RefusedRemoval, testing::ValuesIn(TestSupport::KernelRefusals()),
                          [](const auto& test) { return std::string(test.param.name); });
 
 TEST_P(RefusedRemoval, OfADiskIsToldAsAFault) {
@@ -213,9 +187,8 @@ TEST_F(RemoveDisk, WarnsBeforeItLetsGoOfTheLock) {
   LogIntoTimeline();
   _kernel.Fail("RemoveDisk", KovaStorageException("no", "a"));
   Remove("a");
-  const std::vector<std::string> events = _timeline.Events();
   EXPECT_THAT(
-      std::vector<std::string>(events.end() - 6, events.end()),
+      LastEvents(6),
       ElementsAre("RemoveDisk(a, pass, {text, 11, -22})", "log warning: Error removing KOVA disks: no",
                   releaseOperation, takeCache, releaseCache, std::string("log verbose: ") + noResultLine));
 }
@@ -283,8 +256,8 @@ TEST_F(RemoveGroup, LooksForTheGroupAndRemovesItUnderOneHoldOfTheOperationLock) 
               ElementsAre(takeOperation, takeCache, "RefreshKovaInfo()", "QueryDisks([], true)", releaseCache,
                           "GetDiskMappings(false)", "RemoveDiskMapping(s, pass, {text, 11, -22})",
                           releaseOperation, takeCache, releaseCache));
-  EXPECT_THAT(_kernel.Calls()[2].locksHeld, ElementsAre(operationLock));
-  EXPECT_THAT(_kernel.Calls()[3].locksHeld, ElementsAre(operationLock));
+  EXPECT_THAT(_kernel.Calls().at(2).locksHeld, ElementsAre(operationLock));
+  EXPECT_THAT(_kernel.Calls().at(3).locksHeld, ElementsAre(operationLock));
 }
 
 TEST_F(RemoveGroup, LeavesTheFaultTextAloneWhenItSucceeds) {

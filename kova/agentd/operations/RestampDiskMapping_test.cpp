@@ -44,8 +44,8 @@ TEST_F(Restamp, StampsAndThenMountsUnderTheOperationLock) {
   Run("s");
   EXPECT_THAT(_timeline.Events(), ElementsAre(takeOperation, "RestampDiskMapping(s, [b, a])",
                                               "MountDiskMapping(s, false)", releaseOperation));
-  EXPECT_THAT(_kernel.Calls()[0].locksHeld, ElementsAre(operationLock));
-  EXPECT_THAT(_kernel.Calls()[1].locksHeld, ElementsAre(operationLock));
+  EXPECT_THAT(_kernel.Calls().at(0).locksHeld, ElementsAre(operationLock));
+  EXPECT_THAT(_kernel.Calls().at(1).locksHeld, ElementsAre(operationLock));
   EXPECT_THAT(_capacity, ElementsAre("b", "a"));
 }
 
@@ -61,7 +61,7 @@ TEST_F(Restamp, StampsAGroupWithoutItsSsdByUuidAndDoesNotMountIt) {
   Run("kova:" + uuid);
   EXPECT_THAT(_timeline.Events(),
               ElementsAre(takeOperation, "RestampDiskMappingByUuid(" + uuid + ")", releaseOperation));
-  EXPECT_THAT(_kernel.Calls()[0].locksHeld, ElementsAre(operationLock));
+  EXPECT_THAT(_kernel.Calls().at(0).locksHeld, ElementsAre(operationLock));
   EXPECT_THAT(_logger->Lines(), ElementsAre(LogLineIs(LogLevel::Verbose, restamping, "kova:" + uuid),
                                             LogLineIs(LogLevel::Verbose, uuidInput, "kova:" + uuid),
                                             LogLineIs(LogLevel::Verbose, givenUuid, uuid),

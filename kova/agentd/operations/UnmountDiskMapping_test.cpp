@@ -33,7 +33,6 @@ using Tessa::NotInitializedException;
 using Tessa::Ref;
 using Tessa::Service::LogLevel;
 using testing::AllOf;
-using testing::Contains;
 using testing::ElementsAre;
 using testing::ExitedWithCode;
 using testing::HasSubstr;
@@ -355,7 +354,7 @@ TEST_F(Claim, AsksTheKernelUnderTheOperationLockAndForgetsTheCache) {
   _manager->ClaimUnmountedDiskgroup();
   EXPECT_THAT(_timeline.Take(), ElementsAre(takeOperation, "ClaimUnmountedDiskgroups()", releaseOperation,
                                             takeCache, releaseCache));
-  EXPECT_THAT(_kernel.Calls()[0].locksHeld, ElementsAre(operationLock));
+  EXPECT_THAT(_kernel.Calls().at(0).locksHeld, ElementsAre(operationLock));
   EXPECT_THAT(_logger->Lines(), IsEmpty());
   EXPECT_FALSE(IsCacheValid());
 }

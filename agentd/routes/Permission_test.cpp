@@ -54,8 +54,9 @@ TEST_F(Permission, HealthTakesNoRole) {
 
 TEST_F(Permission, EveryReportTakesTheRoleRead) {
   _api.description = "{}";
-  for (const char* target : {"/api/v1/disks", "/api/v1/groups", "/api/v1/config", "/api/v1/tasks",
-                             "/api/v1/tasks/x", "/api/v1/host", "/soap?wsdl", "/soap?xsd=nox.xsd"}) {
+  for (const char* target :
+       {"/api/v1/disks", "/api/v1/groups", "/api/v1/config", "/api/v1/tasks", "/api/v1/tasks/x",
+        "/api/v1/openapi.json", "/api/v1/host", "/soap?wsdl", "/soap?xsd=nox.xsd"}) {
     EXPECT_EQ(Get(HttpRole::None, target).status, 403u) << target;
     EXPECT_NE(Get(HttpRole::Read, target).status, 403u) << target;
   }

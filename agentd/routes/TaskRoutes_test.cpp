@@ -211,8 +211,9 @@ TEST_F(TaskRoutes, ChangesOfTheHostCountByTheirBytesWhileTheyWait) {
   const Router router(_api, tasks);
   const auto change = [&router](std::size_t bytes) {
     const auto status = std::make_shared<std::atomic<unsigned>>(0);
-    router.Serve({"POST", "/api/v1/host", "application/json", std::string(bytes, ' ')},
-                 HttpResponder([status](const HttpAnswer& given) { *status = given.status; }));
+    router.Serve(
+        Testing::By(HttpRole::Change, {"POST", "/api/v1/host", "application/json", std::string(bytes, ' ')}),
+        HttpResponder([status](const HttpAnswer& given) { *status = given.status; }));
     return status->load();
   };
   _api.onChange = [this] { _gate.Enter(); };

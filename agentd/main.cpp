@@ -1,4 +1,4 @@
-// The host agent: loads the plug-in, gives it a host, and answers for it over a socket.
+// The host agent: loads the plug-in, gives it a host, and answers for it over sockets.
 
 #include <unistd.h>
 
@@ -9,6 +9,7 @@
 #include <fstream>
 #include <iostream>
 
+#include "agentd/ListenOptions.h"
 #include "agentd/Trace.h"
 #include "agentd/http/HttpServer.h"
 #include "agentd/routes/Routes.h"
@@ -20,13 +21,11 @@
 
 namespace {
 
-constexpr const char* defaultSocket = "unix:/run/kova/agentd.sock";
-constexpr std::string_view unixScheme = "unix:";
 constexpr int unfinishedStatus = 1;  // stopped while requests were still handled
 
 struct Options {
   Host::RuntimeOptions runtime;
-  std::string listen = defaultSocket;
+  Agentd::ListenOptions listen;
   std::string readyFile;
   std::string logLevel = "info";
   std::string traceFile;
@@ -35,14 +34,15 @@ struct Options {
 void AddOptions(CLI::App& cli, Options& options) {
   cli.add_option("--host", options.runtime.hostFile,
                  "Host description to serve; without one, an example host is served");
-  cli.add_option("--listen", options.listen, "Where to answer: unix:PATH")->capture_default_str();
   cli.add_flag("--save", options.runtime.save, "Write every change of the host back to its description");
-  cli.add_option("--ready-file", options.readyFile, "File to write the address to, once it is answered on");
+  cli.add_option("--ready-file", options.readyFile,
+                 "File to write the addresses to, a line each, once they are answered on");
   cli.add_option("--log-level", options.logLevel, "none, error, warning, info, verbose, trivia")
       ->capture_default_str();
   cli.add_option("--trace", options.traceFile,
                  "File to append one JSON line per call of the kernel provider to");
   cli.add_option("--plugin", options.runtime.pluginFile, "The plug-in, if it is not beside the program");
+  options.listen.AddTo(cli);
 }
 
 [[noreturn]] void EndOverPanic(const char* text) {
@@ -51,21 +51,18 @@ void AddOptions(CLI::App& cli, Options& options) {
   std::abort();
 }
 
-std::string SocketPath(const std::string& address) {
-  if (address.compare(0, unixScheme.size(), unixScheme) != 0) {
-    throw std::runtime_error("cannot listen on '" + address + "': only unix:PATH is served");
-  }
-  return address.substr(unixScheme.size());
-}
-
-void WriteReadyFile(const Options& options) {
-  if (options.readyFile.empty()) {
+// Whole or not at all: whoever waits for the file may read it as soon as it is there.
+void WriteReadyFile(const std::string& path, const std::vector<Agentd::HttpAddress>& addresses) {
+  if (path.empty()) {
     return;
   }
-  std::ofstream file(options.readyFile);
-  file << options.listen << "\n";
-  if (!file.flush()) {
-    throw std::runtime_error("cannot write the ready file " + options.readyFile);
+  const std::string unfinished = path + ".new";
+  std::ofstream file(unfinished);
+  for (const Agentd::HttpAddress& address : addresses) {
+    file << address.Text() << "\n";
+  }
+  if (!file.flush() || std::rename(unfinished.c_str(), path.c_str()) != 0) {
+    throw std::runtime_error("cannot write the ready file " + path);
   }
 }
 
@@ -85,7 +82,7 @@ void Log(Tessa::Service::LogLevel level, const char* format, const std::string& 
 
 void Serve(Options& options) {
   using Tessa::Service::LogLevel;
-  const std::string socketPath = SocketPath(options.listen);
+  const Agentd::HttpOptions http = options.listen.Read();
   SetUpLogging(options);
   if (!options.traceFile.empty()) {
     options.runtime.recorder = Agentd::TraceTo(options.traceFile);
@@ -95,13 +92,14 @@ void Serve(Options& options) {
   Agentd::TaskQueue tasks;
   const Agentd::Router router(service, tasks);
   Agentd::HttpServer server(
-      socketPath, Agentd::HttpLimits(),
-      [&router](const Agentd::HttpRequest& request, const Agentd::HttpResponder& responder) {
+      http, [&router](const Agentd::HttpRequest& request, const Agentd::HttpResponder& responder) {
         router.Serve(request, responder);
       });
   server.OnStopping([&tasks] { tasks.Close(); });
-  WriteReadyFile(options);
-  Log(LogLevel::Info, "Answering on %1", options.listen);
+  WriteReadyFile(options.readyFile, server.Addresses());
+  for (const Agentd::HttpAddress& address : server.Addresses()) {
+    Log(LogLevel::Info, "Answering on %1", address.Text());
+  }
   const bool isDrained = server.Run();
   tasks.Finish();  // whatever the time: a change is never left in its middle
   if (!isDrained) {

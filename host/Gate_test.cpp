@@ -137,18 +137,27 @@ TEST_F(GateWithHost, PutsTheInventorysDiskInThePlaceOfTheClients) {
   EXPECT_FALSE((*disks)[1]->GetSsd());
 }
 
-TEST_F(GateWithHost, LetsInAnUnknownDiskOnlyWithItsFlag) {
-  const auto stranger = ADisk("naa.x", true);
-  const Ref<DiskList> disks = AdmitDisks(*Disks({stranger}), Known());
-  EXPECT_EQ((*disks)[0]->GetCanonicalName(), "naa.x");
-  EXPECT_TRUE((*disks)[0]->GetSsd());
+TEST_F(GateWithHost, RefusesAnUnknownDiskWhateverFlagItBrings) {
   EXPECT_EQ(VerdictOnDisks(DisksNamed({"naa.1", "naa.x"})),
             "disks[1] | disks[1]: this host has no disk 'naa.x'");
-  EXPECT_THAT(VerdictOnDisks(DisksNamed({absentName})), HasSubstr("this host has no disk 'kova:"));
+  EXPECT_EQ(VerdictOnDisks(Disks({ADisk("naa.x", true)})),
+            "disks[0] | disks[0]: this host has no disk 'naa.x'");
+  EXPECT_THAT(VerdictOnDisks(Disks({ADisk(absentName, false)})), HasSubstr("this host has no disk 'kova:"));
+  EXPECT_THAT(VerdictOnNewGroups({AMapping(ADisk("naa.x", true), DisksNamed({"naa.2"}))}),
+              StartsWith("mappings[0].ssd | "));
+  EXPECT_THAT(VerdictOnNewGroups({AMapping(ADisk("naa.1"), Disks({ADisk("naa.x", false)}))}),
+              StartsWith("mappings[0].nonSsd[0] | "));
 }
 
-TEST_F(GateWithHost, KnowsNoDiskWithoutAnInventory) {
-  EXPECT_THAT(VerdictOn([] { AdmitDisks(*DisksNamed({"naa.1"}), KnownDisks(nullptr)); }),
+TEST_F(GateWithHost, CannotTellWithoutAnInventory) {
+  const KnownDisks none(nullptr);
+  const auto group = Mappings({MappingOf("naa.1", {"naa.2"})});
+  EXPECT_THAT(VerdictOn([&] { AdmitDisks(*DisksNamed({"naa.1"}), none); }),
+              StartsWith("The disks of the host"));
+  EXPECT_THAT(VerdictOn([&] { AdmitNewGroups(*group, none); }), StartsWith("The disks of the host"));
+  EXPECT_EQ(VerdictOn([&] { AdmitGroups(*group, none); }), "let in");
+  const KnownDisks empty(Tessa::MakeRef<Nox::Host::StorageDeviceInfo>());
+  EXPECT_THAT(VerdictOn([&] { AdmitDisks(*DisksNamed({"naa.1"}), empty); }),
               HasSubstr("this host has no disk 'naa.1'"));
 }
 
@@ -205,8 +214,18 @@ TEST_F(GateWithHost, LetsInTheMostGroupsAndNoMore) {
   EXPECT_EQ(VerdictOnNewGroups(std::vector<MappingRef>(mostMappings, mapping)), "let in");
   EXPECT_THAT(VerdictOnNewGroups(std::vector<MappingRef>(mostMappings + 1, mapping)),
               HasSubstr("10000 disk groups"));
-  const MappingRef large = MappingOf("naa.1", Names(mostNames / 2, "naa.2"));
-  EXPECT_THAT(VerdictOnNewGroups({large, large}), HasSubstr("100000 disks"));
+  const MappingRef large = MappingOf("naa.1", Names(mostDisksOfGroup, "naa.2"));
+  EXPECT_THAT(VerdictOnNewGroups(std::vector<MappingRef>(mostNames / mostDisksOfGroup, large)),
+              HasSubstr("100000 disks"));
+}
+
+TEST_F(GateWithHost, LetsInTheMostDisksOfAGroupAndNoMore) {
+  const MappingRef largest = MappingOf("naa.1", Names(mostDisksOfGroup, "naa.2"));
+  const MappingRef larger = MappingOf("naa.1", Names(mostDisksOfGroup + 1, "naa.2"));
+  EXPECT_EQ(VerdictOnNewGroups({largest}), "let in");
+  EXPECT_THAT(VerdictOnNewGroups({largest, larger}),
+              AllOf(StartsWith("mappings[1].nonSsd | "), HasSubstr("more than 1000 disks")));
+  EXPECT_THAT(VerdictOn([&] { AdmitGroup(*larger, Known()); }), StartsWith("mapping.nonSsd | "));
 }
 
 TEST_F(GateWithHost, LetsGroupsThatAreThereNameDisksThatTheInventoryLacks) {

@@ -7,6 +7,7 @@
 #include "otxctl/ProviderFactory.h"
 #include "otxctl/fault/CallRecorder.h"
 #include "otxctl/fault/RecordingProvider.h"
+#include "otxctl/fault/StrictProvider.h"
 #include "otxctl/sim/DefaultHost.h"
 #include "otxctl/sim/SimProvider.h"
 
@@ -19,13 +20,16 @@ namespace {
 
 constexpr const char* storageSystemName = "storageSystem";
 
-std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(
-    const std::shared_ptr<SimHost>& host, const std::shared_ptr<OtxCtl::Fault::CallRecorder>& recorder) {
-  auto provider = std::make_unique<OtxCtl::Sim::SimProvider>(host);
-  if (recorder == nullptr) {
-    return provider;
+std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(const std::shared_ptr<SimHost>& host,
+                                                      const RuntimeOptions& options) {
+  std::unique_ptr<HostCtl::Kova::KovaInfo> provider = std::make_unique<OtxCtl::Sim::SimProvider>(host);
+  if (options.recorder != nullptr) {
+    provider = std::make_unique<OtxCtl::Fault::RecordingProvider>(std::move(provider), options.recorder);
   }
-  return std::make_unique<OtxCtl::Fault::RecordingProvider>(std::move(provider), recorder);
+  if (!options.bare) {
+    provider = std::make_unique<OtxCtl::Fault::StrictProvider>(std::move(provider));
+  }
+  return provider;
 }
 
 HostDescription DescribedHost(const RuntimeOptions& options) {
@@ -57,8 +61,7 @@ void HostRuntime::Install(const RuntimeOptions& options) {
   _host->SetListener([this] { PublishInventory(); });
   Tessa::Service::SetApp(&_app);
   Tessa::Authorize::AuthorizeManager::SetInstance(Tessa::MakeRef<LocalAuthorization>());
-  OtxCtl::Kova::SetProviderFactory(
-      [host = _host, recorder = options.recorder] { return MakeProvider(host, recorder); });
+  OtxCtl::Kova::SetProviderFactory([host = _host, options] { return MakeProvider(host, options); });
 }
 
 void HostRuntime::Uninstall() noexcept {

@@ -25,6 +25,9 @@ struct RuntimeOptions {
   std::optional<std::string> hostText;
   bool save = false;       // write every change of the host back to its file
   std::string pluginFile;  // empty: where FindPlugin finds it
+  // Lets every exception of the provider through to the plug-in, which ends the process over those that no
+  // provider may throw. Otherwise these are turned into ones that it may.
+  bool bare = false;
   // Records every call of the provider, if set.
   std::shared_ptr<OtxCtl::Fault::CallRecorder> recorder;
 };

@@ -197,8 +197,18 @@ TEST_F(HostRuntimeTest, AProviderThatFailsOnceShowsNoDisksAndThenAll) {
   });
 }
 
-TEST_F(HostRuntimeTest, AProviderThatThrowsWhatItMustNotEndsTheProcess) {
-  const auto options = On(AHostWhoseQueryThrows("std::runtime_error", 0));
+TEST_F(HostRuntimeTest, AProviderThatThrowsWhatItMustNotHasFailedLikeAnyOther) {
+  const auto options = On(AHostWhoseQueryThrows("std::runtime_error", 1));
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    EXPECT_THAT(Disks(runtime), ElementsAre());
+    EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible"));
+  });
+}
+
+TEST_F(HostRuntimeTest, ABareProviderThatThrowsWhatItMustNotEndsTheProcess) {
+  auto options = On(AHostWhoseQueryThrows("std::runtime_error", 0));
+  options.bare = true;
   InOwnProcess([&options] { Disks(HostRuntime::Start(options)); }, panicStatus, "panic: no luck");
 }
 

@@ -20,6 +20,11 @@ constexpr std::size_t uuidLength = 36;
 
 }  // namespace
 
+struct KnownDisks::Entry {
+  ScsiDisk* listed;     // the inventory's
+  Ref<ScsiDisk> found;  // made when it is first asked for
+};
+
 KnownDisks KnownDisks::Now() {
   Ref<Nox::Host::StorageSystem> storageSystem;
   Tessa::Service::TryLookupObject("storageSystem", storageSystem);
@@ -37,7 +42,7 @@ KnownDisks::KnownDisks(Ref<StorageDeviceInfo> info) : _info(std::move(info)) {
   for (Nox::Host::ScsiLun* unit : *_info->GetScsiLun()) {
     auto* const disk = dynamic_cast<ScsiDisk*>(unit);
     if (disk != nullptr && disk->HasCanonicalName()) {
-      _named.emplace(disk->GetCanonicalName(), disk);
+      _named.emplace(disk->GetCanonicalName(), Entry{disk, nullptr});
     }
   }
 }
@@ -45,14 +50,31 @@ KnownDisks::KnownDisks(Ref<StorageDeviceInfo> info) : _info(std::move(info)) {
 KnownDisks::~KnownDisks() = default;
 KnownDisks::KnownDisks(KnownDisks&&) noexcept = default;
 
+bool KnownDisks::IsThere() const noexcept {
+  return static_cast<bool>(_info);
+}
+
 Ref<ScsiDisk> KnownDisks::Find(std::string_view canonicalName) const {
-  const auto found = _named.find(canonicalName);
-  return found == _named.end() ? nullptr : Ref<ScsiDisk>(found->second);
+  const auto at = _named.find(canonicalName);
+  if (at == _named.end()) {
+    return nullptr;
+  }
+  Entry& entry = at->second;
+  if (!entry.found) {
+    entry.found = MakeRef<ScsiDisk>(*entry.listed);
+    entry.found->SetDurableName(nullptr);
+    entry.found->SetAlternateName(nullptr);
+    entry.found->SetStandardInquiry(nullptr);
+  }
+  return entry.found;
+}
+
+bool HasAbsentPrefix(std::string_view canonicalName) {
+  return canonicalName.substr(0, absentPrefix.size()) == absentPrefix;
 }
 
 bool IsAbsentName(std::string_view canonicalName) {
-  return canonicalName.size() == absentPrefix.size() + uuidLength &&
-         canonicalName.substr(0, absentPrefix.size()) == absentPrefix;
+  return canonicalName.size() == absentPrefix.size() + uuidLength && HasAbsentPrefix(canonicalName);
 }
 
 std::string AbsentName(const std::string& kovaUuid) {

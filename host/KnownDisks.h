@@ -1,6 +1,6 @@
 // The disks that the agent's inventory lists, by canonical name, as they were at one moment.
 //
-// Threads: any; a snapshot is not guarded, its objects are only read.
+// Threads: any, but a snapshot belongs to one at a time; its objects are only read.
 #pragma once
 
 #include <string>
@@ -22,17 +22,25 @@ class KnownDisks {
   ~KnownDisks();
   KnownDisks(KnownDisks&&) noexcept;
 
-  // The inventory's own object, not to be changed; or null.
+  // Whether there was an inventory at all, if only an empty one.
+  bool IsThere() const noexcept;
+
+  // The inventory's disk, not to be changed; or null. It comes without what no answer shows and what may make
+  // it large: durable name, alternate names and standard inquiry.
   Tessa::Ref<Nox::Host::ScsiDisk> Find(std::string_view canonicalName) const;
 
  private:
+  struct Entry;
+
   Tessa::Ref<Nox::Host::StorageDeviceInfo> _info;  // keeps the names and the disks
-  std::unordered_map<std::string_view, Nox::Host::ScsiDisk*> _named;
+  mutable std::unordered_map<std::string_view, Entry> _named;
 };
 
 // A disk that has left the host but that the kernel remembers has no name any more. Requests and results
 // call it "kova:" and its KOVA UUID of 36 characters.
 bool IsAbsentName(std::string_view canonicalName);
+// Whether it begins like one; the plug-in takes that for enough.
+bool HasAbsentPrefix(std::string_view canonicalName);
 std::string AbsentName(const std::string& kovaUuid);
 
 // The object that stands for such a disk.

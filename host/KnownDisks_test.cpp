@@ -49,7 +49,29 @@ TEST(KnownDisks, OfOneNameAreTheFirst) {
   units->Append(Testing::ADisk("naa.1", false));
   const auto info = MakeRef<StorageDeviceInfo>();
   info->SetScsiLun(units);
-  EXPECT_EQ(KnownDisks(info).Find("naa.1"), first);
+  EXPECT_TRUE(KnownDisks(info).Find("naa.1")->GetSsd());
+}
+
+TEST(KnownDisks, ComeWithoutTheFieldsThatNoAnswerShows) {
+  const Ref<Nox::Host::ScsiDisk> listed = Testing::ADisk("naa.1", true);
+  listed->SetVendor("ACME");
+  listed->SetDurableName(MakeRef<Nox::Host::DurableName>());
+  const auto names = MakeRef<Orbis::DataArray<Nox::Host::DurableName>>();
+  names->Append(MakeRef<Nox::Host::DurableName>());
+  listed->SetAlternateName(names);
+  listed->SetStandardInquiry(MakeRef<Orbis::Binary>(std::vector<unsigned char>{1, 2}));
+  const auto units = MakeRef<Orbis::DataArray<ScsiLun>>();
+  units->Append(listed);
+  const auto info = MakeRef<StorageDeviceInfo>();
+  info->SetScsiLun(units);
+  const KnownDisks known(info);
+  const auto found = known.Find("naa.1");
+  EXPECT_EQ(found->GetVendor(), "ACME");
+  EXPECT_FALSE(found->GetDurableName());
+  EXPECT_FALSE(found->GetAlternateName());
+  EXPECT_FALSE(found->GetStandardInquiry());
+  EXPECT_EQ(known.Find("naa.1"), found) << "it is copied once";
+  EXPECT_TRUE(listed->GetAlternateName()) << "the inventory stays as it is";
 }
 
 TEST(KnownDisks, NowAreThoseOfTheRegisteredStorageSystem) {

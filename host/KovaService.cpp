@@ -7,12 +7,12 @@
 #include "host/Gate.h"
 #include "host/HostError.h"
 #include "host/KnownDisks.h"
+#include "host/RequestTexts.h"
 #include "host/UnmountedGroups.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/include/KovaPlugin.h"
 #include "nox/Kova.h"
-#include "orbis/Soap.h"
 #include "otxctl/TaskScope.h"
 #include "otxctl/sim/SimHost.h"
 
@@ -58,22 +58,6 @@ std::string RequestTag() {
   return task == nullptr ? std::string() : task->GetId();
 }
 
-std::string ToText(const Orbis::Any& value) {
-  std::string text;
-  Orbis::SerializeObjectToSoap(value, nullptr, text);
-  return text;
-}
-
-template <class Item>
-Kovasvc::Texts ToTexts(const Orbis::DataArray<Item>& items) {
-  Kovasvc::Texts texts;
-  texts.reserve(items.Size());
-  for (const Item* item : items) {
-    texts.push_back(ToText(*item));
-  }
-  return texts;
-}
-
 std::unique_ptr<HostCtl::Kova::KovaInfo> Kernel() {
   return std::unique_ptr<HostCtl::Kova::KovaInfo>(OtxCtl::Kova::KovaPluginImpl().GetKovaInfo());
 }
@@ -116,7 +100,7 @@ Answer KovaService::GetDiskGroups() const {
     return answer;
   }
   const Answer more = Guarded([&] {
-    AppendUnmounted(UnmountedGroups(*Kernel()), KnownDisks::Now(), *info);
+    AppendUnlisted(GroupsOf(*Kernel()), KnownDisks::Now(), *info);
     return Answer();
   });
   answer.fault = more.fault;  // beside the groups that could be read
@@ -135,8 +119,9 @@ Answer KovaService::AddDisks(const DiskList& disks) const {
     const KnownDisks known = KnownDisks::Now();
     const Ref<DiskList> admitted = Gate::AdmitDisks(disks, known);
     Gate::DemandWholeGroups(*admitted, known, *Kernel());
+    const Kovasvc::Texts texts = ToTexts(*admitted);
     return Ask([&](std::string& faultText, std::string& resultText) {
-      _hooks.addDisks(ToTexts(*admitted), RequestTag(), faultText, resultText);
+      _hooks.addDisks(texts, RequestTag(), faultText, resultText);
     });
   });
 }
@@ -151,18 +136,19 @@ Answer KovaService::AddAllEligibleDisks() const {
 
 Answer KovaService::InitializeDisks(const MappingList& mappings) const {
   return Guarded([&] {
-    const Ref<MappingList> admitted = Gate::AdmitNewGroups(mappings, KnownDisks::Now());
+    const Kovasvc::Texts texts = ToTexts(*Gate::AdmitNewGroups(mappings, KnownDisks::Now()));
+    Gate::DemandAnswers(*Kernel());
     return Ask([&](std::string& faultText, std::string& resultText) {
-      _hooks.initializeDisks(ToTexts(*admitted), RequestTag(), faultText, resultText);
+      _hooks.initializeDisks(texts, RequestTag(), faultText, resultText);
     });
   });
 }
 
 Answer KovaService::UnmountDiskMapping(const MappingList& mappings) const {
   return Guarded([&] {
-    const Ref<MappingList> admitted = Gate::AdmitGroups(mappings, KnownDisks::Now());
+    const Kovasvc::Texts texts = ToTexts(*Gate::AdmitGroups(mappings, KnownDisks::Now()));
     return Ask([&](std::string& faultText, std::string& resultText) {
-      _hooks.unmountDiskMapping(ToTexts(*admitted), RequestTag(), faultText, resultText);
+      _hooks.unmountDiskMapping(texts, RequestTag(), faultText, resultText);
     });
   });
 }
@@ -181,9 +167,11 @@ Answer KovaService::RemoveDiskMapping(const DiskMapping& mapping, const RemovalA
   return Guarded([&] {
     Gate::CheckRemovalArguments(arguments);
     const Ref<DiskMapping> admitted = Gate::AdmitGroup(mapping, KnownDisks::Now());
+    Gate::DemandGroupIfAbsent(*admitted, *Kernel());
+    const std::string text = ToText(*admitted);
     return Ask([&](std::string& faultText, std::string&) {
-      _hooks.removeDiskMapping(ToText(*admitted), arguments.passThrough, arguments.optionText,
-                               arguments.optionFirst, arguments.optionSecond, faultText);
+      _hooks.removeDiskMapping(text, arguments.passThrough, arguments.optionText, arguments.optionFirst,
+                               arguments.optionSecond, faultText);
     });
   });
 }

@@ -148,6 +148,25 @@ TEST_F(KovaServiceChanges, HandsGroupsDownAsTheInventoryKnowsThem) {
   EXPECT_THAT(heard, ElementsAre("init naa.1!<naa.2> naa.3<> #", "unmount naa.1!<naa.2> naa.3<> #"));
 }
 
+TEST_F(KovaServiceChanges, HandsNoGroupDownThatGrowsBeyondWhatThePluginReads) {
+  _host->Change([](HostDescription& host) { host.disks[1].alternateName.resize(27); });
+  _inventory->Replace(DescribeInventory(_host->Snapshot()));
+  static std::size_t bytes;
+  PluginHooks hooks = Listeners();
+  hooks.unmountDiskMapping = [](const Kovasvc::Texts& texts, const std::string&, std::string&, std::string&) {
+    bytes = texts.front().size();
+  };
+  const KovaService service(hooks);
+  const auto unmount = [&](std::size_t disks) {
+    return service.UnmountDiskMapping(
+        *Mappings({MappingOf("naa.2", std::vector<std::string>(disks, "naa.2"))}));
+  };
+  EXPECT_THAT(Told(unmount(99'000).fault.Get()), StartsWith("mappings[0].nonSsd | "));
+  EXPECT_EQ(bytes, 0u) << "the hook is not called";
+  EXPECT_EQ(Told(unmount(1000).fault.Get()), "done");
+  EXPECT_LT(bytes, 1'000'000u) << "names that no answer shows are not handed down";
+}
+
 TEST_F(KovaServiceChanges, HandsRemovalsDownWithAllThatBelongsToThem) {
   _service.RemoveDisk("naa.2", {"p", "o", -1, 2});
   _service.RemoveDiskMapping(*MappingOf("naa.1", {"naa.9"}), {"q", "r", 3, -4});
@@ -203,6 +222,30 @@ TEST_F(KovaServiceChanges, CallsNoHookForWhatTheGateRefuses) {
     EXPECT_THAT(Told(answer.fault.Get()), StartsWith(told));
   }
   EXPECT_THAT(heard, IsEmpty());
+}
+
+TEST_F(KovaServiceChanges, MakesNoGroupWhileTheKernelCannotBeAsked) {
+  for (const char* operation : {"RefreshKovaInfo", "QueryDisks"}) {
+    _host->Change([operation](HostDescription& host) {
+      host.faults = {
+          {.operation = operation, .exception = "HostCtlException", .message = "busy", .disk = {}}};
+    });
+    const Answer answer = _service.InitializeDisks(*Mappings({MappingOf("naa.1", {"naa.2"})}));
+    EXPECT_THAT(Told(answer.fault.Get()), HasSubstr("busy")) << operation;
+  }
+  EXPECT_THAT(heard, IsEmpty());
+}
+
+TEST_F(KovaServiceChanges, RemovesAGroupByAnAbsentDiskOnlyIfThatIsItsCacheDisk) {
+  _host->Change([](HostDescription& host) { host.disks[0].absent = host.disks[2].absent = true; });
+  _inventory->Replace(DescribeInventory(_host->Snapshot()));
+  for (const char* name : {"kova:uuid-of-naa.3", "kova:01234567-89ab-cdef-0123-456789abcdef", "kova:"}) {
+    const Answer answer = _service.RemoveDiskMapping(*MappingOf(name, {}), {});
+    EXPECT_THAT(Told(answer.fault.Get()), StartsWith("mapping.ssd | ")) << name;
+  }
+  EXPECT_THAT(heard, IsEmpty());
+  EXPECT_EQ(Told(_service.RemoveDiskMapping(*MappingOf("kova:uuid-of-naa.1", {}), {}).fault.Get()), "done");
+  EXPECT_THAT(heard, ElementsAre("remove group kova:uuid-of-naa.1!<>   0 0"));
 }
 
 TEST_F(KovaServiceChanges, AnswersAnExceptionOfAHookByASystemErrorWithItsText) {

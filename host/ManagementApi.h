@@ -41,7 +41,7 @@ class ManagementApi {
   }
   // The mounted disk groups: a KovaHostConfigInfoStorageInfo.
   virtual Answer GetStorageInfo() const = 0;
-  // The same, and behind them in `diskMapInfo` the groups that the kernel has but that are not mounted.
+  // The same, and behind them in `diskMapInfo` the other groups that the kernel has: those not mounted.
   virtual Answer GetDiskGroups() const = 0;
   // Cluster, network and fault domain: a KovaHostConfigInfo.
   virtual Answer GetConfigInfo() const = 0;

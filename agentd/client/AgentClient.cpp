@@ -21,7 +21,6 @@ using Orbis::DataArray;
 
 namespace {
 
-constexpr std::string_view unixScheme = "unix:";
 constexpr std::string_view jsonType = "application/json";
 constexpr std::string_view folder = "/api/v1/";
 constexpr std::size_t longestShown = 1024;  // bytes of an answer that is not understood
@@ -73,12 +72,7 @@ constexpr const Orbis::TypeDescriptor* noResult = nullptr;
 
 }  // namespace
 
-AgentClient::AgentClient(const std::string& url) {
-  if (url.compare(0, unixScheme.size(), unixScheme) != 0 || url.size() == unixScheme.size()) {
-    throw std::invalid_argument("the agent's address '" + url + "' must be unix:PATH");
-  }
-  _socketPath = url.substr(unixScheme.size());
-}
+AgentClient::AgentClient(const std::string& url) : _address(ParseAddress(url)) {}
 
 Answer AgentClient::QueryDisksForKova(const std::vector<std::string>& names) const {
   const std::string body = Body().Add("names", Orbis::ArrayOfString(names)).Done();
@@ -146,24 +140,25 @@ std::string AgentClient::Task(const std::string& id) const {
 Answer AgentClient::Ask(const std::string& operation, const std::string& body,
                         const Orbis::TypeDescriptor* resultType, std::chrono::milliseconds patience) const {
   const HttpAnswer http =
-      Exchange(_socketPath, {"POST", std::string(folder) + operation, std::string(jsonType), body}, patience);
+      Exchange(_address, {"POST", std::string(folder) + operation, std::string(jsonType), body}, patience);
   DemandJson(http);
   try {
     return Host::ReadJsonAnswer(http.body, resultType);
   } catch (const Orbis::ParseException& refused) {
-    throw ConnectionError("the answer of the agent on " + _socketPath + " cannot be read: " + refused.what());
+    throw ConnectionError("the answer of the agent on " + _address.Name() +
+                          " cannot be read: " + refused.what());
   }
 }
 
 std::string AgentClient::Get(const std::string& target) const {
-  HttpAnswer http = Exchange(_socketPath, {"GET", std::string(folder) + target, "", ""}, queryPatience);
+  HttpAnswer http = Exchange(_address, {"GET", std::string(folder) + target, "", ""}, queryPatience);
   DemandJson(http);
   return std::move(http.body);
 }
 
 void AgentClient::DemandJson(const HttpAnswer& http) const {
   if (http.contentType != jsonType) {
-    throw ConnectionError("the agent on " + _socketPath + " answered with status " +
+    throw ConnectionError("the agent on " + _address.Name() + " answered with status " +
                           std::to_string(http.status) + ": " + http.body.substr(0, longestShown));
   }
 }

@@ -1,10 +1,11 @@
-// The management API of an agent, over its socket: objects in, objects out.
+// The management API of an agent, over a socket or TCP: objects in, objects out.
 #pragma once
 
 #include <chrono>
 #include <string>
 #include <vector>
 
+#include "agentd/http/HttpAddress.h"
 #include "agentd/http/HttpTypes.h"
 #include "host/ManagementApi.h"
 
@@ -17,7 +18,7 @@ namespace Agentd {
 // other.
 class AgentClient final : public Host::ManagementApi {
  public:
-  // A URL: "unix:/run/kova/agentd.sock". Throws std::invalid_argument for any other.
+  // A URL: "unix:/run/kova/agentd.sock" or "tcp:127.0.0.1:8080". Throws std::invalid_argument for any other.
   explicit AgentClient(const std::string& url);
 
   Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override;
@@ -48,7 +49,7 @@ class AgentClient final : public Host::ManagementApi {
   std::string Get(const std::string& target) const;
   void DemandJson(const HttpAnswer& http) const;
 
-  std::string _socketPath;
+  HttpAddress _address;
 };
 
 }  // namespace Agentd

@@ -196,7 +196,7 @@ TEST(AgentClient, RefusesAJsonAnswerThatIsBroken) {
 }
 
 TEST(AgentClient, TakesOnlyTheAddressOfASocket) {
-  for (const char* url : {"", "unix:", "tcp:127.0.0.1:80", "/run/kova/agentd.sock", "UNIX:/a"}) {
+  for (const char* url : {"", "unix:", "tcp:localhost:80", "/run/kova/agentd.sock", "UNIX:/a"}) {
     EXPECT_THROW(AgentClient client(url), std::invalid_argument) << url;
   }
 }

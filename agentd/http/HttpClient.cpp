@@ -1,6 +1,8 @@
 #include "agentd/http/HttpClient.h"
 
+#include <boost/asio/generic/stream_protocol.hpp>
 #include <boost/asio/io_context.hpp>
+#include <boost/asio/ip/tcp.hpp>
 #include <boost/asio/local/stream_protocol.hpp>
 #include <boost/beast/core.hpp>
 #include <boost/beast/http.hpp>
@@ -11,19 +13,26 @@ namespace {
 namespace asio = boost::asio;
 namespace beast = boost::beast;
 namespace http = beast::http;
-using Protocol = asio::local::stream_protocol;
+using Protocol = asio::generic::stream_protocol;
 using boost::system::error_code;
 
 constexpr std::uint64_t longestAnswer = std::uint64_t{1} << 30;
 
+Protocol::endpoint EndpointOf(const HttpAddress& address) {
+  if (address.isUnix) {
+    return asio::local::stream_protocol::endpoint(address.place);
+  }
+  return asio::ip::tcp::endpoint(asio::ip::make_address(address.place), address.port);
+}
+
 // Blocking calls on a stream that knows time limits: each is started and the network run until it is done.
 class Exchanger {
  public:
-  Exchanger(const std::string& socketPath, std::chrono::milliseconds patience)
-      : _path(socketPath), _patience(patience), _stream(_network) {}
+  Exchanger(const HttpAddress& address, std::chrono::milliseconds patience)
+      : _address(address), _patience(patience), _stream(_network) {}
 
   void Connect() {
-    Demand(Await([&](auto done) { _stream.async_connect(Protocol::endpoint(_path), done); }),
+    Demand(Await([&](auto done) { _stream.async_connect(EndpointOf(_address), done); }),
            "no agent answers on");
   }
 
@@ -55,11 +64,11 @@ class Exchanger {
 
   void Demand(error_code result, const char* failure) const {
     if (result) {
-      throw ConnectionError(std::string(failure) + " " + _path + ": " + result.message());
+      throw ConnectionError(std::string(failure) + " " + _address.Name() + ": " + result.message());
     }
   }
 
-  std::string _path;
+  HttpAddress _address;
   std::chrono::milliseconds _patience;
   asio::io_context _network;
   beast::basic_stream<Protocol> _stream;
@@ -68,16 +77,17 @@ class Exchanger {
 
 }  // namespace
 
-HttpAnswer Exchange(const std::string& socketPath, const HttpRequest& request,
+HttpAnswer Exchange(const HttpAddress& address, const HttpRequest& request,
                     std::chrono::milliseconds patience) {
-  if (socketPath.empty() || socketPath.size() > sizeof(sockaddr_un::sun_path) - 1) {
-    throw ConnectionError("'" + socketPath + "' cannot be the path of a socket: it must have 1 to " +
+  const std::size_t length = address.place.size();
+  if (address.isUnix && (length == 0 || length > sizeof(sockaddr_un::sun_path) - 1)) {
+    throw ConnectionError("'" + address.place + "' cannot be the path of a socket: it must have 1 to " +
                           std::to_string(sizeof(sockaddr_un::sun_path) - 1) + " bytes");
   }
-  Exchanger exchanger(socketPath, patience);
+  Exchanger exchanger(address, patience);
   exchanger.Connect();
   http::request<http::string_body> message(http::string_to_verb(request.method), request.target, 11);
-  message.set(http::field::host, "localhost");
+  message.set(http::field::host, address.isUnix ? "localhost" : address.Name());
   message.keep_alive(false);
   if (!request.contentType.empty()) {
     message.set(http::field::content_type, request.contentType);

@@ -61,7 +61,7 @@ void Say(int connection, const std::string& text) {
 
 std::string WhyNot(const std::string& path, std::chrono::milliseconds patience = std::chrono::seconds(60)) {
   try {
-    Exchange(path, {"GET", "/", "", ""}, patience);
+    Exchange(UnixAddress(path), {"GET", "/", "", ""}, patience);
     return "there was an answer";
   } catch (const ConnectionError& error) {
     return error.what();
@@ -73,7 +73,7 @@ TEST(HttpClient, SendsTheRequestAndReadsTheWholeAnswer) {
   RunningServer server([](const HttpRequest& request) {
     return HttpAnswer{202, request.contentType, request.method + " " + request.target + " " + request.body};
   });
-  const HttpAnswer answer = Exchange(server.Path(), {"POST", "/a?b", "text/y", body});
+  const HttpAnswer answer = Exchange(UnixAddress(server.Path()), {"POST", "/a?b", "text/y", body});
   EXPECT_EQ(answer.status, 202u);
   EXPECT_EQ(answer.contentType, "text/y");
   EXPECT_EQ(answer.body, "POST /a?b " + body);

@@ -2,7 +2,10 @@
 
 #include <boost/asio/buffer.hpp>
 #include <boost/asio/post.hpp>
+#include <boost/asio/write.hpp>
 #include <utility>
+
+#include "agentd/http/TlsServer.h"
 
 namespace Agentd {
 namespace {
@@ -12,28 +15,45 @@ namespace http = boost::beast::http;
 using boost::system::error_code;
 
 constexpr std::chrono::milliseconds discardTime = std::chrono::seconds(2);
-
-HttpAnswer PlainText(unsigned status, const std::string& text) {
-  return {status, "text/plain", text + "\n"};
-}
+constexpr std::size_t bodyPiece = 64 << 10;  // read at a time
+constexpr std::string_view goOn = "HTTP/1.1 100 Continue\r\n\r\n";
 
 // What a request that could not be read is answered with; nothing when the client has gone.
 std::optional<HttpAnswer> Refusal(const error_code& error) {
   if (error == http::error::body_limit) {
-    return PlainText(413, "the body is too large");
+    return RefusedWith(413, "the body is too large");
   }
   if (error == http::error::header_limit) {
-    return PlainText(431, "the header is too large");
+    return RefusedWith(431, "the header is too large");
   }
-  const bool gone =
-      error == http::error::end_of_stream || error.category() == asio::error::get_system_category();
-  return gone ? std::nullopt : std::optional(PlainText(400, "not a request: " + error.message()));
+  if (error == http::error::buffer_overflow) {
+    return RefusedWith(431, "the header of a chunk is too large");
+  }
+  const bool gone = error == http::error::end_of_stream ||
+                    error.category() != http::make_error_code(http::error::end_of_stream).category();
+  return gone ? std::nullopt : std::optional(RefusedWith(400, "not a request: " + error.message()));
+}
+
+HttpRequest FromHeader(const HttpHeader& header, const HttpPeer& peer) {
+  return {.method = std::string(header.method_string()),
+          .target = std::string(header.target()),
+          .contentType = std::string(header[http::field::content_type]),
+          .body = {},
+          .soapAction = std::string(header["SOAPAction"]),
+          .hasOrigin = header.count(http::field::origin) != 0,
+          .peer = peer};
 }
 
 }  // namespace
 
-HttpConnection::HttpConnection(HttpContext& context, Socket socket)
-    : _context(context), _socket(std::move(socket)), _deadline(context.network) {
+HttpConnection::HttpConnection(HttpContext& context, HttpDoor door, HttpPeer peer, HttpStream::Socket socket,
+                               asio::ssl::context* tls)
+    : _context(context),
+      _door(std::move(door)),
+      _peer(std::move(peer)),
+      _stream(std::move(socket), tls),
+      _deadline(context.network),
+      _buffer(context.limits.headerBytes + bodyPiece) {
   _context.connections.insert(this);
 }
 
@@ -44,25 +64,93 @@ HttpConnection::~HttpConnection() {
   }
 }
 
+void HttpConnection::Start(std::optional<HttpAnswer> refusal) {
+  SetDeadline(_context.limits.readTime);
+  _waiting = true;
+  if (_stream.Secured() == nullptr) {
+    Begin(std::move(refusal));
+    return;
+  }
+  _stream.Secured()->async_handshake(
+      HttpStream::Tls::server,
+      [self = shared_from_this(), refusal = std::move(refusal)](error_code error) mutable {
+        self->OnHandshake(error, std::move(refusal));
+      });
+}
+
+void HttpConnection::OnHandshake(Error error, std::optional<HttpAnswer> refusal) {
+  if (error) {
+    return;
+  }
+  HttpPeer known = _context.access.PeerOf(CertificateNames(_stream.Secured()->native_handle()));
+  known.identity += " at " + _peer.identity;
+  _peer = std::move(known);
+  Begin(std::move(refusal));
+}
+
+void HttpConnection::Begin(std::optional<HttpAnswer> refusal) {
+  if (refusal) {
+    Refuse(std::move(*refusal));
+  } else {
+    Read();
+  }
+}
+
 void HttpConnection::Read() {
+  _waiting = true;
   _parser.emplace();
   _parser->header_limit(static_cast<std::uint32_t>(_context.limits.headerBytes));
   _parser->body_limit(_context.limits.bodyBytes);
-  SetDeadline(_context.limits.readTime);
-  _waiting = true;
-  http::async_read(_socket, _buffer, *_parser,
-                   [self = shared_from_this()](error_code error, std::size_t) { self->OnRead(error); });
+  http::async_read_header(
+      _stream, _buffer, *_parser,
+      [self = shared_from_this()](error_code error, std::size_t) { self->OnHeader(error); });
 }
 
-void HttpConnection::OnRead(Error error) {
-  _waiting = false;
-  if (!error) {
-    _deadline.cancel();
-    PassOn();
+void HttpConnection::OnHeader(Error error) {
+  if (error) {
+    GiveUp(error);
     return;
   }
-  const bool tooLate = _late && error == asio::error::operation_aborted && _parser->got_some();
-  if (auto refusal = tooLate ? PlainText(408, "the request took too long") : Refusal(error)) {
+  const HttpHeader& header = _parser->get();
+  _version = header.version();
+  _withBody = header.method() != http::verb::head;
+  if (auto refusal = RefusalOf(header, _door)) {
+    Refuse(std::move(*refusal));
+    return;
+  }
+  _request = FromHeader(header, _peer);
+  if (_parser->is_done() || !WantsContinue(header)) {
+    ReadBody();
+    return;
+  }
+  asio::async_write(_stream, asio::buffer(goOn.data(), goOn.size()),
+                    [self = shared_from_this()](error_code unsent, std::size_t) {
+                      if (unsent) {
+                        self->GiveUp(unsent);
+                      } else {
+                        self->ReadBody();
+                      }
+                    });
+}
+
+void HttpConnection::ReadBody() {
+  http::async_read(_stream, _buffer, *_parser,
+                   [self = shared_from_this()](error_code error, std::size_t) { self->OnBody(error); });
+}
+
+void HttpConnection::OnBody(Error error) {
+  if (error) {
+    GiveUp(error);
+    return;
+  }
+  _waiting = false;
+  _deadline.cancel();
+  PassOn();
+}
+
+void HttpConnection::GiveUp(Error error) {
+  const bool tooLate = _stream.Bare().IsExpired() && error == asio::error::operation_aborted && HasBegun();
+  if (auto refusal = tooLate ? RefusedWith(408, "the request took too long") : Refusal(error)) {
     Refuse(std::move(*refusal));
   }
 }
@@ -70,12 +158,8 @@ void HttpConnection::OnRead(Error error) {
 void HttpConnection::PassOn() {
   http::request<http::string_body> message = _parser->release();
   _keepAlive = message.keep_alive();
-  _version = message.version();
-  _withBody = message.method() != http::verb::head;
-  HttpRequest request{std::string(message.method_string()), std::string(message.target()),
-                      std::string(message[http::field::content_type]), std::move(message.body()),
-                      std::string(message["SOAPAction"])};
-  asio::post(_context.workers, [self = shared_from_this(), request = std::move(request)]() mutable {
+  _request.body = std::move(message.body());
+  asio::post(_context.workers, [self = shared_from_this(), request = std::move(_request)]() mutable {
     Handle(std::move(self), request);
   });
 }
@@ -91,13 +175,14 @@ void HttpConnection::Handle(std::shared_ptr<HttpConnection> self, const HttpRequ
   try {
     handler(request, responder);
   } catch (const std::exception& exception) {
-    responder.Answer(PlainText(500, exception.what()));
+    responder.Answer(RefusedWith(500, exception.what()));
   } catch (...) {
-    responder.Answer(PlainText(500, "an error of an unknown kind"));
+    responder.Answer(RefusedWith(500, "an error of an unknown kind"));
   }
 }
 
 void HttpConnection::Refuse(HttpAnswer answer) {
+  _waiting = false;
   _keepAlive = false;
   _refused = true;
   Write(std::move(answer));
@@ -107,6 +192,7 @@ void HttpConnection::Write(HttpAnswer answer) {
   _keepAlive = _keepAlive && !_context.draining;
   _response.emplace(static_cast<http::status>(answer.status), _version);
   _response->set(http::field::content_type, answer.contentType);
+  _response->set("X-Content-Type-Options", "nosniff");  // a browser must take no answer for a page
   if (answer.retryAfterSeconds > 0) {
     _response->set(http::field::retry_after, std::to_string(answer.retryAfterSeconds));
   }
@@ -116,7 +202,7 @@ void HttpConnection::Write(HttpAnswer answer) {
   }
   _response->keep_alive(_keepAlive);
   SetDeadline(_context.limits.writeTime);
-  http::async_write(_socket, *_response,
+  http::async_write(_stream, *_response,
                     [self = shared_from_this()](error_code error, std::size_t) { self->OnWritten(error); });
 }
 
@@ -125,48 +211,57 @@ void HttpConnection::OnWritten(Error error) {
     return;
   }
   if (_keepAlive && !_context.draining) {
+    SetDeadline(_context.limits.readTime);
     Read();
+  } else {
+    End();
+  }
+}
+
+void HttpConnection::End() {
+  SetDeadline(discardTime);
+  if (_stream.Secured() == nullptr) {
+    CloseSending();
     return;
   }
+  _stream.Secured()->async_shutdown([self = shared_from_this()](error_code) { self->CloseSending(); });
+}
+
+void HttpConnection::CloseSending() {
   error_code ignored;
-  _socket.shutdown(Socket::shutdown_send, ignored);
+  _stream.Bare().Plain().shutdown(HttpStream::Socket::shutdown_send, ignored);
   if (_refused) {
-    SetDeadline(discardTime);
     Discard();
   }
 }
 
 void HttpConnection::Discard() {
-  _socket.async_read_some(asio::buffer(_discarded),
-                          [self = shared_from_this()](error_code error, std::size_t) {
-                            if (!error && !self->_late) {
-                              self->Discard();
-                            }
-                          });
+  _stream.Bare().async_read_some(asio::buffer(_discarded),
+                                 [self = shared_from_this()](error_code error, std::size_t) {
+                                   if (!error) {
+                                     self->Discard();
+                                   }
+                                 });
 }
 
 void HttpConnection::Drain() {
   _keepAlive = false;
   // One that only waits for a request has nothing to lose.
-  if (_waiting && !_parser->got_some()) {
-    error_code ignored;
-    _socket.cancel(ignored);
+  if (_waiting && !HasBegun()) {
+    _stream.Bare().Cancel();
   }
 }
 
 void HttpConnection::SetDeadline(std::chrono::milliseconds time) {
-  _late = false;
+  _stream.Bare().Renew();
   _deadline.expires_after(time);
   // Weak: a deadline far away must not keep a client alive that has gone.
   _deadline.async_wait([weak = weak_from_this()](error_code error) {
     const auto self = weak.lock();
     // A deadline that was moved when it had just passed counts no more.
-    if (error || !self || self->_deadline.expiry() > std::chrono::steady_clock::now()) {
-      return;
+    if (!error && self && self->_deadline.expiry() <= std::chrono::steady_clock::now()) {
+      self->_stream.Bare().Expire();
     }
-    self->_late = true;
-    error_code ignored;
-    self->_socket.cancel(ignored);
   });
 }
 

@@ -7,7 +7,7 @@
 
 #include <array>
 #include <boost/asio/io_context.hpp>
-#include <boost/asio/local/stream_protocol.hpp>
+#include <boost/asio/ssl/context.hpp>
 #include <boost/asio/steady_timer.hpp>
 #include <boost/asio/thread_pool.hpp>
 #include <boost/beast/core/flat_buffer.hpp>
@@ -17,7 +17,9 @@
 #include <optional>
 #include <set>
 
+#include "agentd/http/HttpHeaderRules.h"
 #include "agentd/http/HttpServer.h"
+#include "agentd/http/HttpStream.h"
 
 namespace Agentd {
 
@@ -26,6 +28,8 @@ class HttpConnection;
 // What the server and its connections share.
 struct HttpContext {
   HttpLimits limits;
+  AccessRules access;
+  std::optional<boost::asio::ssl::context> tls;
   HttpDeferringHandler handler;
   boost::asio::io_context& network;
   boost::asio::thread_pool& workers;
@@ -36,46 +40,61 @@ struct HttpContext {
 
 class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
  public:
-  using Socket = boost::asio::local::stream_protocol::socket;
-
-  HttpConnection(HttpContext& context, Socket socket);
+  // `peer` is who connects; with TLS, its role and name are those of the certificate instead. `tls` may be
+  // null.
+  HttpConnection(HttpContext& context, HttpDoor door, HttpPeer peer, HttpStream::Socket socket,
+                 boost::asio::ssl::context* tls);
   ~HttpConnection();
 
-  // Waits for a request, answers it, and so on.
-  void Read();
-  // Answers without having read a request to its end, and closes.
-  void Refuse(HttpAnswer answer);
+  // Agrees on the secrets of TLS, if there is any. Then answers with the refusal and closes or, without one,
+  // waits for a request, answers it, and so on.
+  void Start(std::optional<HttpAnswer> refusal);
   // Ends after the request under way; at once if there is none.
   void Drain();
 
  private:
   using Error = boost::system::error_code;
 
-  void OnRead(Error error);
+  void OnHandshake(Error error, std::optional<HttpAnswer> refusal);
+  void Begin(std::optional<HttpAnswer> refusal);
+  // Waits for the next request, within the time that runs already.
+  void Read();
+  void OnHeader(Error error);
+  void ReadBody();
+  void OnBody(Error error);
+  // Answers what could not be read to its end, if there is still somebody to answer.
+  void GiveUp(Error error);
   void PassOn();
   // Takes the reference along to where the answer comes from: the network's thread must be the one that sees
   // the connection go, so no worker may keep one.
   static void Handle(std::shared_ptr<HttpConnection> self, const HttpRequest& request);
+  // Answers without having read a request to its end, and closes.
+  void Refuse(HttpAnswer answer);
   void Write(HttpAnswer answer);
   void OnWritten(Error error);
+  void End();
+  void CloseSending();
   // Reads what the client still sends, for a moment: closed at once, it might never see the answer.
   void Discard();
-  // Cancels what is under way on the socket after that time.
+  // Ends what is under way on the stream after that time.
   void SetDeadline(std::chrono::milliseconds time);
+  bool HasBegun() const { return _parser && _parser->got_some(); }
 
   HttpContext& _context;
-  Socket _socket;
+  const HttpDoor _door;
+  HttpPeer _peer;
+  HttpStream _stream;
   boost::asio::steady_timer _deadline;
   boost::beast::flat_buffer _buffer;
   std::optional<boost::beast::http::request_parser<boost::beast::http::string_body>> _parser;
   std::optional<boost::beast::http::response<boost::beast::http::string_body>> _response;
   std::array<char, 16384> _discarded;
+  HttpRequest _request;  // what the header says; the fields behind a body in chunks change nothing of it
   unsigned _version = 11;
   bool _keepAlive = true;
   bool _withBody = true;  // the answer's body is sent: not to HEAD
   bool _waiting = false;  // for a request, or for its end
   bool _refused = false;  // the client may still be sending
-  bool _late = false;     // the deadline has passed
 };
 
 }  // namespace Agentd

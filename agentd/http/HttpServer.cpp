@@ -1,38 +1,68 @@
 #include "agentd/http/HttpServer.h"
 
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <boost/asio/io_context.hpp>
-#include <boost/asio/local/stream_protocol.hpp>
+#include <boost/asio/ip/tcp.hpp>
 #include <boost/asio/post.hpp>
 #include <boost/asio/signal_set.hpp>
 #include <boost/asio/steady_timer.hpp>
 #include <boost/asio/thread_pool.hpp>
+#include <boost/asio/write.hpp>
 #include <csignal>
+#include <cstring>
 #include <stdexcept>
 #include <utility>
 
 #include "agentd/http/HttpConnection.h"
+#include "agentd/http/HttpListener.h"
+#include "agentd/http/TlsServer.h"
 #include "agentd/http/UnixSocket.h"
 
 namespace Agentd {
 namespace {
 
 namespace asio = boost::asio;
-using Protocol = asio::local::stream_protocol;
 using boost::system::error_code;
+using Socket = HttpListener::Protocol::socket;
 
-constexpr int socketMask = 0117;  // 0660: owner and group
-constexpr std::chrono::milliseconds acceptPause(100);
+const HttpAnswer tooMany{503, "text/plain", "too many connections; try again later\n"};
+
+// The same for those that cannot even be waited for.
+constexpr std::string_view farTooMany =
+    "HTTP/1.1 503 Service Unavailable\r\nContent-Type: text/plain\r\nContent-Length: 38\r\n"
+    "Connection: close\r\n\r\ntoo many connections; try again later\n";
+
+std::optional<asio::ssl::context> TlsOf(const HttpOptions& options) {
+  return options.tls ? std::optional(MakeTlsContext(*options.tls)) : std::nullopt;
+}
+
+void DemandSafe(const HttpAddress& address, bool hasTls) {
+  if (!hasTls && !address.IsLoopback()) {
+    throw std::runtime_error("cannot listen on " + address.Text() +
+                             " without TLS: other hosts could reach it; give it a certificate, or take a "
+                             "loopback address");
+  }
+}
+
+std::string RemoteName(const Socket& socket) {
+  error_code error;
+  const auto remote = socket.remote_endpoint(error);
+  asio::ip::tcp::endpoint endpoint;
+  if (error || remote.size() > endpoint.capacity()) {
+    return "an unknown address";
+  }
+  endpoint.resize(remote.size());
+  std::memcpy(endpoint.data(), remote.data(), remote.size());
+  return HttpAddress{false, endpoint.address().to_string(), endpoint.port()}.Name();
+}
 
 }  // namespace
 
 class HttpServer::Impl {
  public:
-  Impl(const std::string& socketPath, const HttpLimits& limits, HttpDeferringHandler handler);
+  Impl(const HttpOptions& options, HttpDeferringHandler handler);
   ~Impl();
 
+  std::vector<HttpAddress> Addresses() const;
   bool Run();
   void Stop() {
     asio::post(_network, [this] { BeginDrain(); });
@@ -40,38 +70,37 @@ class HttpServer::Impl {
   void OnStopping(std::function<void()> listener) { _onStopping = std::move(listener); }
 
  private:
-  void Listen();
-  void Accept();
-  void OnAccept(error_code error, Protocol::socket socket);
-  void Welcome(Protocol::socket socket);
+  void Welcome(const HttpListener& listener, Socket socket);
+  HttpPeer PeerOf(const HttpListener& listener, Socket& socket) const;
   void BeginDrain();
-  void CloseSocket();
 
-  const std::string _path;
+  const std::vector<std::string> _serverNames;
   std::function<void()> _onStopping;
   // In this order: whatever still holds connections goes down before what connections use.
   HttpContext _context;
   asio::io_context _network{1};
   asio::thread_pool _workers;
-  Protocol::acceptor _acceptor;
-  asio::steady_timer _acceptTimer;
+  std::vector<std::unique_ptr<HttpListener>> _listeners;
   asio::signal_set _signals;
   asio::steady_timer _drainTimer;
 };
 
-HttpServer::Impl::Impl(const std::string& socketPath, const HttpLimits& limits, HttpDeferringHandler handler)
-    : _path(socketPath),
-      _context{.limits = limits,
+HttpServer::Impl::Impl(const HttpOptions& options, HttpDeferringHandler handler)
+    : _serverNames(options.serverNames),
+      _context{.limits = options.limits,
+               .access = options.access,
+               .tls = TlsOf(options),
                .handler = std::move(handler),
                .network = _network,
                .workers = _workers,
                .onLastGone = {}},
-      _workers(limits.workers),
-      _acceptor(_network),
-      _acceptTimer(_network),
+      _workers(options.limits.workers),
       _signals(_network),
       _drainTimer(_network) {
-  Listen();
+  for (const HttpAddress& address : options.listen) {
+    DemandSafe(address, _context.tls.has_value());
+    _listeners.push_back(std::make_unique<HttpListener>(_network, address));
+  }
   // Now, not when the server runs: whoever sees the socket may already tell it to stop.
   _signals.add(SIGTERM);
   _signals.add(SIGINT);
@@ -84,67 +113,59 @@ HttpServer::Impl::Impl(const std::string& socketPath, const HttpLimits& limits, 
 
 HttpServer::Impl::~Impl() {
   _context.onLastGone = {};
-  CloseSocket();
+  _listeners.clear();
   _workers.stop();  // what no worker has begun is dropped
   _workers.join();
 }
 
-void HttpServer::Impl::Listen() {
-  const SocketPlace place(_path);
-  _acceptor.open();
-  // The mask belongs to the process; nothing else makes files while the agent starts.
-  const mode_t before = umask(socketMask);
-  error_code error;
-  _acceptor.bind(Protocol::endpoint(_path), error);
-  umask(before);
-  if (!error) {
-    _acceptor.listen(asio::socket_base::max_listen_connections, error);
+std::vector<HttpAddress> HttpServer::Impl::Addresses() const {
+  std::vector<HttpAddress> addresses;
+  for (const auto& listener : _listeners) {
+    addresses.push_back(listener->Address());
   }
-  if (error) {
-    throw std::runtime_error("cannot listen on " + _path + ": " + error.message());
-  }
+  return addresses;
 }
 
 bool HttpServer::Impl::Run() {
-  Accept();
+  for (const auto& listener : _listeners) {
+    listener->Accept([this](const HttpListener& at, Socket socket) { Welcome(at, std::move(socket)); });
+  }
   _network.run();
   return _context.connections.empty();
 }
 
-void HttpServer::Impl::Accept() {
-  _acceptor.async_accept(
-      [this](error_code error, Protocol::socket socket) { OnAccept(error, std::move(socket)); });
-}
-
-void HttpServer::Impl::OnAccept(error_code error, Protocol::socket socket) {
-  if (_context.draining || error == asio::error::operation_aborted) {
-    return;
-  }
-  if (!error) {
-    Welcome(std::move(socket));
-    Accept();
-    return;
-  }
-  // No descriptors left, for one: trying again at once would only burn the processor.
-  _acceptTimer.expires_after(acceptPause);
-  _acceptTimer.async_wait([this](error_code cancelled) {
-    if (!cancelled) {
-      Accept();
-    }
-  });
-}
-
-void HttpServer::Impl::Welcome(Protocol::socket socket) {
+void HttpServer::Impl::Welcome(const HttpListener& listener, Socket socket) {
+  const HttpAddress& address = listener.Address();
+  asio::ssl::context* const tls = address.isUnix || !_context.tls ? nullptr : &*_context.tls;
   const std::size_t before = _context.connections.size();
   const std::size_t limit = _context.limits.connections;
-  if (before >= 2 * limit) {
-    return;  // even those that wait for their refusal are too many
+  error_code ignored;
+  if (before >= 2 * limit) {  // even those that wait for their refusal are too many
+    socket.non_blocking(true, ignored);
+    if (tls == nullptr) {
+      socket.write_some(asio::buffer(farTooMany.data(), farTooMany.size()), ignored);
+    }
+    return;
   }
-  const auto connection = std::make_shared<HttpConnection>(_context, std::move(socket));
-  if (before >= limit) {
-    connection->Refuse({503, "text/plain", "too many connections; try again later\n"});
-  } else {
-    connection->Read();
+  HttpDoor door;
+  if (!address.isUnix) {
+    socket.set_option(asio::ip::tcp::no_delay(true), ignored);
+    door = {address.port, _serverNames};
+  }
+  HttpPeer peer = PeerOf(listener, socket);
+  std::make_shared<HttpConnection>(_context, std::move(door), std::move(peer), std::move(socket), tls)
+      ->Start(before >= limit ? std::optional(tooMany) : std::nullopt);
+}
+
+HttpPeer HttpServer::Impl::PeerOf(const HttpListener& listener, Socket& socket) const {
+  if (!listener.Address().isUnix) {
+    // With TLS, nothing is granted before the certificate is known.
+    return {_context.tls ? HttpRole::None : HttpRole::Read, RemoteName(socket)};
+  }
+  try {
+    return _context.access.PeerOf(CredentialsOf(socket.native_handle()));
+  } catch (const std::runtime_error& unknown) {
+    return {HttpRole::None, unknown.what()};
   }
 }
 
@@ -153,8 +174,9 @@ void HttpServer::Impl::BeginDrain() {
     return;
   }
   _context.draining = true;
-  CloseSocket();
-  _acceptTimer.cancel();
+  for (const auto& listener : _listeners) {
+    listener->Close();
+  }
   error_code ignored;
   _signals.cancel(ignored);
   if (_onStopping) {
@@ -176,24 +198,18 @@ void HttpServer::Impl::BeginDrain() {
   }
 }
 
-// The file goes first, and only while the socket is ours: later, another agent's may stand there.
-void HttpServer::Impl::CloseSocket() {
-  if (_acceptor.is_open()) {
-    unlink(_path.c_str());
-    error_code ignored;
-    _acceptor.close(ignored);
-  }
-}
-
-HttpServer::HttpServer(const std::string& socketPath, const HttpLimits& limits, HttpHandler handler)
-    : HttpServer(socketPath, limits,
+HttpServer::HttpServer(const HttpOptions& options, HttpHandler handler)
+    : HttpServer(options,
                  HttpDeferringHandler([handler = std::move(handler)](const HttpRequest& request,
                                                                      const HttpResponder& responder) {
                    responder.Answer(handler(request));
                  })) {}
-HttpServer::HttpServer(const std::string& socketPath, const HttpLimits& limits, HttpDeferringHandler handler)
-    : _impl(std::make_unique<Impl>(socketPath, limits, std::move(handler))) {}
+HttpServer::HttpServer(const HttpOptions& options, HttpDeferringHandler handler)
+    : _impl(std::make_unique<Impl>(options, std::move(handler))) {}
 HttpServer::~HttpServer() = default;
+std::vector<HttpAddress> HttpServer::Addresses() const {
+  return _impl->Addresses();
+}
 bool HttpServer::Run() {
   return _impl->Run();
 }

@@ -1,17 +1,19 @@
-// An HTTP server on a Unix socket.
+// An HTTP server on Unix sockets and TCP ports, with TLS or without.
 //
 // Connections live on one thread, the one in Run; requests are handled on a small pool of workers, so that a
 // slow request holds up neither the others nor the network. A handler may also leave its answer for later: it
 // then holds up no worker either, however long that takes. Requests beyond a limit are answered with a status
-// that says which (see HttpLimits).
+// that says which (see HttpLimits), and those that could come from a stranger's page, or that leave open what
+// they mean, with the reason. Each request says who asks: a process on a Unix socket by its user and groups,
+// a client of TLS by its certificate (see AccessRules); whoever else reaches a TCP port may read.
 #pragma once
 
 #include <functional>
 #include <memory>
-#include <string>
+#include <vector>
 
+#include "agentd/http/HttpOptions.h"
 #include "agentd/http/HttpResponder.h"
-#include "agentd/http/HttpTypes.h"
 
 namespace Agentd {
 
@@ -22,18 +24,21 @@ using HttpDeferringHandler = std::function<void(const HttpRequest&, const HttpRe
 
 class HttpServer {
  public:
-  // Binds the socket (mode 0660) and listens; from here on SIGTERM and SIGINT are the server's. Throws
-  // std::runtime_error that names the path.
-  HttpServer(const std::string& socketPath, const HttpLimits& limits, HttpHandler handler);
-  HttpServer(const std::string& socketPath, const HttpLimits& limits, HttpDeferringHandler handler);
+  // Binds the addresses (Unix sockets with mode 0660) and listens; from here on SIGTERM and SIGINT are the
+  // server's. Throws std::runtime_error that names the address or the file.
+  HttpServer(const HttpOptions& options, HttpHandler handler);
+  HttpServer(const HttpOptions& options, HttpDeferringHandler handler);
   // Waits for handlers that still run. Whoever holds a responder must have let go of it by then.
   ~HttpServer();
+
+  // As they are answered on, in the order of the options: with the ports that were found.
+  std::vector<HttpAddress> Addresses() const;
 
   // Told, on the thread in Run, when the server stops accepting, and before it waits for what is in flight.
   // Set before Run.
   void OnStopping(std::function<void()> listener);
 
-  // Serves until Stop or one of SIGTERM and SIGINT; then removes the socket, accepts nothing more, finishes
+  // Serves until Stop or one of SIGTERM and SIGINT; then removes the sockets, accepts nothing more, finishes
   // what is in flight within the drain time, and returns. False when the time was too short for that: a
   // handler may still run, or an answer may still be outstanding.
   bool Run();

@@ -50,8 +50,8 @@ TEST(HttpServerLimits, AClientThatIsStillSendingLearnsWhyItIsRefused) {
   HttpLimits limits;
   limits.bodyBytes = 1000;
   RunningServer server(&Testing::Echo, limits);
-  const HttpAnswer answer =
-      Exchange(server.Path(), {"POST", "/", "text/plain", std::string(std::size_t{4} << 20, 'b')});
+  const HttpAnswer answer = Exchange(UnixAddress(server.Path()),
+                                     {"POST", "/", "text/plain", std::string(std::size_t{4} << 20, 'b')});
   EXPECT_EQ(answer.status, 413u);
 
   RawClient stubborn(server.Path());

@@ -173,14 +173,14 @@ TEST(HttpServer, StoppedWhileNobodyIsConnectedReturnsAndRemovesTheSocket) {
 
 TEST(HttpServer, StoppedBeforeItRunsReturnsAtOnce) {
   const std::string path = Testing::FreshSocketPath();
-  HttpServer server(path, {}, &Testing::Echo);
+  HttpServer server(Testing::OnSocket(path), &Testing::Echo);
   server.Stop();
   EXPECT_TRUE(server.Run());
 }
 
 TEST(HttpServer, ThatNeverRanRemovesItsSocket) {
   const std::string path = Testing::FreshSocketPath();
-  { HttpServer server(path, {}, &Testing::Echo); }
+  { HttpServer server(Testing::OnSocket(path), &Testing::Echo); }
   EXPECT_FALSE(std::filesystem::exists(path));
 }
 
@@ -225,7 +225,7 @@ TEST(HttpServer, LeavesASuccessorsSocketAlone) {
   gate.WaitUntilEntered();
   server->Server().Stop();
   WaitUntilNobodyAnswers(path);
-  const HttpServer successor(path, {}, &Testing::Echo);
+  const HttpServer successor(Testing::OnSocket(path), &Testing::Echo);
   gate.Open();
   server.reset();
   EXPECT_TRUE(std::filesystem::exists(path));

@@ -4,8 +4,23 @@
 #include <chrono>
 #include <cstddef>
 #include <string>
+#include <string_view>
 
 namespace Agentd {
+
+// What a client may ask for. Each role includes those before it.
+enum class HttpRole { None, Read, Change };
+
+constexpr std::string_view NameOf(HttpRole role) {
+  constexpr std::string_view names[] = {"none", "read", "change"};
+  return names[static_cast<std::size_t>(role)];
+}
+
+// Who asks. Made by the server, never by what the client says of itself.
+struct HttpPeer {
+  HttpRole role = HttpRole::None;
+  std::string identity = {};  // for people and logs; printable
+};
 
 struct HttpRequest {
   std::string method;       // "GET"
@@ -13,6 +28,8 @@ struct HttpRequest {
   std::string contentType;  // empty: none
   std::string body;
   std::string soapAction = {};  // of the header of that name; empty: none
+  bool hasOrigin = false;       // a page in a browser sends this
+  HttpPeer peer = {};
 };
 
 struct HttpAnswer {

@@ -10,6 +10,7 @@
 #include <cstring>
 #include <filesystem>
 #include <stdexcept>
+#include <utility>
 
 namespace Agentd {
 namespace {
@@ -102,6 +103,29 @@ SocketPlace::~SocketPlace() {
   if (_folder >= 0) {
     close(_folder);
   }
+}
+
+ProcessCredentials CredentialsOf(int connected) {
+  ucred process{};
+  socklen_t size = sizeof process;
+  if (getsockopt(connected, SOL_SOCKET, SO_PEERCRED, &process, &size) != 0) {
+    throw std::runtime_error(std::string("cannot tell who connects: ") + std::strerror(errno));
+  }
+  std::vector<gid_t> groups(16);
+  for (;;) {
+    size = static_cast<socklen_t>(groups.size() * sizeof(gid_t));
+    const int failed = getsockopt(connected, SOL_SOCKET, SO_PEERGROUPS, groups.data(), &size);
+    if (failed != 0 && errno != ERANGE) {
+      throw std::runtime_error(std::string("cannot tell the groups of who connects: ") +
+                               std::strerror(errno));
+    }
+    groups.resize(size / sizeof(gid_t));  // too few: as many as there are
+    if (failed == 0) {
+      break;
+    }
+  }
+  groups.push_back(process.gid);
+  return {process.uid, std::move(groups)};
 }
 
 }  // namespace Agentd

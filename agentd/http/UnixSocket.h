@@ -1,7 +1,9 @@
-// The file that a Unix socket is reached by.
+// The file that a Unix socket is reached by, and who is at its other end.
 #pragma once
 
 #include <string>
+
+#include "agentd/http/AccessRules.h"
 
 namespace Agentd {
 
@@ -21,5 +23,8 @@ class SocketPlace {
  private:
   int _folder = -1;  // locked
 };
+
+// Of the other side of a connected Unix socket. Throws std::runtime_error.
+ProcessCredentials CredentialsOf(int connected);
 
 }  // namespace Agentd

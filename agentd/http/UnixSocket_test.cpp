@@ -82,7 +82,7 @@ TEST_F(UnixSocket, AStaleSocketIsRemoved) {
 }
 
 TEST_F(UnixSocket, ASocketThatSomebodyAnswersOnStays) {
-  const HttpServer other(_path, {}, &Testing::Echo);
+  const HttpServer other(Testing::OnSocket(_path), &Testing::Echo);
   EXPECT_THAT(WhyNot(_path), AllOf(HasSubstr("another agent"), HasSubstr(_path)));
   EXPECT_TRUE(fs::exists(_path));
 }
@@ -126,9 +126,23 @@ TEST_F(UnixSocket, AFolderThatCannotBeMadeIsNamed) {
 
 TEST_F(UnixSocket, OfAServerIsForOwnerAndGroupWhateverTheMask) {
   const mode_t before = umask(0);
-  const HttpServer server(_path, {}, &Testing::Echo);
+  const HttpServer server(Testing::OnSocket(_path), &Testing::Echo);
   EXPECT_EQ(umask(before), 0u) << "the mask is put back";
   EXPECT_EQ(ModeOf(_path), 0660u);
+}
+
+TEST_F(UnixSocket, TellsWhoIsAtItsOtherEndWithAllTheirGroups) {
+  int ends[2];
+  ASSERT_EQ(socketpair(AF_UNIX, SOCK_STREAM, 0, ends), 0);
+  const ProcessCredentials self = CredentialsOf(ends[0]);
+  EXPECT_EQ(self.uid, geteuid());
+  std::vector<gid_t> groups(static_cast<std::size_t>(getgroups(0, nullptr)));
+  ASSERT_GE(getgroups(static_cast<int>(groups.size()), groups.data()), 0);
+  groups.push_back(getegid());
+  EXPECT_THAT(self.groups, testing::UnorderedElementsAreArray(groups));
+  close(ends[0]);
+  close(ends[1]);
+  EXPECT_THROW(CredentialsOf(-1), std::runtime_error);
 }
 
 TEST_F(UnixSocket, OfManyServersThatStartTogetherExactlyOneGetsThePlace) {
@@ -142,7 +156,7 @@ TEST_F(UnixSocket, OfManyServersThatStartTogetherExactlyOneGetsThePlace) {
     starts.push_back(std::async(std::launch::async, [&] {
       std::unique_ptr<HttpServer> server;
       try {
-        server = std::make_unique<HttpServer>(_path, HttpLimits(), &Testing::Echo);
+        server = std::make_unique<HttpServer>(Testing::OnSocket(_path), &Testing::Echo);
       } catch (const std::runtime_error&) {
       }
       if (++tried == count) {

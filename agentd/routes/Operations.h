@@ -41,4 +41,11 @@ const Operation* FindOperation(std::string_view name);
 
 const std::vector<Operation>& Operations();
 
+// Cuts the arguments down to what the operations look at. Too many of anything, or too long a name, are
+// refused by an InvalidArgument, before the request waits for its turn.
+void Bound(Arguments& arguments);
+
+// Roughly the bytes that they take in memory; bounded ones.
+std::size_t WeightOf(const Arguments& arguments);
+
 }  // namespace Agentd

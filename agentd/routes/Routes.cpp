@@ -7,13 +7,17 @@
 #include <utility>
 
 #include "agentd/http/HttpTarget.h"
+#include "agentd/http/Shown.h"
 #include "agentd/routes/JsonAnswers.h"
 #include "agentd/routes/Operations.h"
+#include "agentd/routes/Permission.h"
 #include "agentd/routes/RequestReader.h"
+#include "agentd/routes/SoapAnswer.h"
 #include "agentd/routes/SoapEndpoint.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
+#include "host/Text.h"
 #include "nox/Documents.h"
 #include "orbis/ParseException.h"
 
@@ -40,7 +44,7 @@ bool HasOnly(std::string_view known, const Call& call) {
   for (const auto& [name, value] : call.target.parameters) {
     if (name != known) {
       call.responder.Answer(PlainText(
-          400, "unknown parameter '" + name + "'" +
+          400, "unknown parameter '" + Shown(name) + "'" +
                    (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'")));
       return false;
     }
@@ -66,23 +70,26 @@ void GetPlain(const Call& call) {
 }
 
 // Hands the work to the queue. The client gets the answer when it is done or, without waiting, the task.
-void Submit(const Call& call, const std::string& operation, const ReadRequest& request,
-            TaskQueue::Work work) {
-  try {
-    if (!request.wait) {
-      call.responder.Answer(DescribeTask(202, call.tasks.Submit(operation, request.label, std::move(work))));
-      return;
-    }
-    call.tasks.Submit(operation, request.label, std::move(work),
-                      [responder = call.responder](const Task& ended) { responder.Answer(ToHttp(ended)); });
-  } catch (const Orbis::MethodFault::Exception& busy) {
-    call.responder.Answer(ToHttp(Host::Answer{.result = nullptr, .fault = busy.GetFault()}));
+void Submit(const Call& call, const std::string& operation, const ReadRequest& request, TaskQueue::Work work,
+            std::size_t bytes) {
+  if (!request.wait) {
+    call.responder.Answer(
+        DescribeTask(202, call.tasks.Submit(operation, request.label, std::move(work), {}, bytes)));
+    return;
   }
+  call.tasks.Submit(
+      operation, request.label, std::move(work),
+      [responder = call.responder](const Task& ended) { responder.Answer(ToHttp(ended)); }, bytes);
 }
 
 void PostOperation(const Call& call) {
   const Operation& operation = *FindOperation(call.rest);
+  if (const auto refusal = RefusalOf(call.request, operation.changes ? HttpRole::Change : HttpRole::Read)) {
+    call.responder.Answer(ToHttp(*refusal));
+    return;
+  }
   ReadRequest request = ReadJsonRequest(operation, call.request.body);
+  Bound(request.arguments);
   if (operation.callWritten != nullptr) {
     call.responder.Answer(ToHttp(operation.callWritten(call.api, request.arguments)));
     return;
@@ -91,10 +98,13 @@ void PostOperation(const Call& call) {
     call.responder.Answer(ToHttp(operation.call(call.api, request.arguments)));
     return;
   }
-  Submit(call, std::string(operation.name), request,
-         [&api = call.api, &operation, arguments = std::move(request.arguments)] {
-           return operation.call(api, arguments);
-         });
+  const std::size_t bytes = WeightOf(request.arguments);
+  Submit(
+      call, std::string(operation.name), request,
+      [&api = call.api, &operation, arguments = std::move(request.arguments)] {
+        return operation.call(api, arguments);
+      },
+      bytes);
 }
 
 void GetTasks(const Call& call) {
@@ -122,8 +132,10 @@ void GetHost(const Call& call) {
 
 // A task like any other: nothing changes the host while a request is at work on it.
 void PostHost(const Call& call) {
-  Submit(call, "ChangeHost", ReadRequest(),
-         [&api = call.api, change = call.request.body] { return api.ChangeHost(change); });
+  Submit(
+      call, "ChangeHost", ReadRequest(),
+      [&api = call.api, change = call.request.body] { return api.ChangeHost(change); },
+      call.request.body.size());
 }
 
 void GetDescription(const Call& call) {
@@ -153,6 +165,7 @@ bool IsOperation(std::string_view rest) {
 }
 
 struct Route {
+  HttpRole role;              // what it takes; an operation may take more
   std::string_view bodyType;  // what a POST must be; empty for a GET
   std::string_view path;
   bool (*takes)(std::string_view rest);  // what stands behind the path
@@ -160,18 +173,18 @@ struct Route {
 };
 
 constexpr std::array<Route, 12> routes = {{
-    {"", "/healthz", &IsNothing, &Health},
-    {"", "/api/v1/disks", &IsNothing, &GetDisks},
-    {"", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
-    {"", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
-    {"", "/api/v1/openapi.json", &IsNothing, &GetDescription},
-    {"", "/api/v1/tasks", &IsNothing, &GetTasks},
-    {"", "/api/v1/tasks/", &IsId, &GetTask},
-    {"", "/api/v1/host", &IsNothing, &GetHost},
-    {jsonType, "/api/v1/host", &IsNothing, &PostHost},
-    {jsonType, "/api/v1/", &IsOperation, &PostOperation},
-    {"", "/soap", &IsNothing, &GetSoap},
-    {xmlType, "/soap", &IsNothing, &PostSoap},
+    {HttpRole::None, "", "/healthz", &IsNothing, &Health},
+    {HttpRole::Read, "", "/api/v1/disks", &IsNothing, &GetDisks},
+    {HttpRole::Read, "", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
+    {HttpRole::Read, "", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
+    {HttpRole::Read, "", "/api/v1/openapi.json", &IsNothing, &GetDescription},
+    {HttpRole::Read, "", "/api/v1/tasks", &IsNothing, &GetTasks},
+    {HttpRole::Read, "", "/api/v1/tasks/", &IsId, &GetTask},
+    {HttpRole::Read, "", "/api/v1/host", &IsNothing, &GetHost},
+    {HttpRole::Change, jsonType, "/api/v1/host", &IsNothing, &PostHost},
+    {HttpRole::None, jsonType, "/api/v1/", &IsOperation, &PostOperation},
+    {HttpRole::Read, "", "/soap", &IsNothing, &GetSoap},
+    {HttpRole::Read, xmlType, "/soap", &IsNothing, &PostSoap},
 }};
 
 bool Leads(const Route& route, std::string_view path) {
@@ -188,7 +201,15 @@ bool IsOfType(std::string_view wanted, std::string_view contentType) {
   return type == wanted;
 }
 
+void Refuse(const Route& route, const Call& call, const Host::Answer& refusal) {
+  call.responder.Answer(route.bodyType == xmlType ? ToSoap("", refusal) : ToHttp(refusal));
+}
+
 void Follow(const Route& route, const Call& call) {
+  if (const auto refusal = RefusalOf(call.request, route.role)) {
+    Refuse(route, call, *refusal);
+    return;
+  }
   if (!route.bodyType.empty() && !IsOfType(route.bodyType, call.request.contentType)) {
     call.responder.Answer(PlainText(415, "the body must be " + std::string(route.bodyType)));
     return;
@@ -197,6 +218,8 @@ void Follow(const Route& route, const Call& call) {
     route.serve(call);
   } catch (const Orbis::ParseException& refused) {
     call.responder.Answer(PlainText(400, refused.what()));
+  } catch (const Orbis::MethodFault::Exception& refused) {
+    call.responder.Answer(ToHttp(Host::Answer{.result = nullptr, .fault = refused.GetFault()}));
   }
 }
 

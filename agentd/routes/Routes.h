@@ -21,6 +21,9 @@
 //   403  NotPermitted        404, 405, 415  the path, the method or the type of the body (text)
 //   500  any other fault, and every SOAP fault     503            Busy, with Retry-After
 //
+// A request takes the role read, or change if it changes something; /healthz takes none. A client without the
+// role is answered with NotPermitted.
+//
 // Queries are answered on the calling thread. Changes are handed to the task queue, and answered by it when
 // their turn has come: however many wait, and however long one takes, no thread waits for them here.
 #pragma once

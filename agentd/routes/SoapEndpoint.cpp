@@ -5,6 +5,7 @@
 
 #include "agentd/http/HttpTarget.h"
 #include "agentd/routes/JsonAnswers.h"
+#include "agentd/routes/Permission.h"
 #include "agentd/routes/SoapAnswer.h"
 #include "agentd/routes/SoapRequest.h"
 #include "agentd/tasks/TaskQueue.h"
@@ -44,6 +45,7 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
   try {
     SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
     const Operation& operation = *read.operation;
+    Bound(read.arguments);
     if (operation.callWritten != nullptr) {
       responder.Answer(Written(operation.name, operation.callWritten(api, read.arguments)));
       return;
@@ -52,14 +54,19 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
       responder.Answer(Written(operation.name, operation.call(api, read.arguments)));
       return;
     }
+    if (const auto refusal = RefusalOf(request, HttpRole::Change)) {
+      responder.Answer(ToSoap("", *refusal));
+      return;
+    }
+    const std::size_t bytes = WeightOf(read.arguments);
     tasks.Submit(
         std::string(operation.name), read.label,
         [&api, &operation, arguments = std::move(read.arguments)] { return operation.call(api, arguments); },
-        [responder](const Task& ended) { responder.Answer(Written(ended.operation, ended.answer)); });
+        [responder](const Task& ended) { responder.Answer(Written(ended.operation, ended.answer)); }, bytes);
   } catch (const Orbis::ParseException& refused) {
     responder.Answer(ToSoap(refused));
-  } catch (const Orbis::MethodFault::Exception& busy) {
-    responder.Answer(ToSoap("", Host::Answer{.result = nullptr, .fault = busy.GetFault()}));
+  } catch (const Orbis::MethodFault::Exception& refused) {
+    responder.Answer(ToSoap("", Host::Answer{.result = nullptr, .fault = refused.GetFault()}));
   }
 }
 

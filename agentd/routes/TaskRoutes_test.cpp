@@ -3,6 +3,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <atomic>
+#include <memory>
+
 #include "agentd/routes/Routes.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "agentd/testing/FakeApi.h"
@@ -38,7 +41,7 @@ class TaskRoutes : public testing::Test {
   }
   // Hands the request over without waiting for an answer.
   void Start(const std::string& operation, const std::string& body) const {
-    _router.Serve({"POST", "/api/v1/" + operation, "application/json", body},
+    _router.Serve(Testing::By(HttpRole::Change, {"POST", "/api/v1/" + operation, "application/json", body}),
                   HttpResponder([](const HttpAnswer&) {}));
   }
   // The worker stays in the first operation until the gate is opened.
@@ -145,7 +148,8 @@ TEST_F(TaskRoutes, AChangeBeyondTheLimitIsBusyAndSaysWhenToComeBack) {
 TEST_F(TaskRoutes, AChangeThatWaitsWhenTheAgentStopsIsBusy) {
   HoldTheWorker();
   std::promise<HttpAnswer> answered;
-  _router.Serve({"POST", "/api/v1/RemoveDisk", "application/json", R"({"disk": "naa.1"})"},
+  _router.Serve(Testing::By(HttpRole::Change,
+                            {"POST", "/api/v1/RemoveDisk", "application/json", R"({"disk": "naa.1"})"}),
                 HttpResponder([&answered](HttpAnswer answer) { answered.set_value(std::move(answer)); }));
   _tasks.Close();
   const HttpAnswer answer = answered.get_future().get();
@@ -184,6 +188,40 @@ TEST_F(TaskRoutes, AHostThatIsNotSimulatedHasNoDescription) {
   const HttpAnswer answer = Get("/api/v1/host");
   EXPECT_EQ(answer.status, 404u);
   EXPECT_THAT(answer.body, HasSubstr("no simulated host"));
+}
+
+TEST_F(TaskRoutes, TooLargeAGroupOrTooLongANameIsRefusedBeforeItWaits) {
+  std::string disks = "\"f\"";
+  for (int i = 0; i < 1000; ++i) {
+    disks += ",\"f\"";
+  }
+  const HttpAnswer large =
+      Post("UnmountDiskMapping", R"({"wait": false, "mappings": [{"ssd": "f", "nonSsd": [)" + disks + "]}]}");
+  EXPECT_EQ(large.status, 400u);
+  EXPECT_THAT(large.body, AllOf(HasSubstr("InvalidArgument"), HasSubstr("mappings[0].nonSsd")));
+  const HttpAnswer longName = Post("AddDisks", R"({"disks": [")" + std::string(1025, 'n') + "\"]}");
+  EXPECT_EQ(longName.status, 400u);
+  EXPECT_THAT(longName.body, HasSubstr("disks[0]"));
+  EXPECT_THAT(_tasks.List(), IsEmpty());
+  EXPECT_THAT(_api.Asked(), IsEmpty());
+}
+
+TEST_F(TaskRoutes, ChangesOfTheHostCountByTheirBytesWhileTheyWait) {
+  TaskQueue tasks({.waitingBytes = 1000});
+  const Router router(_api, tasks);
+  const auto change = [&router](std::size_t bytes) {
+    const auto status = std::make_shared<std::atomic<unsigned>>(0);
+    router.Serve({"POST", "/api/v1/host", "application/json", std::string(bytes, ' ')},
+                 HttpResponder([status](const HttpAnswer& given) { *status = given.status; }));
+    return status->load();
+  };
+  _api.onChange = [this] { _gate.Enter(); };
+  change(1);
+  _gate.WaitUntilEntered();
+  change(600);
+  EXPECT_EQ(change(600), 503u);
+  _gate.Open();
+  tasks.Finish();
 }
 
 }  // namespace

@@ -1,14 +1,20 @@
 // A client for tests of the server: it sends exactly the bytes it is given.
 #pragma once
 
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <poll.h>
 #include <sys/socket.h>
 #include <sys/un.h>
 #include <unistd.h>
 
+#include <chrono>
 #include <cstring>
 #include <stdexcept>
 #include <string>
 #include <string_view>
+
+#include "agentd/http/HttpAddress.h"
 
 namespace Agentd::Testing {
 
@@ -26,10 +32,15 @@ class RawClient {
     sockaddr_un address{};
     address.sun_family = AF_UNIX;
     std::memcpy(address.sun_path, path.data(), path.size());
-    if (connect(_socket, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
-      close(_socket);
-      throw std::runtime_error("nobody answers on " + path);
-    }
+    Connect(reinterpret_cast<const sockaddr*>(&address), sizeof address, path);
+  }
+  // Of TCP, version 4.
+  explicit RawClient(const HttpAddress& tcp) : _socket(socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(tcp.port);
+    inet_pton(AF_INET, tcp.place.c_str(), &address.sin_addr);
+    Connect(reinterpret_cast<const sockaddr*>(&address), sizeof address, tcp.Name());
   }
   ~RawClient() { close(_socket); }
   RawClient(const RawClient&) = delete;
@@ -45,6 +56,12 @@ class RawClient {
       text.remove_prefix(static_cast<std::size_t>(sent));
     }
     return true;
+  }
+
+  // Whether there is something to read, or nothing more will come; waits so long for it.
+  bool HasAnswer(std::chrono::milliseconds patience) const {
+    pollfd waiting{_socket, POLLIN, 0};
+    return poll(&waiting, 1, static_cast<int>(patience.count())) > 0;
   }
 
   void EndSending() const { shutdown(_socket, SHUT_WR); }
@@ -86,6 +103,13 @@ class RawClient {
   bool IsClosed() { return _buffer.empty() && !ReadMore(); }
 
  private:
+  void Connect(const sockaddr* address, socklen_t size, const std::string& name) const {
+    if (connect(_socket, address, size) != 0) {
+      close(_socket);
+      throw std::runtime_error("nobody answers on " + name);
+    }
+  }
+
   bool ReadMore() {
     char chunk[4096];
     const ssize_t count = recv(_socket, chunk, sizeof chunk, 0);

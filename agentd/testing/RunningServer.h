@@ -24,21 +24,37 @@ inline HttpAnswer Echo(const HttpRequest& request) {
   return {200, "text/plain", request.method + " " + request.target + " " + request.body};
 }
 
-// What a handler answers, however late.
-inline HttpAnswer AnswerOf(const HttpDeferringHandler& handler, const HttpRequest& request) {
+inline HttpOptions OnSocket(const std::string& path, const HttpLimits& limits = {}) {
+  return {.listen = {UnixAddress(path)}, .limits = limits};
+}
+
+// The request as it comes from a client of that role.
+inline HttpRequest By(HttpRole role, HttpRequest request) {
+  request.peer = {role, "a test"};
+  return request;
+}
+
+// What a handler answers, however late, to a client of that role.
+inline HttpAnswer AnswerOf(const HttpDeferringHandler& handler, const HttpRequest& request,
+                           HttpRole role = HttpRole::Change) {
   const auto answered = std::make_shared<std::promise<HttpAnswer>>();
-  handler(request, HttpResponder([answered](HttpAnswer answer) { answered->set_value(std::move(answer)); }));
+  handler(By(role, request),
+          HttpResponder([answered](HttpAnswer answer) { answered->set_value(std::move(answer)); }));
   return answered->get_future().get();
 }
 
 class RunningServer {
  public:
   explicit RunningServer(HttpHandler handler = &Echo, const HttpLimits& limits = {})
-      : _server(_path, limits, std::move(handler)),
+      : _server(OnSocket(_path, limits), std::move(handler)),
+        _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
+  template <class Handler>
+  RunningServer(const HttpOptions& options, Handler handler)
+      : _server(options, std::move(handler)),
         _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
   explicit RunningServer(HttpDeferringHandler handler, const HttpLimits& limits = {},
                          std::function<void()> onStopping = {})
-      : _server(_path, limits, std::move(handler)),
+      : _server(OnSocket(_path, limits), std::move(handler)),
         _run(std::async(std::launch::async, [this, onStopping = std::move(onStopping)] {
           _server.OnStopping(onStopping);
           return _server.Run();
@@ -48,6 +64,7 @@ class RunningServer {
   RunningServer& operator=(const RunningServer&) = delete;
 
   const std::string& Path() const { return _path; }
+  HttpAddress Address(std::size_t at = 0) const { return _server.Addresses().at(at); }
   HttpServer& Server() { return _server; }
 
   // Waits for Run to return; what it returned.

@@ -7,7 +7,8 @@
 // recursive: an operation releases the operation lock before it calls one that takes it.
 //
 // Answers: `faultText` and `resultText` are appended to, never assigned. An operation turns the kernel's
-// exceptions into faults; any other exception leaves it, with all locks released.
+// exceptions, and faults thrown on its way, into its fault, or logs them where it says so; any other
+// exception leaves it, with all locks released.
 #pragma once
 
 #include <memory>
@@ -47,7 +48,8 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
 
   // The order of these operations is that of the operation table and must not change. A text of a request
   // that is not of the wanted type ends the process; one that cannot be read throws Orbis::ParseException. A
-  // disk without a name throws Tessa::NotInitializedException. `requestTag` goes down to the kernel unread.
+  // disk without a name throws Tessa::NotInitializedException. `requestTag` goes down to the kernel unread
+  // where groups are made, and nowhere else.
 
   // Plans disk groups from the disks and makes them, and mounts the groups that the disks already form. The
   // result is a list of KovaHostDiskMapResult, one per group; the fault tells what failed of it, or why
@@ -166,16 +168,16 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   // The cached records of these disks, or of all without names, that pass the limit, as disk results for
   // planning. Replaces `results`. The caller holds the disk-cache lock. Throws
   // Orbis::Fault::SystemError::Exception without an inventory.
-  void QueryDiskCacheLocked(const Texts& names, const DiskQueryLimit& limit,
-                            Tessa::Ref<DiskResults>& results);
+  void QueryDiskCacheLocked(const Texts& names, const DiskQueryLimit& limit, Tessa::Ref<DiskResults>& results,
+                            bool (*alsoWanted)(const HostCtl::Kova::DiskResult& record) = nullptr);
   // The groups that an addition of these disks makes: hybrid ones, those that are there but not mounted, and
-  // all-flash ones. The flags say which planner stopped at a limit.
+  // all-flash ones. The flags say which planner could plan nothing because of a limit. Throws
+  // Nox::Fault::DuplicateDisks::Exception.
   Tessa::Ref<Orbis::DataArray<Mapping>> PlanGroups(Orbis::DataArray<Nox::Host::ScsiDisk>& disks,
                                                    bool& allFlashExceeded, bool& hybridExceeded);
   // Those of the disks that the kernel calls eligible, as planning sees them. Throws
-  // Nox::Fault::DuplicateDisks::Exception.
-  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> EligibleOf(
-      const Orbis::DataArray<Nox::Host::ScsiDisk>& disks);
+  // Orbis::Fault::SystemError::Exception without an inventory.
+  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> EligibleOf(const Texts& names);
   // Every disk that the kernel offers without a reason against it, as it is now.
   Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> QueryOfferedDisks();
   // The groups that these make: hybrid ones, then all-flash ones.

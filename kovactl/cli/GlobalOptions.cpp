@@ -15,9 +15,10 @@ void AddGlobalOptions(CLI::App& app, CommandLine& line) {
   if (usualAgent != nullptr && *usualAgent != '\0') {
     global.agent = usualAgent;
   }
-  auto* const agent = app.add_option("--agent", global.agent,
-                                     "Agent to ask: unix:PATH; the environment's KOVA_AGENT unless given")
-                          ->capture_default_str();
+  auto* const agent =
+      app.add_option("--agent", global.agent,
+                     "Agent to ask: unix:PATH or tcp:ADDRESS:PORT; the environment's KOVA_AGENT unless given")
+          ->capture_default_str();
   app.add_option("--host", global.runtime.hostFile,
                  "Host description to work on in this process, without an agent")
       ->excludes(agent);

@@ -125,6 +125,7 @@ class Replay {
     Tessa::Service::SetDefaultLogger(WithChild(Host::MakeConsoleLogger(LogLevel::Error), _logger));
     Tessa::SetPanicHandler(&AnswerPanic);
     options.recorder = _recorder;
+    options.bare = true;
     _runtime = &Host::HostRuntime::Start(options);
     _running = this;
     TakeNoise();

@@ -7,6 +7,7 @@
 #include <nlohmann/json.hpp>
 #include <set>
 
+#include "orbis/Excerpt.h"
 #include "orbis/ParseException.h"
 
 namespace Orbis::Json {
@@ -194,9 +195,9 @@ std::string Describe(const Value& value) {
     case Kind::Integer:
       return "the number " + std::to_string(value.integer);
     case Kind::Number:
-      return "the number " + value.text.substr(0, 64);
+      return "the number " + std::string(Excerpt(value.text));
     case Kind::String:
-      return "the text '" + value.text.substr(0, 64) + "'";
+      return "the text '" + std::string(Excerpt(value.text)) + "'";
     case Kind::Array:
       return "an array";
     case Kind::Object:

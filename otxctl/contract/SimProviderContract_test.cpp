@@ -1,6 +1,8 @@
-// The contract, kept by the simulated host: bare, saved after each change, and behind a recorder.
+// The contract, kept by the simulated host: bare, saved after each change, behind a recorder, and held to
+// what providers may throw.
 #include "otxctl/contract/ProviderContract.h"
 #include "otxctl/fault/RecordingProvider.h"
+#include "otxctl/fault/StrictProvider.h"
 #include "otxctl/sim/SimProvider.h"
 
 namespace OtxCtl::Contract {
@@ -33,6 +35,18 @@ class RecordedHost : public ContractHost {
   std::shared_ptr<Fault::CallRecorder> _recorder = std::make_shared<Fault::CallRecorder>();
 };
 
+class StrictHost : public ContractHost {
+ public:
+  explicit StrictHost(const Sim::HostDescription& host) : _host(host) {}
+
+  std::unique_ptr<HostCtl::Kova::KovaInfo> NewProvider() override {
+    return std::make_unique<Fault::StrictProvider>(_host.NewProvider());
+  }
+
+ private:
+  SimulatedHost _host;
+};
+
 ContractSubject Bare() {
   return {"Bare", [](const Sim::HostDescription& host) { return std::make_unique<SimulatedHost>(host); }, {}};
 }
@@ -54,7 +68,11 @@ ContractSubject Recorded() {
       "Recorded", [](const Sim::HostDescription& host) { return std::make_unique<RecordedHost>(host); }, {}};
 }
 
-INSTANTIATE_TEST_SUITE_P(Simulated, ProviderContract, testing::Values(Bare(), Saved(), Recorded()),
+ContractSubject Strict() {
+  return {"Strict", [](const Sim::HostDescription& host) { return std::make_unique<StrictHost>(host); }, {}};
+}
+
+INSTANTIATE_TEST_SUITE_P(Simulated, ProviderContract, testing::Values(Bare(), Saved(), Recorded(), Strict()),
                          SubjectName);
 
 }  // namespace

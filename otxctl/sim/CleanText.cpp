@@ -60,6 +60,11 @@ bool IsControl(std::uint32_t codePoint) noexcept {
   return codePoint < 0x20 || (codePoint >= 0x7F && codePoint <= 0x9F);
 }
 
+// What no XML text can hold, and so neither a request nor an answer.
+bool IsNoCharacter(std::uint32_t codePoint) noexcept {
+  return codePoint == 0xFFFE || codePoint == 0xFFFF;
+}
+
 std::string Trimmed(const std::string& text) {
   const std::size_t first = text.find_first_not_of(' ');
   if (first == std::string::npos) {
@@ -73,7 +78,7 @@ std::string Trimmed(const std::string& text) {
 bool IsCleanText(std::string_view text) noexcept {
   while (!text.empty()) {
     const Character next = Decode(text);
-    if (next.length == 0 || IsControl(next.codePoint)) {
+    if (next.length == 0 || IsControl(next.codePoint) || IsNoCharacter(next.codePoint)) {
       return false;
     }
     text.remove_prefix(next.length);
@@ -90,7 +95,9 @@ std::string CleanText(std::string_view text) {
       text.remove_prefix(1);
       continue;
     }
-    if (!IsControl(next.codePoint)) {
+    if (IsNoCharacter(next.codePoint)) {
+      clean += "\xEF\xBF\xBD";
+    } else if (!IsControl(next.codePoint)) {
       clean += text.substr(0, next.length);
     }
     text.remove_prefix(next.length);

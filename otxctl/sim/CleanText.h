@@ -1,4 +1,5 @@
-// Texts that may go everywhere: valid UTF-8 without control characters.
+// Texts that may go everywhere and come back as they were: valid UTF-8 without control characters, and
+// without U+FFFE and U+FFFF, which XML cannot hold.
 #pragma once
 
 #include <cstddef>
@@ -10,8 +11,8 @@ namespace OtxCtl::Sim {
 // Control characters are U+0000 to U+001F and U+007F to U+009F.
 bool IsCleanText(std::string_view text) noexcept;
 
-// The text without control characters and without blanks at either end. Bytes that are no UTF-8 become
-// U+FFFD, one for each.
+// The text without control characters and without blanks at either end. Bytes that are no UTF-8, and what
+// XML cannot hold, become U+FFFD, one for each.
 std::string CleanText(std::string_view text);
 
 // The text for a message, cut short if it is long. `text` must be clean.

@@ -17,7 +17,7 @@ TEST(CleanTexts, AreUtf8WithoutControlCharacters) {
       {"empty", ""},
       {"ASCII", "naa.5000 ~"},
       {"two bytes", "\xC2\xA0\xC3\xA9"},
-      {"three bytes", "\xE2\x82\xAC\xEF\xBF\xBF"},
+      {"three bytes", "\xE2\x82\xAC\xEF\xBF\xBD"},
       {"four bytes, the last character", "\xF4\x8F\xBF\xBF"},
   };
   for (const Row& row : clean) {
@@ -37,6 +37,8 @@ TEST(CleanTexts, HoldNoOtherBytes) {
       {"overlong, three bytes", "\xE0\x80\xAF"},
       {"surrogate", "\xED\xA0\x80"},
       {"beyond the last character", "\xF4\x90\x80\x80"},
+      {"U+FFFE", "\xEF\xBF\xBE"},
+      {"U+FFFF", "a\xEF\xBF\xBF"},
       {"lone byte", "\xFF"},
       {"lone continuation", "\x80"},
       {"cut off", "\xE2\x82"},
@@ -51,6 +53,7 @@ TEST(CleanTexts, HoldNoOtherBytes) {
 TEST(CleaningAText, DropsControlsReplacesBadBytesAndTrims) {
   EXPECT_EQ(CleanText("  LAB\t \x1B[1mX "), "LAB [1mX");
   EXPECT_EQ(CleanText("a\xFF"), "a\xEF\xBF\xBD");
+  EXPECT_EQ(CleanText("a\xEF\xBF\xBF"), "a\xEF\xBF\xBD");
   EXPECT_EQ(CleanText("   "), "");
 }
 

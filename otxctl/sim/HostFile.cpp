@@ -56,11 +56,13 @@ std::string WithoutLinks(const std::string& path) {
   return real.string();
 }
 
-// A file beside the one to save that is gone again unless it was put in its place.
+// A file beside the one to save that is gone again unless it was put in its place. One that a killed process
+// left there is replaced: nobody else writes while this process holds the lock.
 class NewFile {
  public:
-  explicit NewFile(const std::string& target) : _target(target), _name(target + ".XXXXXX") {
-    _file = FileDescriptor(mkostemp(_name.data(), O_CLOEXEC));
+  explicit NewFile(const std::string& target) : _target(target), _name(target + ".new") {
+    unlink(_name.c_str());
+    _file = FileDescriptor(open(_name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600));
     if (!_file.IsOpen()) {
       Fail(_target, "cannot be saved, no new file in its folder", errno);
     }

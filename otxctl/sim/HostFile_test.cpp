@@ -133,6 +133,13 @@ class FileSizeLimit {
   void (*_oldHandler)(int);
 };
 
+TEST_F(HostFileTest, ReplacesWhatAKilledWriterLeftBehind) {
+  std::ofstream(_path + ".new") << "half of a host";
+  const HostDescription host = AHost().WithSsd("naa.1").Build();
+  HostFileWriter(_path).Save(host);
+  EXPECT_EQ(LoadHostFile(_path), host);
+  EXPECT_THAT(FilesInFolder(), UnorderedElementsAre("host.json", "host.json.lock"));
+}
 TEST_F(HostFileTest, AFailedSaveLeavesTheOldFileAndNothingElse) {
   const HostDescription old = AHost().WithSsd("naa.1").Build();
   const HostFileWriter writer(_path);

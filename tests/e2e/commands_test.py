@@ -36,10 +36,10 @@ class OneProcess(ProgramTest):
         host = {**TWO_DISKS, "groups": [{"ssd": "naa.1", "capacity": ["naa.2"]}]}
         self.assertIn("2 disks: 2 in use", self.kovactl("--host", self.write("host.json", host), "disks").out)
 
-    def test_ends_with_70_when_the_plug_in_panics(self):
-        host = {**TWO_DISKS, "faults": [{"operation": "QueryDisks", "exception": "std::runtime_error",
+    def test_ends_with_1_when_the_kernel_fails_in_a_way_it_must_not(self):
+        host = {**TWO_DISKS, "faults": [{"operation": "RemoveDisk", "exception": "std::runtime_error",
                                          "message": "boom"}]}
-        self.assert_ended(self.kovactl("--host", self.write("host.json", host), "disks"), 70, "panicked: boom")
+        self.assert_ended(self.kovactl("--host", self.write("host.json", host), "remove", "naa.1", "--yes"), 1, "boom")
 
     def test_ends_with_1_when_the_host_answers_with_a_fault(self):
         host = self.write("host.json", {**TWO_DISKS, "storageSystem": "missing"})

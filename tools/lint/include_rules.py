@@ -33,6 +33,7 @@ LIBRARIES = {
     "expat": (r"expat\.h", ["orbis/xml"]),
     "JSON": (r"nlohmann/.*", ["orbis/json", "otxctl/sim", "otxctl/fault", "kovactl"]),
     "HTTP and network": (r"boost/.*", ["agentd/http"]),
+    "TLS": (r"openssl/.*", ["agentd/http"]),
     "log sink": (r"spdlog/.*", ["host"]),
     "command line": (r"CLI/.*", ["agentd", "kovactl"]),
     "UUID": (r"uuid/.*", ["otxctl/sim"]),

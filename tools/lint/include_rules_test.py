@@ -33,6 +33,8 @@ class IncludeRules(unittest.TestCase):
         self.assertEqual(len(reasons("orbis/soap/SoapReader.cpp", "#include <expat.h>")), 1)
         self.assertEqual(reasons("orbis/xml/XmlReader.cpp", "#include <expat.h>"), [])
         self.assertEqual(len(reasons("kovactl/main.cpp", "#include <boost/asio.hpp>")), 1)
+        self.assertEqual(len(reasons("agentd/routes/Routes.cpp", "#include <openssl/ssl.h>")), 1)
+        self.assertEqual(reasons("agentd/http/TlsServer.cpp", "#include <openssl/ssl.h>"), [])
         self.assertEqual(len(reasons("kova/agentd/KovaLibManager.cpp", "#include <unistd.h>")), 1)
 
     def test_tests_may_use_anything(self):

@@ -39,7 +39,7 @@ class DiskInventory {
   Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> _disks;
   // Entries side by side in memory, and all freed at once.
   std::pmr::monotonic_buffer_resource _memory;
-  // Those before the first unnamed one.
+  // Those before the first unnamed one, as far as they are wanted.
   std::pmr::unordered_map<std::string_view, Nox::Host::ScsiDisk*> _named{&_memory};
   bool _endsUnnamed = false;  // a walk that finds nothing meets a disk without a name
 };

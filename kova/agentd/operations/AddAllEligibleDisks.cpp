@@ -1,7 +1,7 @@
 // Plans disk groups from every disk that the kernel offers and makes them.
 //
 // Unlike an addition of named disks it looks for no groups that are not mounted, says nothing when a limit
-// leaves nothing to plan, and invalidates the disk cache on every path.
+// leaves nothing to plan, and invalidates the disk cache also after a fault.
 
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/include/KovaInfo.h"

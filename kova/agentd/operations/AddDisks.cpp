@@ -10,8 +10,6 @@
 
 namespace Kovasvc {
 
-using HostCtl::Kova::DiskReason;
-using HostCtl::Kova::DiskState;
 using Nox::Fault::DuplicateDisks;
 using Nox::Host::ScsiDisk;
 using Nox::Kova::Host::DiskMapping;
@@ -27,15 +25,8 @@ namespace {
 
 constexpr int wrongTypeLine = 1908;
 
-constexpr DiskQueryLimit eligible = {.byState = true,
-                                     .state = DiskState::Eligible,
-                                     .byReason = false,
-                                     .reason = DiskReason::None,
-                                     .fifthFlag = false};
-
-// Throws when two neighbours have the same name. Equal names apart pass, and the name that is told is the one
-// behind as many names as there would be without the repeats, whether it is a repeated one or not: clients
-// know the check by both.
+// Only neighbours count. The name told is names[k], k being the count of names without repeats; it need not
+// be a repeated one. Both are wanted.
 void DemandNoRepeat(Tessa::Service::Logger& logger, const std::vector<std::string>& names) {
   std::size_t withoutRepeats = 0;
   for (std::size_t i = 0; i < names.size(); ++i) {
@@ -64,9 +55,7 @@ Ref<MethodFault> LimitReached(bool allFlash) {
 
 }  // namespace
 
-Ref<DataArray<ScsiDisk>> KovaManagerImpl::EligibleOf(const DataArray<ScsiDisk>& disks) {
-  const Texts names = NamesOf(&disks);
-  DemandNoRepeat(*_logger, names);
+Ref<DataArray<ScsiDisk>> KovaManagerImpl::EligibleOf(const Texts& names) {
   const auto candidates = MakeRef<DataArray<ScsiDisk>>();
   if (names.empty()) {
     return candidates;  // a query without names would answer for every disk of the host
@@ -74,7 +63,7 @@ Ref<DataArray<ScsiDisk>> KovaManagerImpl::EligibleOf(const DataArray<ScsiDisk>& 
   Ref<DiskResults> results;
   {
     const LockGuard guard(*_diskCacheLock);
-    QueryDiskCacheLocked(names, eligible, results);
+    QueryDiskCacheLocked(names, eligibleDisks, results);
   }
   AppendDisks(*results, *candidates);
   return candidates;
@@ -85,7 +74,9 @@ Ref<DataArray<DiskMapping>> KovaManagerImpl::PlanGroups(DataArray<ScsiDisk>& dis
   Ref<DataArray<DiskMapping>> allFlash;
   Ref<DataArray<ScsiDisk>> remaining;
   AllFlashDiskMappingSwitch(&disks, allFlash, remaining, allFlashExceeded);
-  const Ref<DataArray<ScsiDisk>> candidates = EligibleOf(*remaining);
+  const Texts names = NamesOf(remaining.Get());
+  DemandNoRepeat(*_logger, names);
+  const Ref<DataArray<ScsiDisk>> candidates = EligibleOf(names);
   Ref<DataArray<DiskMapping>> planned;
   ComputeDiskMappings(candidates.Get(), false, planned, hybridExceeded);
   ComputeNotMountedDiskMappings(&disks, planned);

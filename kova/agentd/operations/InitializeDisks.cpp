@@ -57,7 +57,9 @@ void KovaManagerImpl::InitializeDisksInt(DataArray<DiskMapping>* mappings, const
       auto mapResult = MakeRef<DiskMapResult>();
       InitializeMapping(Ref<DiskMapping>((*mappings)[index]), requestTag, count, index, mapResult);
       results->Append(mapResult);
-      PrepareKovaDiskFault(mapResult->GetError(), combined);
+      if (mapResult->GetError()) {
+        PrepareKovaDiskFault(mapResult->GetError(), combined);
+      }
     }
   } catch (const MethodFault::Exception& exception) {
     combined = exception.GetFault();
@@ -75,11 +77,12 @@ void KovaManagerImpl::InitializeMapping(Ref<DiskMapping> mapping, const std::str
     return;
   }
   Ref<MethodFault> refused;
+  // A group that is off-line, or whose cache disk has left, is restamped.
   AskKernel(*_logger, "Error formatting KOVA disks: %1", refused, [&] {
     const std::string ssdName = NameOf(mapping->GetSsd().Get());
     Texts capacityNames = NamesOf(mapping->GetNonSsd().Get());
     if (IsOffline(ssdName) || IsPDLDiskInput(ssdName)) {
-      RestampDiskMapping(ssdName, capacityNames);  // what is there is never formatted
+      RestampDiskMapping(ssdName, capacityNames);
     } else {
       FormatDiskMapping(ssdName, capacityNames, requestTag, mappingCount, mappingIndex);
     }
@@ -87,7 +90,6 @@ void KovaManagerImpl::InitializeMapping(Ref<DiskMapping> mapping, const std::str
   if (refused) {
     result->SetError(refused);
   }
-  InvalidateKovaDiskCache();  // whatever the kernel did, its records are others now
   result->SetDiskResult(QueryGroupAfresh(mapping));
 }
 
@@ -99,6 +101,7 @@ bool KovaManagerImpl::IsOffline(const std::string& ssdName) {
 }
 
 Ref<KovaManagerImpl::DiskResults> KovaManagerImpl::QueryGroupAfresh(const Ref<DiskMapping>& mapping) {
+  InvalidateKovaDiskCache();  // also after a refusal: what is reported is what the kernel says now
   Texts names;
   DiskMappingToDeviceNames(mapping, names);
   Ref<DiskResults> results;

@@ -66,7 +66,7 @@ void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::s
     const LockGuard guard(*_operationLock);
     RefreshKovaDiskCache();
     const std::string ssdName = NameOf(group->GetSsd().Get());
-    LogDiskMapping(*_logger, group);
+    LogOneDiskMapping(*_logger, group);
     if (IsPDLDiskInput(ssdName)) {
       // A group whose cache disk has left is not looked for.
       AskKernel(*_logger, "Error removing PDL'd KOVA disk mapping: %1", fault,

@@ -66,7 +66,7 @@ void KovaManagerImpl::UnmountDiskMappingInt(Ref<DiskMapping>& mapping, const std
     fault = MakeRef<Orbis::Fault::InvalidArgument>();
     return;
   }
-  LogDiskMapping(*_logger, mapping);
+  LogOneDiskMapping(*_logger, mapping);
   AskKernel(*_logger, "Error unmounting KOVA disk mapping: %1", fault,
             [&] { _provider->UnmountDiskMapping(ssdName); });
 }

@@ -28,11 +28,9 @@ using Tessa::System::LockGuard;
 
 namespace {
 
-constexpr DiskQueryLimit eligible = {.byState = true,
-                                     .state = HostCtl::Kova::DiskState::Eligible,
-                                     .byReason = false,
-                                     .reason = HostCtl::Kova::DiskReason::None,
-                                     .fifthFlag = false};
+bool IsFlash(const DiskResult& record) {
+  return Planning::IsFlash(record.isSsd, record.capacityFlash);
+}
 
 }  // namespace
 
@@ -45,11 +43,7 @@ Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryEligibleFlash(const DataArray<Scs
     if (names.empty()) {
       return flash;  // a query without names would answer for every disk of the host
     }
-    std::vector<DiskResult> records;
-    LimitQueryDisksForKova(*_logger, names, eligible, _diskCache, records, [](const DiskResult& record) {
-      return Planning::IsFlash(record.isSsd, record.capacityFlash);
-    });
-    MarshalHostCtlDiskResults(*_logger, records, results, false);
+    QueryDiskCacheLocked(names, eligibleDisks, results, &IsFlash);
   }
   AppendDisks(*results, *flash);
   return flash;

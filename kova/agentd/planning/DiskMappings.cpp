@@ -87,7 +87,7 @@ void LogDiskMappings(Tessa::Service::Logger& logger, const DataArray<DiskMapping
   }
 }
 
-void LogDiskMapping(Tessa::Service::Logger& logger, const Tessa::Ref<DiskMapping>& mapping) {
+void LogOneDiskMapping(Tessa::Service::Logger& logger, const Tessa::Ref<DiskMapping>& mapping) {
   DataArray<DiskMapping> one;
   one.Append(mapping);
   LogDiskMappings(logger, &one);

@@ -38,7 +38,8 @@ void DiskMappingToDeviceNames(const Tessa::Ref<Nox::Kova::Host::DiskMapping>& ma
 void LogDiskMappings(Tessa::Service::Logger& logger,
                      const Orbis::DataArray<Nox::Kova::Host::DiskMapping>* mappings);
 // The same for one group.
-void LogDiskMapping(Tessa::Service::Logger& logger, const Tessa::Ref<Nox::Kova::Host::DiskMapping>& mapping);
+void LogOneDiskMapping(Tessa::Service::Logger& logger,
+                       const Tessa::Ref<Nox::Kova::Host::DiskMapping>& mapping);
 
 // Appends the disk of each result, in order.
 void AppendDisks(const Orbis::DataArray<Nox::Kova::Host::DiskResult>& results,

@@ -34,8 +34,8 @@ std::string RequestNameOf(const DiskName& disk) {
   return disk.deviceName.empty() ? "kova:" + disk.kovaUuid : disk.deviceName;
 }
 
-// Whether the kernel's group is the requested one. One-sided on purpose: as many disks, and each of the
-// kernel's among the requested; a request that names one disk twice and omits another can match.
+// Whether the kernel's group is the requested one: as many disks, and each of the kernel's among the
+// requested.
 bool IsRequested(const HostCtl::Kova::DiskMapping& group, const std::string& ssd,
                  const std::unordered_set<std::string_view>& requested, std::size_t requestedCount) {
   return group.ssd.deviceName == ssd && group.capacityDisks.size() == requestedCount &&

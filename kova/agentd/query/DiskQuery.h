@@ -19,11 +19,19 @@ struct DiskQueryLimit {
   bool fifthFlag = true;  // carried along; no filter reads it
 };
 
+// Disks that the service could use, whatever speaks against them beside that.
+inline constexpr DiskQueryLimit eligibleDisks = {.byState = true,
+                                                 .state = HostCtl::Kova::DiskState::Eligible,
+                                                 .byReason = false,
+                                                 .reason = HostCtl::Kova::DiskReason::None,
+                                                 .fifthFlag = false};
+
 // A caller's own test beside the limit.
 using RecordTest = bool (*)(const HostCtl::Kova::DiskResult& record);
 
 // Appends copies of the records that pass, in the order of the records. No names: every name passes; a
-// name that matches nothing is passed over. A failing kernel ends the walk with a warning.
+// name that matches nothing is passed over. A kernel exception out of the caller's test ends the walk with a
+// warning.
 void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<std::string>& names,
                             const DiskQueryLimit& limit,
                             const std::vector<HostCtl::Kova::DiskResult>& records,

@@ -5,6 +5,7 @@
 #include <string>
 #include <string_view>
 #include <unordered_set>
+#include <utility>
 #include <vector>
 
 namespace Kovasvc {
@@ -17,6 +18,7 @@ namespace Kovasvc {
 class NameSet {
  public:
   explicit NameSet(const std::vector<std::string>& names) : _names(names.begin(), names.end()) {}
+  explicit NameSet(std::vector<std::string>&& names) = delete;  // would be gone at once
   explicit NameSet(std::vector<std::string_view> names) : _names(std::move(names)) {}
 
   bool IsEmpty() const noexcept { return _names.empty(); }

@@ -1,0 +1,37 @@
+// What the server demands of the header of a request, before it reads the body. Part of the server; nobody
+// else includes this.
+#pragma once
+
+#include <boost/beast/http/fields.hpp>
+#include <boost/beast/http/message.hpp>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "agentd/http/HttpTypes.h"
+
+namespace Agentd {
+
+using HttpHeader = boost::beast::http::request_header<>;
+
+// Where the request came in.
+struct HttpDoor {
+  std::optional<std::uint16_t> tcpPort = std::nullopt;  // none: a Unix socket
+  std::vector<std::string> serverNames = {};            // the server's own besides loopback's
+};
+
+// Nothing when the request may be read on.
+std::optional<HttpAnswer> RefusalOf(const HttpHeader& header, const HttpDoor& door);
+
+// Whether the client waits to be told before it sends the body.
+bool WantsContinue(const HttpHeader& header);
+
+// Whether a Host header means this server: a name or address of loopback with the port, or one of the
+// server's own names. A page of a stranger whose name was made to lead here still bears its own.
+bool IsOwnHost(std::string_view host, const HttpDoor& door);
+
+HttpAnswer RefusedWith(unsigned status, const std::string& text);
+
+}  // namespace Agentd

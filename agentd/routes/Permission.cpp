@@ -1,0 +1,40 @@
+#include "agentd/routes/Permission.h"
+
+#include <string>
+
+#include "agentd/http/Shown.h"
+#include "nox/Faults.h"
+#include "tessa/Logger.h"
+
+namespace Agentd {
+namespace {
+
+Host::Answer NotPermitted(HttpRole role, const std::string& reason) {
+  const auto fault = Tessa::MakeRef<Nox::Fault::NotPermitted>();
+  fault->SetRole(std::string(NameOf(role)));
+  const auto message = Tessa::MakeRef<Orbis::LocalizableMessage>();
+  message->SetKey("nox.agentd.notPermitted");
+  message->SetMessage(reason);
+  fault->GetFaultMessage()->Append(message);
+  return {.result = nullptr, .fault = fault};
+}
+
+}  // namespace
+
+std::optional<Host::Answer> RefusalOf(const HttpRequest& request, HttpRole role) {
+  const bool isFromPage = role == HttpRole::Change && request.hasOrigin;
+  if (request.peer.role >= role && !isFromPage) {
+    return std::nullopt;
+  }
+  const std::string reason =
+      isFromPage ? "a page in a browser changes nothing here; the request bears an Origin header"
+                 : "this takes the role '" + std::string(NameOf(role)) + "'; " + request.peer.identity +
+                       " has the role '" + std::string(NameOf(request.peer.role)) + "'";
+  if (const auto logger = Tessa::Service::GetDefaultLogger()) {
+    Tessa::Service::LogInternal(logger, Tessa::Service::LogLevel::Info, "Refused '%1 %2' of %3: %4",
+                                Shown(request.method), Shown(request.target), request.peer.identity, reason);
+  }
+  return NotPermitted(role, reason);
+}
+
+}  // namespace Agentd

@@ -42,6 +42,21 @@ std::string Json(const Answer& answer) {
   return text;
 }
 
+TEST(Answer, IsTheSameWrittenAndRead) {
+  const auto fault = MakeRef<SystemError>("r");
+  for (const Answer& answer :
+       {Answer{.result = OneDisk(), .fault = fault}, Answer{.result = OneDisk(), .fault = nullptr},
+        Answer{.result = nullptr, .fault = fault}, Answer()}) {
+    EXPECT_EQ(Json(Read(Written(answer))), Json(answer));
+  }
+}
+
+TEST(Answer, OfATextThatCannotBeReadIsASystemErrorAlone) {
+  const Answer answer = Read({.result = "<object", .fault = nullptr});
+  EXPECT_FALSE(answer.result);
+  EXPECT_NE(dynamic_cast<const SystemError*>(answer.fault.Get()), nullptr);
+}
+
 TEST(Answer, OfTwoEmptyTextsIsNothing) {
   const Answer answer = ReadAnswer("", "");
   EXPECT_FALSE(answer.result);

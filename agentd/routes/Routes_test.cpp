@@ -55,6 +55,30 @@ TEST_F(Routes, DisksAreAnsweredAsJson) {
   EXPECT_THAT(FakeHooks::names, IsEmpty());
 }
 
+constexpr const char* soapQuery =
+    "<e:Envelope xmlns:e='http://schemas.xmlsoap.org/soap/envelope/'><e:Body>"
+    "<QueryDisksForKova xmlns='urn:nox'/></e:Body></e:Envelope>";
+
+TEST_F(Routes, DisksAreAnsweredTheSameWhoeverWroteTheirText) {
+  FakeHooks::AnswerWithDisk("naa.1 & <2>");
+  const std::string json = Get("/api/v1/disks").body;
+  const std::string soap = Post("/soap", soapQuery, "text/xml").body;
+  EXPECT_THAT(json, HasSubstr("naa.1 & <2>"));
+  EXPECT_THAT(soap, AllOf(HasSubstr("<returnval><disk>"), HasSubstr("naa.1 &amp; &lt;2&gt;")));
+  FakeHooks::resultText.insert(FakeHooks::resultText.find("<item>"), "<!-- by hand -->\n");
+  EXPECT_EQ(Get("/api/v1/disks").body, json);
+  EXPECT_EQ(Query("{}").body, json);
+  EXPECT_EQ(Post("/soap", soapQuery, "text/xml").body, soap);
+}
+
+TEST_F(Routes, DisksInATextThatCannotBeReadAreASystemError) {
+  FakeHooks::resultText = "<object";
+  for (const HttpAnswer& answer : {Get("/api/v1/disks"), Query("{}"), Post("/soap", soapQuery, "text/xml")}) {
+    EXPECT_EQ(answer.status, 500u);
+    EXPECT_THAT(answer.body, HasSubstr("SystemError"));
+  }
+}
+
 TEST_F(Routes, DisksAreChosenByNamesInTheTarget) {
   FakeHooks::AnswerWithDisk("naa.1");
   EXPECT_EQ(Get("/api/v1/disks?names=naa.1&names=t10.A%20B+C").status, 200u);

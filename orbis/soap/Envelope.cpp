@@ -132,6 +132,7 @@ bool AppendMessageOfSoap(std::string_view name, std::string_view field, const Ty
                          std::string_view text, std::string& out) {
   const auto append = [&] {
     Soap::WrittenText written(text);
+    out.reserve(out.size() + text.size() + text.size() / 8);  // the new name may be longer than the old
     if (written.OpenRoot() != list.name) {
       throw Soap::Unfamiliar();
     }

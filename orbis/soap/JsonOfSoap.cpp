@@ -154,6 +154,7 @@ class Transcriber {
 
 bool AppendJsonOfSoap(std::string_view text, std::string& out) {
   const std::size_t before = out.size();
+  out.reserve(before + text.size());  // JSON is the shorter of the two
   try {
     Transcriber(text, out).WriteRoot();
     return true;

@@ -14,7 +14,7 @@ using boost::system::error_code;
 AgentServer::AgentServer(const std::string& socketPath, Host::HostRuntime& runtime)
     : _service(runtime.Hooks(), &runtime.SimulatedHost()),
       _router(_service, _tasks),
-      _server(socketPath, Agentd::HttpLimits(),
+      _server(Agentd::HttpOptions{.listen = {Agentd::UnixAddress(socketPath)}},
               [this](const Agentd::HttpRequest& request, const Agentd::HttpResponder& responder) {
                 _router.Serve(request, responder);
               }),

@@ -7,7 +7,7 @@ import re
 import sys
 
 UNITS = {"ns": 1, "us": 1e3, "ms": 1e6, "s": 1e9}
-ENDPOINT = re.compile(r"Endpoint/(\w+)/(\w+)/disks:(\d+)/real_time/threads:(\d+)")  # socket, server, ..
+ENDPOINT = re.compile(r"Endpoint/(\w+)/(\w+)/disks:(\d+)/process_time/real_time/threads:(\d+)")  # socket, server, ..
 LATENCY = re.compile(r"Latency(\w+)/disks:(\d+)/.*")
 
 
@@ -47,17 +47,20 @@ def human_latency(row):
 
 
 def print_endpoints(rows):
-    """Requests per second of each server, as a part of what the bare one answers over the same socket."""
+    """Requests per second of each server, as a part of what the bare one answers over the same socket; and
+    the processor time of a request, which other programs of the machine do not change."""
     matches = [match for name in rows if (match := ENDPOINT.fullmatch(name))]
     if matches:
-        print(f"\n{'endpoint':<16}{'disks':>6}{'clients':>9}{'requests/s':>12}{'p50':>12}{'p99':>12}{'of bare':>9}")
+        print(f"\n{'endpoint':<16}{'disks':>6}{'clients':>9}{'requests/s':>12}{'p50':>12}{'p99':>12}{'CPU':>12}{'of bare':>9}{'by CPU':>9}")
     for match in matches:
         listener, server, disks, clients = match.groups()
         row = rows[match[0]]
         bare = rows.get(match[0].replace(f"/{server}/", "/bare/"))
-        part = f"{row['items_per_second'] / bare['items_per_second']:>9.2f}" if bare and bare is not row else f"{'-':>9}"
+        parts = [f"{'-':>9}"] * 2 if bare in (None, row) else [
+            f"{row['items_per_second'] / bare['items_per_second']:>9.2f}",
+            f"{bare['cpu_time'] / row['cpu_time']:>9.2f}"]
         print(f"{listener + ' ' + server:<16}{disks:>6}{clients:>9}{row['items_per_second']:>12.0f}"
-              f"{human_latency(row)}{part}")
+              f"{human_latency(row)}{human(row['cpu_time'] * UNITS[row['time_unit']]):>12}", *parts, sep="")
 
 
 def print_latencies(rows):

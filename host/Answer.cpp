@@ -39,6 +39,22 @@ void AppendOrNull(const Ref<T>& value, std::string& out) {
 
 }  // namespace
 
+Answer Read(const WrittenAnswer& answer) {
+  try {
+    return {.result = ReadAnswer("", answer.result).result, .fault = answer.fault};
+  } catch (const Orbis::ParseException& mistake) {
+    return FailedWith(mistake.what());
+  }
+}
+
+WrittenAnswer Written(const Answer& answer) {
+  WrittenAnswer written{.result = {}, .fault = answer.fault};
+  if (answer.result) {
+    Orbis::SerializeObjectToSoap(*answer.result, nullptr, written.result);
+  }
+  return written;
+}
+
 Answer ReadAnswer(const std::string& faultText, const std::string& resultText) {
   Answer answer;
   if (!resultText.empty()) {

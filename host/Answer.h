@@ -14,6 +14,17 @@ struct Answer {
   Tessa::Ref<Orbis::MethodFault> fault;  // null: none
 };
 
+// An answer whose result is still the text that the plug-in wrote, for whoever only passes it on.
+struct WrittenAnswer {
+  std::string result;                    // a SOAP text; empty: none
+  Tessa::Ref<Orbis::MethodFault> fault;  // null: none
+};
+
+// A result that cannot be read, which would be a mistake of the plug-in, becomes a SystemError.
+Answer Read(const WrittenAnswer& answer);
+// Throws what SerializeObjectToSoap throws.
+WrittenAnswer Written(const Answer& answer);
+
 // Reads what a hook appended to the texts it was given; an empty text is nothing. Throws
 // Orbis::ParseException, which would be a mistake of the plug-in.
 Answer ReadAnswer(const std::string& faultText, const std::string& resultText);

@@ -1,12 +1,8 @@
 #include "host/Gate.h"
 
-#include <unordered_map>
-
 #include "host/KnownDisks.h"
 #include "host/Refusal.h"
 #include "host/Text.h"
-#include "kova/agentd/include/HostCtlException.h"
-#include "kova/agentd/include/KovaInfo.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
 
@@ -24,9 +20,7 @@ void CheckName(const std::string& place, const std::string& name) {
   if (name.empty()) {
     Refuse(place, "the name of a disk is empty");
   }
-  if (name.size() > longestName) {
-    Refuse(place, "a name of more than " + std::to_string(longestName) + " bytes");
-  }
+  CheckLength(place, name);
   if (!IsClean(name)) {
     Refuse(place, "the name '" + Printable(name) + "' holds control characters or is not UTF-8");
   }
@@ -63,10 +57,15 @@ Ref<ScsiDisk> AdmitDisk(const std::string& place, const ScsiDisk* disk, const Kn
     return found;
   }
   const bool isLetIn = unknown == Unknown::LetIn || (unknown != Unknown::Refused && IsAbsentName(name));
+  if (!isLetIn && !known.IsThere()) {
+    throw SystemError::Exception(
+        MakeRef<SystemError>("The disks of the host could not be read: the agent has no inventory."));
+  }
   if (!isLetIn) {
     Refuse(place, "this host has no disk '" + name + "'");
   }
-  const auto copy = MakeRef<ScsiDisk>(*disk);
+  const auto copy = MakeRef<ScsiDisk>();  // nothing else of an unknown disk is believed
+  copy->SetCanonicalName(name);
   copy->SetSsd(disk->HasSsd() ? disk->GetSsd() : isCacheDisk);
   return copy;
 }
@@ -75,9 +74,7 @@ Ref<DiskList> AdmitList(const std::string& place, const DiskList* disks, std::si
                         const KnownDisks& known, Unknown unknown) {
   const auto admitted = MakeRef<DiskList>();
   const std::size_t count = disks == nullptr ? 0 : disks->Size();
-  if (count > most) {
-    Refuse(place, "more than " + std::to_string(most) + " disks");
-  }
+  CheckCount(place, count, most, "disks");
   admitted->Reserve(count);
   for (std::size_t i = 0; i < count; ++i) {
     admitted->Append(AdmitDisk(Indexed(place, i), (*disks)[i], known, unknown, false));
@@ -98,77 +95,33 @@ Ref<DiskMapping> AdmitMapping(const std::string& place, const DiskMapping* mappi
 }
 
 Ref<MappingList> AdmitMappings(const MappingList& mappings, const KnownDisks& known, Unknown unknown) {
-  if (mappings.Size() > mostMappings) {
-    Refuse("mappings", "more than " + std::to_string(mostMappings) + " disk groups");
-  }
+  CheckCount("mappings", mappings.Size(), mostMappings, "disk groups");
   const auto admitted = MakeRef<MappingList>();
   std::size_t disks = 0;
   for (std::size_t i = 0; i < mappings.Size(); ++i) {
     admitted->Append(AdmitMapping(Indexed("mappings", i), mappings[i], known, unknown));
     disks += 1 + (*admitted)[i]->GetNonSsd()->Size();
-    if (disks > mostNames) {
-      Refuse("mappings", "more than " + std::to_string(mostNames) + " disks");
-    }
+    CheckCount("mappings", disks, mostNames, "disks");
   }
   return admitted;
 }
 
-using Positions = std::unordered_map<std::string, std::size_t>;
-
-// Which of the flash disks belong to groups that are not mounted, as the kernel says; and where each stands.
-Positions CacheDisksOffline(const DiskList& disks, HostCtl::Kova::KovaInfo& kernel) {
-  Positions flash;
-  std::vector<std::string> names;
-  for (std::size_t i = 0; i < disks.Size(); ++i) {
-    if (disks[i]->GetSsd() && flash.emplace(disks[i]->GetCanonicalName(), i).second) {
-      names.push_back(disks[i]->GetCanonicalName());
-    }
-  }
-  if (names.empty()) {
-    return {};  // a query without names would answer for every disk of the host
-  }
-  std::vector<HostCtl::Kova::DiskResult> records;
-  kernel.QueryDisks(names, records, true);
-  Positions offline;
-  for (const HostCtl::Kova::DiskResult& record : records) {
-    const auto at = flash.find(record.name);
-    if (record.isSsd && record.reason == HostCtl::Kova::DiskReason::GroupNotMounted && at != flash.end()) {
-      offline.insert(*at);
-    }
-  }
-  return offline;
-}
-
-// How requests name one of the kernel's disks when the inventory lacks it; empty when it does not.
-std::string NameIfMissing(const HostCtl::Kova::DiskName& disk, const KnownDisks& known) {
-  if (disk.deviceName.empty()) {
-    return AbsentName(disk.kovaUuid);
-  }
-  return known.Find(disk.deviceName) ? std::string() : disk.deviceName;
-}
-
-// The first of the group's disks that the inventory lacks; empty when all are there.
-std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDisks& known) {
-  std::string missing = NameIfMissing(group.ssd, known);
-  for (auto disk = group.capacityDisks.begin(); missing.empty() && disk != group.capacityDisks.end();
-       ++disk) {
-    missing = NameIfMissing(*disk, known);
-  }
-  return missing;
-}
-
-[[noreturn]] void RefuseBrokenGroup(const std::string& place, const std::string& ssd,
-                                    const std::string& missing) {
-  Refuse(place, "'" + ssd + "' heads a disk group that is not mounted and lacks its disk '" + missing +
-                    "'; bring that disk back, or remove it from the group first");
-}
-
 }  // namespace
 
-void CheckNames(const std::string& property, const std::vector<std::string>& names) {
-  if (names.size() > mostNames) {
-    Refuse(property, "more than " + std::to_string(mostNames) + " names");
+void CheckCount(const std::string& place, std::size_t count, std::size_t most, const char* what) {
+  if (count > most) {
+    Refuse(place, "more than " + std::to_string(most) + " " + what);
   }
+}
+
+void CheckLength(const std::string& place, const std::string& name) {
+  if (name.size() > longestName) {
+    Refuse(place, "a name of more than " + std::to_string(longestName) + " bytes");
+  }
+}
+
+void CheckNames(const std::string& property, const std::vector<std::string>& names) {
+  CheckCount(property, names.size(), mostNames, "names");
   for (std::size_t i = 0; i < names.size(); ++i) {
     CheckName(Indexed(property, i), names[i]);
   }
@@ -202,27 +155,6 @@ Ref<DiskMapping> AdmitGroup(const DiskMapping& mapping, const KnownDisks& known)
 
 void RefuseChange(const std::string& error) {
   RefuseWith(error.substr(0, error.find(": ")), error);
-}
-
-void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel) {
-  try {
-    const Positions offline = CacheDisksOffline(disks, kernel);
-    if (offline.empty()) {
-      return;
-    }
-    std::vector<HostCtl::Kova::DiskMapping> groups;
-    kernel.GetDiskMappings(groups, true);
-    for (const HostCtl::Kova::DiskMapping& group : groups) {
-      const auto at = offline.find(group.ssd.deviceName);
-      const std::string missing = at == offline.end() ? std::string() : MissingMember(group, known);
-      if (!missing.empty()) {
-        RefuseBrokenGroup(Indexed("disks", at->second), at->first, missing);
-      }
-    }
-  } catch (const HostCtl::Lib::HostCtlException& failed) {
-    throw SystemError::Exception(MakeRef<SystemError>(
-        "Whether the disks belong to groups that lack a disk could not be found out: " + failed.Describe()));
-  }
 }
 
 }  // namespace Host::Gate

@@ -30,6 +30,10 @@ inline constexpr std::size_t mostNames = 100'000;   // or disks, of a whole requ
 inline constexpr std::size_t mostMappings = 10'000;
 inline constexpr std::size_t mostDisksOfGroup = 1000;  // beside its cache disk
 
+// Not more than that many of what `what` says; a name not longer than the longest.
+void CheckCount(const std::string& place, std::size_t count, std::size_t most, const char* what);
+void CheckLength(const std::string& place, const std::string& name);
+
 // Names must be there, not too long, UTF-8 without control characters, and not too many. `property` is what
 // the client calls them.
 void CheckNames(const std::string& property, const std::vector<std::string>& names);
@@ -40,6 +44,7 @@ void CheckRemovalArguments(const RemovalArguments& arguments);
 
 // The disks of an AddDisks. One that the inventory lacks is refused, whatever flag it brings: the kernel may
 // know it, but nobody has vouched for what it is.
+// Without an inventory nobody can tell: a SystemError, here and below.
 Tessa::Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known);
 
 // Groups to be made: as AdmitDisks, but absent disks may be named too.
@@ -55,6 +60,15 @@ Tessa::Ref<Nox::Kova::Host::DiskMapping> AdmitGroup(const Nox::Kova::Host::DiskM
 // and the plug-in cannot bear a member that the inventory lacks. Refuses the disk and names the member. A
 // kernel that cannot be asked is a SystemError, thrown as well.
 void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel);
+
+// The kernel must be able to tell about its disks before groups are made: the plug-in takes one that fails
+// for one without disks to refuse. A SystemError otherwise.
+void DemandAnswers(HostCtl::Kova::KovaInfo& kernel);
+
+// A group to be removed whose cache disk is named as one that has left: the kernel must have a group of that
+// cache disk, for it would take out any other absent disk of that name just as well. Nothing is asked about
+// other groups.
+void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::Kova::KovaInfo& kernel);
 
 // A change of a simulated host that the host would not accept; `error` begins with the path.
 [[noreturn]] void RefuseChange(const std::string& error);

@@ -149,8 +149,15 @@ TEST_F(GateWithHost, RefusesAnUnknownDiskWhateverFlagItBrings) {
               StartsWith("mappings[0].nonSsd[0] | "));
 }
 
-TEST_F(GateWithHost, KnowsNoDiskWithoutAnInventory) {
-  EXPECT_THAT(VerdictOn([] { AdmitDisks(*DisksNamed({"naa.1"}), KnownDisks(nullptr)); }),
+TEST_F(GateWithHost, CannotTellWithoutAnInventory) {
+  const KnownDisks none(nullptr);
+  const auto group = Mappings({MappingOf("naa.1", {"naa.2"})});
+  EXPECT_THAT(VerdictOn([&] { AdmitDisks(*DisksNamed({"naa.1"}), none); }),
+              StartsWith("The disks of the host"));
+  EXPECT_THAT(VerdictOn([&] { AdmitNewGroups(*group, none); }), StartsWith("The disks of the host"));
+  EXPECT_EQ(VerdictOn([&] { AdmitGroups(*group, none); }), "let in");
+  const KnownDisks empty(Tessa::MakeRef<Nox::Host::StorageDeviceInfo>());
+  EXPECT_THAT(VerdictOn([&] { AdmitDisks(*DisksNamed({"naa.1"}), empty); }),
               HasSubstr("this host has no disk 'naa.1'"));
 }
 

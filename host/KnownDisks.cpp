@@ -50,6 +50,10 @@ KnownDisks::KnownDisks(Ref<StorageDeviceInfo> info) : _info(std::move(info)) {
 KnownDisks::~KnownDisks() = default;
 KnownDisks::KnownDisks(KnownDisks&&) noexcept = default;
 
+bool KnownDisks::IsThere() const noexcept {
+  return static_cast<bool>(_info);
+}
+
 Ref<ScsiDisk> KnownDisks::Find(std::string_view canonicalName) const {
   const auto at = _named.find(canonicalName);
   if (at == _named.end()) {
@@ -65,9 +69,12 @@ Ref<ScsiDisk> KnownDisks::Find(std::string_view canonicalName) const {
   return entry.found;
 }
 
+bool HasAbsentPrefix(std::string_view canonicalName) {
+  return canonicalName.substr(0, absentPrefix.size()) == absentPrefix;
+}
+
 bool IsAbsentName(std::string_view canonicalName) {
-  return canonicalName.size() == absentPrefix.size() + uuidLength &&
-         canonicalName.substr(0, absentPrefix.size()) == absentPrefix;
+  return canonicalName.size() == absentPrefix.size() + uuidLength && HasAbsentPrefix(canonicalName);
 }
 
 std::string AbsentName(const std::string& kovaUuid) {

@@ -22,6 +22,9 @@ class KnownDisks {
   ~KnownDisks();
   KnownDisks(KnownDisks&&) noexcept;
 
+  // Whether there was an inventory at all, if only an empty one.
+  bool IsThere() const noexcept;
+
   // The inventory's disk, not to be changed; or null. It comes without what no answer shows and what may make
   // it large: durable name, alternate names and standard inquiry.
   Tessa::Ref<Nox::Host::ScsiDisk> Find(std::string_view canonicalName) const;
@@ -36,6 +39,8 @@ class KnownDisks {
 // A disk that has left the host but that the kernel remembers has no name any more. Requests and results
 // call it "kova:" and its KOVA UUID of 36 characters.
 bool IsAbsentName(std::string_view canonicalName);
+// Whether it begins like one; the plug-in takes that for enough.
+bool HasAbsentPrefix(std::string_view canonicalName);
 std::string AbsentName(const std::string& kovaUuid);
 
 // The object that stands for such a disk.

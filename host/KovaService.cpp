@@ -2,6 +2,7 @@
 
 #include <exception>
 #include <memory>
+#include <utility>
 
 #include "host/Gate.h"
 #include "host/HostError.h"
@@ -64,14 +65,25 @@ std::unique_ptr<HostCtl::Kova::KovaInfo> Kernel() {
 }  // namespace
 
 Answer KovaService::QueryDisksForKova(const std::vector<std::string>& names) const {
-  return Guarded([&] {
+  return Read(QueryDisksWritten(names));
+}
+
+WrittenAnswer KovaService::QueryDisksWritten(const std::vector<std::string>& names) const {
+  WrittenAnswer written;
+  const Answer rest = Guarded([&] {
     Gate::CheckNames("names", names);
-    return OrFailed(Ask([&](std::string& faultText, std::string& resultText) {
-                      std::vector<std::string> wanted = names;
-                      _hooks.queryDisksForKova(wanted, faultText, resultText);
-                    }),
-                    "The disks of the host could not be read; the agent's log says why.");
+    std::vector<std::string> wanted = names;
+    std::string faultText;
+    std::string resultText;
+    _hooks.queryDisksForKova(wanted, faultText, resultText);
+    const Answer read = ReadAnswer(faultText, "");
+    written.result = std::move(resultText);
+    return written.result.empty()
+               ? OrFailed(read, "The disks of the host could not be read; the agent's log says why.")
+               : read;
   });
+  written.fault = rest.fault;
+  return written;
 }
 
 Answer KovaService::GetStorageInfo() const {
@@ -88,7 +100,7 @@ Answer KovaService::GetDiskGroups() const {
     return answer;
   }
   const Answer more = Guarded([&] {
-    AppendUnmounted(UnmountedGroups(*Kernel()), KnownDisks::Now(), *info);
+    AppendUnlisted(GroupsOf(*Kernel()), KnownDisks::Now(), *info);
     return Answer();
   });
   answer.fault = more.fault;  // beside the groups that could be read
@@ -125,6 +137,7 @@ Answer KovaService::AddAllEligibleDisks() const {
 Answer KovaService::InitializeDisks(const MappingList& mappings) const {
   return Guarded([&] {
     const Kovasvc::Texts texts = ToTexts(*Gate::AdmitNewGroups(mappings, KnownDisks::Now()));
+    Gate::DemandAnswers(*Kernel());
     return Ask([&](std::string& faultText, std::string& resultText) {
       _hooks.initializeDisks(texts, RequestTag(), faultText, resultText);
     });
@@ -153,7 +166,9 @@ Answer KovaService::RemoveDisk(const std::string& disk, const RemovalArguments& 
 Answer KovaService::RemoveDiskMapping(const DiskMapping& mapping, const RemovalArguments& arguments) const {
   return Guarded([&] {
     Gate::CheckRemovalArguments(arguments);
-    const std::string text = ToText(*Gate::AdmitGroup(mapping, KnownDisks::Now()));
+    const Ref<DiskMapping> admitted = Gate::AdmitGroup(mapping, KnownDisks::Now());
+    Gate::DemandGroupIfAbsent(*admitted, *Kernel());
+    const std::string text = ToText(*admitted);
     return Ask([&](std::string& faultText, std::string&) {
       _hooks.removeDiskMapping(text, arguments.passThrough, arguments.optionText, arguments.optionFirst,
                                arguments.optionSecond, faultText);

@@ -30,6 +30,7 @@ class KovaService final : public ManagementApi {
       : _hooks(hooks), _simulated(simulated) {}
 
   Answer QueryDisksForKova(const std::vector<std::string>& names) const override;
+  WrittenAnswer QueryDisksWritten(const std::vector<std::string>& names) const override;
   Answer GetStorageInfo() const override;
   Answer GetDiskGroups() const override;
   Answer GetConfigInfo() const override;

@@ -224,6 +224,30 @@ TEST_F(KovaServiceChanges, CallsNoHookForWhatTheGateRefuses) {
   EXPECT_THAT(heard, IsEmpty());
 }
 
+TEST_F(KovaServiceChanges, MakesNoGroupWhileTheKernelCannotBeAsked) {
+  for (const char* operation : {"RefreshKovaInfo", "QueryDisks"}) {
+    _host->Change([operation](HostDescription& host) {
+      host.faults = {
+          {.operation = operation, .exception = "HostCtlException", .message = "busy", .disk = {}}};
+    });
+    const Answer answer = _service.InitializeDisks(*Mappings({MappingOf("naa.1", {"naa.2"})}));
+    EXPECT_THAT(Told(answer.fault.Get()), HasSubstr("busy")) << operation;
+  }
+  EXPECT_THAT(heard, IsEmpty());
+}
+
+TEST_F(KovaServiceChanges, RemovesAGroupByAnAbsentDiskOnlyIfThatIsItsCacheDisk) {
+  _host->Change([](HostDescription& host) { host.disks[0].absent = host.disks[2].absent = true; });
+  _inventory->Replace(DescribeInventory(_host->Snapshot()));
+  for (const char* name : {"kova:uuid-of-naa.3", "kova:01234567-89ab-cdef-0123-456789abcdef", "kova:"}) {
+    const Answer answer = _service.RemoveDiskMapping(*MappingOf(name, {}), {});
+    EXPECT_THAT(Told(answer.fault.Get()), StartsWith("mapping.ssd | ")) << name;
+  }
+  EXPECT_THAT(heard, IsEmpty());
+  EXPECT_EQ(Told(_service.RemoveDiskMapping(*MappingOf("kova:uuid-of-naa.1", {}), {}).fault.Get()), "done");
+  EXPECT_THAT(heard, ElementsAre("remove group kova:uuid-of-naa.1!<>   0 0"));
+}
+
 TEST_F(KovaServiceChanges, AnswersAnExceptionOfAHookByASystemErrorWithItsText) {
   PluginHooks hooks = Listeners();
   hooks.addAllEligibleDisks = [](const std::string&, std::string&, std::string&) {

@@ -35,9 +35,13 @@ class ManagementApi {
 
   // No names: every disk. The result is a list of KovaHostDiskResult.
   virtual Answer QueryDisksForKova(const std::vector<std::string>& names) const = 0;
+  // The same, with the list as the plug-in wrote it.
+  virtual WrittenAnswer QueryDisksWritten(const std::vector<std::string>& names) const {
+    return Written(QueryDisksForKova(names));
+  }
   // The mounted disk groups: a KovaHostConfigInfoStorageInfo.
   virtual Answer GetStorageInfo() const = 0;
-  // The same, and behind them in `diskMapInfo` the groups that the kernel has but that are not mounted.
+  // The same, and behind them in `diskMapInfo` the other groups that the kernel has: those not mounted.
   virtual Answer GetDiskGroups() const = 0;
   // Cluster, network and fault domain: a KovaHostConfigInfo.
   virtual Answer GetConfigInfo() const = 0;

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <iterator>
-#include <set>
 #include <string>
 #include <utility>
 
@@ -57,38 +56,91 @@ Ref<DiskMapping> Show(const GroupRecord& group, const KnownDisks& known) {
   return mapping;
 }
 
+// The cache disk first.
+using Names = std::vector<std::string>;
+
+Names NamesOf(const GroupRecord& group) {
+  const auto nameOf = [](const DiskName& disk) {
+    return disk.deviceName.empty() ? AbsentName(disk.kovaUuid) : disk.deviceName;
+  };
+  Names names = {nameOf(group.ssd)};
+  std::transform(group.capacityDisks.begin(), group.capacityDisks.end(), std::back_inserter(names), nameOf);
+  return names;
+}
+
+Names NamesOf(const DiskMapping& mapping) {
+  Names names = {mapping.GetSsd()->GetCanonicalName()};
+  if (const auto disks = mapping.GetNonSsd()) {
+    for (const ScsiDisk* disk : *disks) {
+      names.push_back(disk->GetCanonicalName());
+    }
+  }
+  return names;
+}
+
+// Which of the groups are among the others. Each of the others stands for one group: the one of the same
+// disks or, where a disk has come or gone meanwhile, the first of the same cache disk.
+std::vector<bool> Among(const std::vector<Names>& groups, std::vector<Names> others) {
+  std::vector<bool> found(groups.size(), false);
+  const auto take = [&](const auto& isSame) {
+    for (std::size_t i = 0; i < groups.size(); ++i) {
+      const auto at = found[i] ? others.end()
+                               : std::find_if(others.begin(), others.end(),
+                                              [&](const Names& other) { return isSame(groups[i], other); });
+      if (at != others.end()) {
+        found[i] = true;
+        others.erase(at);
+      }
+    }
+  };
+  take([](const Names& one, const Names& other) { return one == other; });
+  take([](const Names& one, const Names& other) { return one.front() == other.front(); });
+  return found;
+}
+
+std::vector<Names> NamesOf(const std::vector<GroupRecord>& groups) {
+  std::vector<Names> names;
+  for (const GroupRecord& group : groups) {
+    names.push_back(NamesOf(group));
+  }
+  return names;
+}
+
 }  // namespace
 
-std::vector<GroupRecord> UnmountedGroups(HostCtl::Kova::KovaInfo& kernel) {
-  std::vector<GroupRecord> groups;
-  kernel.GetDiskMappings(groups, true);
+std::vector<KernelGroup> GroupsOf(HostCtl::Kova::KovaInfo& kernel) {
+  std::vector<GroupRecord> all;
+  kernel.GetDiskMappings(all, true);
   std::vector<GroupRecord> mounted;
   kernel.GetDiskMappings(mounted, false);
-  const auto nameOf = [](const GroupRecord& group) {
-    return std::pair(group.ssd.deviceName, group.ssd.kovaUuid);
-  };
-  std::set<std::pair<std::string, std::string>> names;
-  std::transform(mounted.begin(), mounted.end(), std::inserter(names, names.end()), nameOf);
-  std::erase_if(groups, [&](const GroupRecord& group) { return names.count(nameOf(group)) != 0; });
+  const std::vector<bool> isMounted = Among(NamesOf(all), NamesOf(mounted));
+  std::vector<KernelGroup> groups;
+  for (std::size_t i = 0; i < all.size(); ++i) {
+    groups.push_back({.disks = std::move(all[i]), .mounted = isMounted[i]});
+  }
   return groups;
 }
 
-void AppendUnmounted(const std::vector<GroupRecord>& groups, const KnownDisks& known,
-                     Nox::Kova::Host::ConfigInfo::StorageInfo& info) {
+void AppendUnlisted(const std::vector<KernelGroup>& groups, const KnownDisks& known,
+                    Nox::Kova::Host::ConfigInfo::StorageInfo& info) {
   const auto all = MakeRef<DataArray<DiskMapInfo>>();
-  std::set<std::string> listed;
+  std::vector<Names> listed;
   if (info.GetDiskMapInfo()) {
-    for (DiskMapInfo* mounted : *info.GetDiskMapInfo()) {
-      all->Append(mounted);
-      listed.insert(mounted->GetMapping()->GetSsd()->GetCanonicalName());
+    for (DiskMapInfo* one : *info.GetDiskMapInfo()) {
+      all->Append(one);
+      listed.push_back(NamesOf(*one->GetMapping()));
     }
   }
-  for (const GroupRecord& group : groups) {
-    const auto shown = MakeRef<DiskMapInfo>();
-    shown->SetMapping(Show(group, known));
-    shown->SetMounted(false);
-    // One that was unmounted between the two questions is listed as it was then.
-    if (listed.count(shown->GetMapping()->GetSsd()->GetCanonicalName()) == 0) {
+  std::vector<Names> names;
+  for (const KernelGroup& group : groups) {
+    names.push_back(NamesOf(group.disks));
+  }
+  const std::vector<bool> isListed = Among(names, listed);
+  for (std::size_t i = 0; i < groups.size(); ++i) {
+    if (!isListed[i]) {
+      const auto shown = MakeRef<DiskMapInfo>();
+      shown->SetMapping(Show(groups[i].disks, known));
+      shown->SetMounted(groups[i].mounted);
       all->Append(shown);
     }
   }

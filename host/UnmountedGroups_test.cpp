@@ -18,16 +18,24 @@ using OtxCtl::Sim::HostBuilder;
 using OtxCtl::Sim::SimHost;
 using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
 using testing::ElementsAre;
-using testing::IsEmpty;
 
 HostBuilder FourDisks() {
   return AHost().WithSsd("naa.1").WithHdd("naa.2").WithSsd("naa.3").WithHdds({"naa.4", "naa.5"});
 }
 
-std::vector<std::string> CacheDisksOf(const std::vector<HostCtl::Kova::DiskMapping>& groups) {
+// One that is not mounted.
+KernelGroup GroupOf(const HostCtl::Kova::DiskName& ssd, const std::string& disk) {
+  KernelGroup group;
+  group.disks.ssd = ssd;
+  group.disks.capacityDisks = {{disk, ""}};
+  return group;
+}
+
+// The cache disks, and "+" in front of those of mounted groups.
+std::vector<std::string> CacheDisksOf(const std::vector<KernelGroup>& groups) {
   std::vector<std::string> names;
-  for (const auto& group : groups) {
-    names.push_back(group.ssd.deviceName);
+  for (const KernelGroup& group : groups) {
+    names.push_back((group.mounted ? "+" : "") + group.disks.ssd.deviceName);
   }
   return names;
 }
@@ -49,32 +57,59 @@ std::vector<std::string> Listed(const StorageInfo& info) {
 StorageInfo InfoAbout(const HostBuilder& builder) {
   SimHost host(builder.Build());
   StorageInfo info;
-  AppendUnmounted(UnmountedGroups(host), KnownDisks(DescribeInventory(host.Snapshot())), info);
+  AppendUnlisted(GroupsOf(host), KnownDisks(DescribeInventory(host.Snapshot())), info);
   return info;
 }
 
-TEST(UnmountedGroups, AreThoseThatTheKernelHasButDoesNotCallMounted) {
+TEST(GroupsOfTheKernel, AreAllOfThemAndSayWhetherTheyAreMounted) {
   SimHost host(FourDisks().WithGroup("naa.1", {"naa.2"}).WithUnmountedGroup("naa.3", {"naa.4"}).Build());
-  EXPECT_THAT(CacheDisksOf(UnmountedGroups(host)), ElementsAre("naa.3"));
+  EXPECT_THAT(CacheDisksOf(GroupsOf(host)), ElementsAre("+naa.1", "naa.3"));
   host.UnmountDiskMapping("naa.1");
-  EXPECT_THAT(CacheDisksOf(UnmountedGroups(host)), ElementsAre("naa.1", "naa.3"));
+  EXPECT_THAT(CacheDisksOf(GroupsOf(host)), ElementsAre("naa.1", "naa.3"));
   host.ClaimUnmountedDiskgroups();
-  EXPECT_THAT(UnmountedGroups(host), IsEmpty());
+  EXPECT_THAT(CacheDisksOf(GroupsOf(host)), ElementsAre("+naa.1", "+naa.3"));
 }
 
 TEST(UnmountedGroups, StandBehindTheMountedOnes) {
   SimHost host(
       FourDisks().WithGroup("naa.1", {"naa.2"}).WithUnmountedGroup("naa.3", {"naa.4", "naa.5"}).Build());
   const KnownDisks known(DescribeInventory(host.Snapshot()));
+  const std::vector<KernelGroup> groups = GroupsOf(host);
   StorageInfo info;
-  std::vector<HostCtl::Kova::DiskMapping> mounted;
-  host.GetDiskMappings(mounted, false);
-  AppendUnmounted(mounted, known, info);
-  (*info.GetDiskMapInfo())[0]->SetMounted(true);
-  AppendUnmounted(UnmountedGroups(host), known, info);
+  AppendUnlisted({groups.front()}, known, info);
+  AppendUnlisted(groups, known, info);
   EXPECT_THAT(Listed(info), ElementsAre("+naa.1: naa.2", "naa.3: naa.4 naa.5"));
-  AppendUnmounted(mounted, known, info);
+  AppendUnlisted(groups, known, info);
   EXPECT_THAT(Listed(info), ElementsAre("+naa.1: naa.2", "naa.3: naa.4 naa.5")) << "none is listed twice";
+}
+
+TEST(UnmountedGroups, ThatAreMountedBetweenTheTwoQuestionsAreListed) {
+  SimHost host(FourDisks().WithUnmountedGroup("naa.3", {"naa.4"}).Build());
+  StorageInfo info;  // which listed nothing
+  host.ClaimUnmountedDiskgroups();
+  AppendUnlisted(GroupsOf(host), KnownDisks(DescribeInventory(host.Snapshot())), info);
+  EXPECT_THAT(Listed(info), ElementsAre("+naa.3: naa.4"));
+}
+
+TEST(UnmountedGroups, ThatGrewBetweenTheTwoQuestionsAreListedAsTheyWere) {
+  const KernelGroup before = GroupOf({"naa.1", ""}, "naa.2");
+  KernelGroup after = before;
+  after.disks.capacityDisks.push_back({"naa.4", ""});
+  const KnownDisks known(DescribeInventory(FourDisks().Build()));
+  StorageInfo info;
+  AppendUnlisted({before}, known, info);
+  AppendUnlisted({after}, known, info);
+  EXPECT_THAT(Listed(info), ElementsAre("naa.1: naa.2"));
+}
+
+TEST(UnmountedGroups, WhoseCacheDisksHaveLeftDoNotHideEachOther) {
+  const auto groupOf = [](const char* uuid, const char* disk) { return GroupOf({"", uuid}, disk); };
+  const KnownDisks known(DescribeInventory(FourDisks().Build()));
+  StorageInfo info;
+  const KernelGroup mounted = groupOf("", "naa.4");
+  AppendUnlisted({mounted}, known, info);
+  AppendUnlisted({groupOf("", "naa.2"), mounted, groupOf("u", "naa.1"), groupOf("u", "naa.5")}, known, info);
+  EXPECT_THAT(Listed(info), ElementsAre("kova:: naa.4", "kova:: naa.2", "kova:u: naa.1", "kova:u: naa.5"));
 }
 
 TEST(UnmountedGroups, ShowTheInventorysDisksWithTheirKovaUuid) {

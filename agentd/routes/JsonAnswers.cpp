@@ -1,6 +1,7 @@
 #include "agentd/routes/JsonAnswers.h"
 
 #include "nox/Faults.h"
+#include "orbis/WrittenSoap.h"
 #include "orbis/json/JsonText.h"
 
 namespace Agentd {
@@ -57,6 +58,16 @@ HttpAnswer ToHttp(const Answer& answer) {
   HttpAnswer http = WithStatusOf(answer);
   WriteJsonAnswer(answer, http.body);
   http.body += "\n";
+  return http;
+}
+
+HttpAnswer ToHttp(const Host::WrittenAnswer& answer) {
+  HttpAnswer http;
+  http.body = "{\"result\":";
+  if (answer.fault || !Orbis::AppendJsonOfSoap(answer.result, http.body)) {
+    return ToHttp(Host::Read(answer));
+  }
+  http.body += ",\"fault\":null}\n";
   return http;
 }
 

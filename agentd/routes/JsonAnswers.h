@@ -16,6 +16,9 @@ HttpAnswer PlainText(unsigned status, const std::string& text);
 // both.
 HttpAnswer ToHttp(const Host::Answer& answer);
 
+// The same of a result that is still a text.
+HttpAnswer ToHttp(const Host::WrittenAnswer& answer);
+
 // The answer of a task that has ended: the same behind {"task": ID, ..}.
 HttpAnswer ToHttp(const Task& ended);
 

@@ -2,6 +2,9 @@
 
 #include <algorithm>
 
+#include "host/Gate.h"
+#include "host/RequestBounds.h"
+
 namespace Agentd {
 namespace {
 
@@ -20,6 +23,10 @@ Answer CallWithMappings(const ManagementApi& api, const Arguments& arguments) {
 
 Answer QueryDisks(const ManagementApi& api, const Arguments& arguments) {
   return api.QueryDisksForKova(arguments.names);
+}
+
+Host::WrittenAnswer QueryDisksWritten(const ManagementApi& api, const Arguments& arguments) {
+  return api.QueryDisksWritten(arguments.names);
 }
 
 Answer AddDisks(const ManagementApi& api, const Arguments& arguments) {
@@ -46,7 +53,7 @@ const std::vector<Operation>& Operations() {
   constexpr bool query = false;
   constexpr bool change = true;
   static const std::vector<Operation> operations = {
-      {"QueryDisksForKova", query, {{"names"}}, &QueryDisks},
+      {"QueryDisksForKova", query, {{"names"}}, &QueryDisks, &QueryDisksWritten},
       {"GetStorageInfo", query, {}, &CallPlain<&Api::GetStorageInfo>},
       {"GetDiskGroups", query, {}, &CallPlain<&Api::GetDiskGroups>},
       {"GetConfigInfo", query, {}, &CallPlain<&Api::GetConfigInfo>},
@@ -66,6 +73,21 @@ const Operation* FindOperation(std::string_view name) {
   const auto found = std::find_if(all.begin(), all.end(),
                                   [name](const Operation& operation) { return operation.name == name; });
   return found == all.end() ? nullptr : &*found;
+}
+
+void Bound(Arguments& arguments) {
+  Host::Gate::CheckNames("names", arguments.names);
+  Host::Gate::CheckLength("disk", arguments.disk);
+  Host::Gate::CheckRemovalArguments(arguments.removal);
+  arguments.disks = Host::Lean("disks", *arguments.disks);
+  arguments.mappings = Host::Lean(*arguments.mappings);
+  arguments.mapping = Host::Lean(*arguments.mapping);
+}
+
+std::size_t WeightOf(const Arguments& arguments) {
+  return Host::WeightOf(*arguments.disks) + Host::WeightOf(*arguments.mappings) +
+         Host::WeightOf(*arguments.mapping) + arguments.removal.passThrough.size() +
+         arguments.removal.optionText.size();
 }
 
 }  // namespace Agentd

@@ -32,11 +32,20 @@ struct Operation {
   bool changes = false;  // runs as a task
   std::vector<Parameter> parameters;
   Host::Answer (*call)(const Host::ManagementApi& api, const Arguments& arguments);
+  // The same with the result as the plug-in wrote it; null for most.
+  Host::WrittenAnswer (*callWritten)(const Host::ManagementApi& api, const Arguments& arguments) = nullptr;
 };
 
 // Null for an unknown name.
 const Operation* FindOperation(std::string_view name);
 
 const std::vector<Operation>& Operations();
+
+// Cuts the arguments down to what the operations look at. Too many of anything, or too long a name, are
+// refused by an InvalidArgument, before the request waits for its turn.
+void Bound(Arguments& arguments);
+
+// Roughly the bytes that they take in memory; bounded ones.
+std::size_t WeightOf(const Arguments& arguments);
 
 }  // namespace Agentd

@@ -79,7 +79,7 @@ Ref<DiskMapping> ReadMapping(const Value& value, const std::string& path) {
     Refuse(value, path + ".ssd", "is missing");
   }
   for (const auto& [key, member] : value.members) {
-    const std::string place = path + "." + key;
+    const std::string place = path + "." + Host::Printable(key);
     if (key == "ssd") {
       mapping->SetSsd(ReadDisk(member, place));
     } else if (key == "nonSsd") {
@@ -92,13 +92,8 @@ Ref<DiskMapping> ReadMapping(const Value& value, const std::string& path) {
 }
 
 std::string ReadLabel(const Value& value, const std::string& path) {
-  const std::string label = ReadText(value, path);
-  if (label.size() > longestLabel) {
-    Refuse(value, path, "a label of more than " + std::to_string(longestLabel) + " bytes");
-  }
-  if (!Host::IsClean(label)) {
-    Refuse(value, path, "a label has no control characters");
-  }
+  std::string label = ReadText(value, path);
+  CheckLabel(label, value.line);
   return label;
 }
 
@@ -174,13 +169,23 @@ std::string ParametersOf(const Operation& operation) {
 
 }  // namespace
 
+void CheckLabel(const std::string& label, int line) {
+  if (label.size() > longestLabel) {
+    throw Orbis::ParseException("label", line,
+                                "a label of more than " + std::to_string(longestLabel) + " bytes");
+  }
+  if (!Host::IsClean(label)) {
+    throw Orbis::ParseException("label", line, "a label has no control characters");
+  }
+}
+
 ReadRequest ReadJsonRequest(const Operation& operation, std::string_view body) {
   const Value root = Orbis::Json::Parse(body, Orbis::Limits::Untrusted());
   Demand(Kind::Object, "an object", root, "(root)");
   ReadRequest request;
   for (const auto& [key, value] : root.members) {
     if (!Takes(operation, key)) {
-      Refuse(value, key,
+      Refuse(value, Host::Printable(key),
              "unknown parameter; " + std::string(operation.name) + " takes " + ParametersOf(operation));
     }
     const auto reader = std::find_if(readers.begin(), readers.end(),

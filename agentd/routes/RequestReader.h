@@ -25,6 +25,9 @@ struct ReadRequest {
   bool wait = true;  // for the answer; otherwise the client is told the task and goes
 };
 
+// What a label may be, whichever way it comes; throws ParseException. 0: the line is not known.
+void CheckLabel(const std::string& label, int line = 0);
+
 ReadRequest ReadJsonRequest(const Operation& operation, std::string_view body);
 
 }  // namespace Agentd

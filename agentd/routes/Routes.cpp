@@ -17,6 +17,7 @@
 #include "agentd/tasks/TaskQueue.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
+#include "host/Text.h"
 #include "nox/Documents.h"
 #include "orbis/ParseException.h"
 
@@ -57,7 +58,7 @@ void Health(const Call& call) {
 
 void GetDisks(const Call& call) {
   if (HasOnly("names", call)) {
-    call.responder.Answer(ToHttp(call.api.QueryDisksForKova(call.target.ValuesOf("names"))));
+    call.responder.Answer(ToHttp(call.api.QueryDisksWritten(call.target.ValuesOf("names"))));
   }
 }
 
@@ -69,18 +70,16 @@ void GetPlain(const Call& call) {
 }
 
 // Hands the work to the queue. The client gets the answer when it is done or, without waiting, the task.
-void Submit(const Call& call, const std::string& operation, const ReadRequest& request,
-            TaskQueue::Work work) {
-  try {
-    if (!request.wait) {
-      call.responder.Answer(DescribeTask(202, call.tasks.Submit(operation, request.label, std::move(work))));
-      return;
-    }
-    call.tasks.Submit(operation, request.label, std::move(work),
-                      [responder = call.responder](const Task& ended) { responder.Answer(ToHttp(ended)); });
-  } catch (const Orbis::MethodFault::Exception& busy) {
-    call.responder.Answer(ToHttp(Host::Answer{.result = nullptr, .fault = busy.GetFault()}));
+void Submit(const Call& call, const std::string& operation, const ReadRequest& request, TaskQueue::Work work,
+            std::size_t bytes) {
+  if (!request.wait) {
+    call.responder.Answer(
+        DescribeTask(202, call.tasks.Submit(operation, request.label, std::move(work), {}, bytes)));
+    return;
   }
+  call.tasks.Submit(
+      operation, request.label, std::move(work),
+      [responder = call.responder](const Task& ended) { responder.Answer(ToHttp(ended)); }, bytes);
 }
 
 void PostOperation(const Call& call) {
@@ -90,14 +89,22 @@ void PostOperation(const Call& call) {
     return;
   }
   ReadRequest request = ReadJsonRequest(operation, call.request.body);
+  Bound(request.arguments);
+  if (operation.callWritten != nullptr) {
+    call.responder.Answer(ToHttp(operation.callWritten(call.api, request.arguments)));
+    return;
+  }
   if (!operation.changes) {
     call.responder.Answer(ToHttp(operation.call(call.api, request.arguments)));
     return;
   }
-  Submit(call, std::string(operation.name), request,
-         [&api = call.api, &operation, arguments = std::move(request.arguments)] {
-           return operation.call(api, arguments);
-         });
+  const std::size_t bytes = WeightOf(request.arguments);
+  Submit(
+      call, std::string(operation.name), request,
+      [&api = call.api, &operation, arguments = std::move(request.arguments)] {
+        return operation.call(api, arguments);
+      },
+      bytes);
 }
 
 void GetTasks(const Call& call) {
@@ -125,8 +132,10 @@ void GetHost(const Call& call) {
 
 // A task like any other: nothing changes the host while a request is at work on it.
 void PostHost(const Call& call) {
-  Submit(call, "ChangeHost", ReadRequest(),
-         [&api = call.api, change = call.request.body] { return api.ChangeHost(change); });
+  Submit(
+      call, "ChangeHost", ReadRequest(),
+      [&api = call.api, change = call.request.body] { return api.ChangeHost(change); },
+      call.request.body.size());
 }
 
 void GetDescription(const Call& call) {
@@ -209,6 +218,8 @@ void Follow(const Route& route, const Call& call) {
     route.serve(call);
   } catch (const Orbis::ParseException& refused) {
     call.responder.Answer(PlainText(400, refused.what()));
+  } catch (const Orbis::MethodFault::Exception& refused) {
+    call.responder.Answer(ToHttp(Host::Answer{.result = nullptr, .fault = refused.GetFault()}));
   }
 }
 

@@ -107,6 +107,8 @@ TEST_F(Routes, AnUnknownParameterIsRefusedByName) {
   const HttpAnswer inBody = Query(R"({"name": []})");
   EXPECT_EQ(inBody.status, 400u);
   EXPECT_THAT(inBody.body, HasSubstr("name"));
+  EXPECT_THAT(Get("/api/v1/disks?a%1b%0ab=1").body, HasSubstr("'a\\x1b\\x0ab'"));
+  EXPECT_THAT(Query(R"({"a\u001bb": []})").body, HasSubstr("a\\x1bb, line 1: unknown parameter"));
   EXPECT_EQ(FakeHooks::calls, 0);
 }
 

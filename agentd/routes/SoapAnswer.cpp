@@ -8,6 +8,7 @@
 #include "orbis/Envelope.h"
 #include "orbis/FaultText.h"
 #include "orbis/TypeDescriptor.h"
+#include "orbis/WrittenSoap.h"
 #include "tessa/Narrow.h"
 
 namespace Agentd {
@@ -104,6 +105,17 @@ HttpAnswer ToSoap(std::string_view operation, const Host::Answer& answer) {
       const Ref<Orbis::DataObject> response = row.respond(answer);
       Orbis::AppendSoapMessage(response->GetType().name, *response, http.body);
     }
+  }
+  return http;
+}
+
+HttpAnswer ToSoap(std::string_view operation, const Host::WrittenAnswer& answer) {
+  using Response = Op::QueryDisksForKovaResponse;
+  const Orbis::TypeDescriptor& list = *Nox::Kova::Host::DiskResult::StaticType().array;
+  HttpAnswer http = Xml(200);
+  if (answer.fault ||
+      !Orbis::AppendMessageOfSoap(Response::StaticType().name, "returnval", list, answer.result, http.body)) {
+    return ToSoap(operation, Host::Read(answer));
   }
   return http;
 }

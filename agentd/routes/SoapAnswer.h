@@ -18,6 +18,9 @@ namespace Agentd {
 // as its detail, when there is a fault and no result, or an empty list.
 HttpAnswer ToSoap(std::string_view operation, const Host::Answer& answer);
 
+// The same of a query of disks, whose result is still a text.
+HttpAnswer ToSoap(std::string_view operation, const Host::WrittenAnswer& answer);
+
 // A SOAP fault for a message that was refused. What is wrong with a parameter is an InvalidArgument that
 // names it; what is wrong with the envelope has no detail.
 HttpAnswer ToSoap(const Orbis::ParseException& refused);

@@ -18,7 +18,8 @@ namespace {
 constexpr std::string_view schemaFile = "nox.xsd";
 
 // An answer that cannot be written is the host's mistake, and still an answer.
-HttpAnswer Written(std::string_view operation, const Host::Answer& answer) {
+template <class Answer>
+HttpAnswer Written(std::string_view operation, const Answer& answer) {
   try {
     return ToSoap(operation, answer);
   } catch (const std::exception& mistake) {
@@ -44,6 +45,11 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
   try {
     SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
     const Operation& operation = *read.operation;
+    Bound(read.arguments);
+    if (operation.callWritten != nullptr) {
+      responder.Answer(Written(operation.name, operation.callWritten(api, read.arguments)));
+      return;
+    }
     if (!operation.changes) {
       responder.Answer(Written(operation.name, operation.call(api, read.arguments)));
       return;
@@ -52,14 +58,15 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
       responder.Answer(ToSoap("", *refusal));
       return;
     }
+    const std::size_t bytes = WeightOf(read.arguments);
     tasks.Submit(
         std::string(operation.name), read.label,
         [&api, &operation, arguments = std::move(read.arguments)] { return operation.call(api, arguments); },
-        [responder](const Task& ended) { responder.Answer(Written(ended.operation, ended.answer)); });
+        [responder](const Task& ended) { responder.Answer(Written(ended.operation, ended.answer)); }, bytes);
   } catch (const Orbis::ParseException& refused) {
     responder.Answer(ToSoap(refused));
-  } catch (const Orbis::MethodFault::Exception& busy) {
-    responder.Answer(ToSoap("", {.result = nullptr, .fault = busy.GetFault()}));
+  } catch (const Orbis::MethodFault::Exception& refused) {
+    responder.Answer(ToSoap("", Host::Answer{.result = nullptr, .fault = refused.GetFault()}));
   }
 }
 

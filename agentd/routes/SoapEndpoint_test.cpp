@@ -101,7 +101,11 @@ TEST_F(SoapEndpoint, AChangeIsATaskOfTheClientsLabel) {
   EXPECT_EQ(_tasks.List()[0].operation, "AddAllEligibleDisks");
   EXPECT_EQ(_tasks.List()[0].label, "rack 3");
   EXPECT_THAT(Ask("AddAllEligibleDisks", "<label>" + std::string(longestLabel + 1, 'x') + "</label>").body,
-              HasSubstr("longer than"));
+              HasSubstr("more than 256 bytes"));
+  for (const char* control : {"&#10;", "\x7f", "&#x85;"}) {
+    EXPECT_THAT(Ask("AddAllEligibleDisks", "<label>a" + std::string(control) + "b</label>").body,
+                HasSubstr("no control characters"));
+  }
 }
 
 TEST_F(SoapEndpoint, AnswersWithTheResult) {
@@ -212,6 +216,17 @@ TEST_F(SoapEndpoint, IsBusyWhenTooManyChangesWait) {
   _tasks.Close();
   EXPECT_THAT(Ask("AddAllEligibleDisks").body,
               AllOf(HasSubstr("xsi:type=\"Busy\""), HasSubstr("<faultcode>soapenv:Server</faultcode>")));
+}
+
+TEST_F(SoapEndpoint, RefusesTooLargeAGroupBeforeItWaits) {
+  std::string mapping = Disk("ssd", "naa.1");
+  for (int i = 0; i <= 1000; ++i) {
+    mapping += Disk("nonSsd", "naa.2");
+  }
+  const HttpAnswer answer = Ask("UnmountDiskMapping", "<mappings>" + mapping + "</mappings>");
+  EXPECT_THAT(answer.body, AllOf(HasSubstr("InvalidArgument"), HasSubstr("mappings[0].nonSsd")));
+  EXPECT_THAT(_tasks.List(), IsEmpty());
+  EXPECT_THAT(_api.Asked(), IsEmpty());
 }
 
 }  // namespace

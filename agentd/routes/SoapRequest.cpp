@@ -6,6 +6,7 @@
 #include "agentd/routes/RequestReader.h"
 #include "nox/Operations.h"
 #include "orbis/Envelope.h"
+#include "orbis/Excerpt.h"
 #include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"
 
@@ -109,7 +110,7 @@ const Row& FindRow(std::string_view name) {
     }
   }
   throw EnvelopeException("Client", "/Envelope/Body", 0,
-                          "there is no operation '" + std::string(name.substr(0, 64)) + "'");
+                          "there is no operation '" + std::string(Orbis::Excerpt(name)) + "'");
 }
 
 std::string_view Unquoted(std::string_view text) {
@@ -134,9 +135,7 @@ SoapRequest ReadSoapRequest(std::string_view body, std::string_view action) {
   CheckAction(action, row.name);
   SoapRequest read{.operation = FindOperation(row.name), .arguments = {}, .label = {}};
   row.read(message, read);
-  if (read.label.size() > longestLabel) {
-    throw Orbis::ParseException("label", 0, "longer than " + std::to_string(longestLabel) + " bytes");
-  }
+  CheckLabel(read.label);
   return read;
 }
 

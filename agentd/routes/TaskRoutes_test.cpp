@@ -3,6 +3,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <atomic>
+#include <memory>
+
 #include "agentd/routes/Routes.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "agentd/testing/FakeApi.h"
@@ -185,6 +188,40 @@ TEST_F(TaskRoutes, AHostThatIsNotSimulatedHasNoDescription) {
   const HttpAnswer answer = Get("/api/v1/host");
   EXPECT_EQ(answer.status, 404u);
   EXPECT_THAT(answer.body, HasSubstr("no simulated host"));
+}
+
+TEST_F(TaskRoutes, TooLargeAGroupOrTooLongANameIsRefusedBeforeItWaits) {
+  std::string disks = "\"f\"";
+  for (int i = 0; i < 1000; ++i) {
+    disks += ",\"f\"";
+  }
+  const HttpAnswer large =
+      Post("UnmountDiskMapping", R"({"wait": false, "mappings": [{"ssd": "f", "nonSsd": [)" + disks + "]}]}");
+  EXPECT_EQ(large.status, 400u);
+  EXPECT_THAT(large.body, AllOf(HasSubstr("InvalidArgument"), HasSubstr("mappings[0].nonSsd")));
+  const HttpAnswer longName = Post("AddDisks", R"({"disks": [")" + std::string(1025, 'n') + "\"]}");
+  EXPECT_EQ(longName.status, 400u);
+  EXPECT_THAT(longName.body, HasSubstr("disks[0]"));
+  EXPECT_THAT(_tasks.List(), IsEmpty());
+  EXPECT_THAT(_api.Asked(), IsEmpty());
+}
+
+TEST_F(TaskRoutes, ChangesOfTheHostCountByTheirBytesWhileTheyWait) {
+  TaskQueue tasks({.waitingBytes = 1000});
+  const Router router(_api, tasks);
+  const auto change = [&router](std::size_t bytes) {
+    const auto status = std::make_shared<std::atomic<unsigned>>(0);
+    router.Serve({"POST", "/api/v1/host", "application/json", std::string(bytes, ' ')},
+                 HttpResponder([status](const HttpAnswer& given) { *status = given.status; }));
+    return status->load();
+  };
+  _api.onChange = [this] { _gate.Enter(); };
+  change(1);
+  _gate.WaitUntilEntered();
+  change(600);
+  EXPECT_EQ(change(600), 503u);
+  _gate.Open();
+  tasks.Finish();
 }
 
 }  // namespace

@@ -53,6 +53,9 @@ void WriteJson(const Task& task, bool withResult, std::string& out) {
     if (withResult) {
       AppendValue("result", task.answer.result.Get(), out);
     }
+    if (task.resultForgotten) {
+      out += ",\"resultForgotten\":true";
+    }
     AppendValue("fault", task.answer.fault.Get(), out);
   }
   out += "}";

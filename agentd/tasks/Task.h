@@ -24,9 +24,10 @@ struct Task {
   Orbis::DateTime created;
   std::optional<Orbis::DateTime> started;
   std::optional<Orbis::DateTime> ended;
-  int percent = 0;      // as the kernel last reported
-  std::string step;     // what it was doing then
-  Host::Answer answer;  // once it has ended
+  int percent = 0;               // as the kernel last reported
+  std::string step;              // what it was doing then
+  Host::Answer answer;           // once it has ended
+  bool resultForgotten = false;  // the answer had a result, which was too large to be kept for long
 };
 
 // "waiting", "running", "done", "failed".

@@ -7,8 +7,10 @@
 #include <utility>
 
 #include "nox/Faults.h"
+#include "orbis/Json.h"
 #include "otxctl/TaskScope.h"
 #include "tessa/Logger.h"
+#include "tessa/Throwable.h"
 
 namespace Agentd {
 
@@ -42,12 +44,27 @@ Ref<Busy> Stopping() {
   return TooBusy("nox.agentd.tasks.stopping", "The agent is stopping; nothing of the request was done.");
 }
 
+// As JSON, which is how it is asked for. A result that cannot be written counts for nothing.
+std::size_t SizeOf(const Ref<Orbis::Any>& result) {
+  std::string text;
+  try {
+    if (result) {
+      Orbis::WriteJson(*result, text);
+    }
+  } catch (const Tessa::Throwable&) {
+    return 0;
+  }
+  return text.size();
+}
+
 }  // namespace
 
 struct TaskQueue::Entry {
   Task task;
   Work work;
   Listener onEnded;
+  std::size_t requestBytes = 0;
+  std::size_t resultBytes = 0;
 };
 
 DateTime TaskQueue::Now() {
@@ -64,7 +81,8 @@ TaskQueue::~TaskQueue() {
   Finish();
 }
 
-Task TaskQueue::Submit(const std::string& operation, const std::string& label, Work work, Listener onEnded) {
+Task TaskQueue::Submit(const std::string& operation, const std::string& label, Work work, Listener onEnded,
+                       std::size_t bytes) {
   const std::lock_guard guard(_mutex);
   if (_closed) {
     throw Busy::Exception(Stopping());
@@ -74,6 +92,11 @@ Task TaskQueue::Submit(const std::string& operation, const std::string& label, W
         TooBusy("nox.agentd.tasks.tooMany",
                 "The agent has " + std::to_string(_waiting.size()) + " changes waiting; try again later."));
   }
+  if (!_waiting.empty() && _waitingBytes + bytes > _limits.waitingBytes) {
+    throw Busy::Exception(
+        TooBusy("nox.agentd.tasks.tooLarge",
+                "The changes that wait leave no room for one of this size; try again later."));
+  }
   auto entry = std::make_shared<Entry>();
   entry->task.id = _idPrefix + std::to_string(++_created);
   entry->task.label = label;
@@ -81,6 +104,8 @@ Task TaskQueue::Submit(const std::string& operation, const std::string& label, W
   entry->task.created = _clock();
   entry->work = std::move(work);
   entry->onEnded = std::move(onEnded);
+  entry->requestBytes = bytes;
+  _waitingBytes += bytes;
   _entries.push_back(entry);
   _waiting.push_back(entry);
   _changed.notify_all();
@@ -110,6 +135,7 @@ void TaskQueue::Close() {
     const std::lock_guard guard(_mutex);
     _closed = true;
     refused.swap(_waiting);
+    _waitingBytes = 0;
     _changed.notify_all();
   }
   for (const auto& entry : refused) {
@@ -141,6 +167,7 @@ std::shared_ptr<TaskQueue::Entry> TaskQueue::NextWaiting(Lock& lock) {
   }
   std::shared_ptr<Entry> entry = _waiting.front();
   _waiting.pop_front();
+  _waitingBytes -= entry->requestBytes;
   return entry;
 }
 
@@ -166,6 +193,7 @@ Host::Answer TaskQueue::Carry(const Entry& entry) {
 void TaskQueue::End(Entry& entry, Host::Answer answer) {
   Listener onEnded;
   Task ended;
+  const std::size_t resultBytes = SizeOf(answer.result);
   {
     const std::lock_guard guard(_mutex);
     entry.task.state = answer.fault ? TaskState::Failed : TaskState::Done;
@@ -174,7 +202,10 @@ void TaskQueue::End(Entry& entry, Host::Answer answer) {
     entry.work = {};  // and what it holds of the request
     onEnded = std::move(entry.onEnded);
     ended = entry.task;
+    entry.resultBytes = resultBytes;
+    _resultBytes += resultBytes;
     ForgetOldest();
+    ForgetLargeResults(entry);
   }
   if (!onEnded) {
     return;
@@ -194,7 +225,20 @@ void TaskQueue::ForgetOldest() {
   const auto hasEnded = [](const std::shared_ptr<Entry>& entry) { return entry->task.ended.has_value(); };
   const auto count = static_cast<std::size_t>(std::count_if(_entries.begin(), _entries.end(), hasEnded));
   if (count > _limits.remembered) {
-    _entries.erase(std::find_if(_entries.begin(), _entries.end(), hasEnded));
+    const auto oldest = std::find_if(_entries.begin(), _entries.end(), hasEnded);
+    _resultBytes -= (*oldest)->resultBytes;
+    _entries.erase(oldest);
+  }
+}
+
+void TaskQueue::ForgetLargeResults(const Entry& last) {
+  for (auto at = _entries.begin(); _resultBytes > _limits.rememberedBytes && at != _entries.end(); ++at) {
+    Entry& entry = **at;
+    if (entry.resultBytes != 0 && &entry != &last) {
+      _resultBytes -= std::exchange(entry.resultBytes, 0);
+      entry.task.answer.result = nullptr;
+      entry.task.resultForgotten = true;
+    }
   }
 }
 

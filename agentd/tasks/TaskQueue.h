@@ -2,7 +2,7 @@
 //
 // One worker carries them out in the order in which they came; as many may wait as the limits say. Round each
 // stands an OtxCtl::TaskScope with the task's id, through which the kernel reports progress. Tasks that have
-// ended are remembered, up to a number.
+// ended are remembered, up to a number; the oldest lose their results before that when those are large.
 //
 // Threads: every function from any thread; listeners are called without a lock.
 #pragma once
@@ -22,8 +22,10 @@
 namespace Agentd {
 
 struct TaskLimits {
-  std::size_t waiting = 64;      // beside the one that runs
-  std::size_t remembered = 256;  // that have ended
+  std::size_t waiting = 64;                 // beside the one that runs
+  std::size_t remembered = 256;             // that have ended
+  std::size_t waitingBytes = 64u << 20;     // of the requests that wait, unless it is a single one
+  std::size_t rememberedBytes = 64u << 20;  // of the results as JSON; the last one is kept however large
 };
 
 class TaskQueue {
@@ -44,8 +46,9 @@ class TaskQueue {
   TaskQueue& operator=(const TaskQueue&) = delete;
 
   // The task as it was taken on. Throws Nox::Fault::Busy::Exception when too many wait, or after Close; the
-  // listener is not called then.
-  Task Submit(const std::string& operation, const std::string& label, Work work, Listener onEnded = {});
+  // listener is not called then. `bytes` is roughly what the work holds of the request.
+  Task Submit(const std::string& operation, const std::string& label, Work work, Listener onEnded = {},
+              std::size_t bytes = 0);
 
   // Nothing when there never was one of that id, or it is forgotten.
   std::optional<Task> Find(const std::string& id) const;
@@ -69,6 +72,8 @@ class TaskQueue {
   // Ends the task, and tells its listener with the lock let go.
   void End(Entry& entry, Host::Answer answer);
   void ForgetOldest();
+  // Of all but the one that ended last.
+  void ForgetLargeResults(const Entry& last);
 
   const TaskLimits _limits;
   const Clock _clock;
@@ -79,6 +84,8 @@ class TaskQueue {
   std::deque<std::shared_ptr<Entry>> _entries;  // in order of creation
   std::deque<std::shared_ptr<Entry>> _waiting;
   std::size_t _created = 0;
+  std::size_t _waitingBytes = 0;
+  std::size_t _resultBytes = 0;  // of all entries
   bool _closed = false;
 
   std::once_flag _joined;

@@ -10,6 +10,7 @@
 
 #include "agentd/testing/RunningServer.h"
 #include "nox/Faults.h"
+#include "orbis/Any.h"
 #include "orbis/Types.h"
 #include "otxctl/TaskScope.h"
 
@@ -234,6 +235,55 @@ TEST(TaskQueue, TakesTasksOfManyThreadsAtOnce) {
   }
   EXPECT_EQ(done, 400);
   EXPECT_EQ(queue.List().size(), 400u);
+}
+
+// A list of texts that comes to `bytes` of JSON.
+Answer AnswerOf(std::size_t bytes) {
+  const auto texts = Tessa::MakeRef<Orbis::ArrayOfString>();
+  texts->Items().emplace_back(bytes - 4, 't');
+  return {.result = texts, .fault = nullptr};
+}
+
+TEST(TaskQueue, ForgetsTheResultsOfTheOldestWhenTheyAreLarge) {
+  TaskQueue queue({.rememberedBytes = 1000});
+  const Task first = Await(queue, [] { return AnswerOf(400); });
+  const Task second = Await(queue, [] { return AnswerOf(600); });
+  EXPECT_TRUE(queue.Find(first.id)->answer.result) << "both fit";
+  const Task third = Await(queue, [] { return AnswerOf(400); });
+  EXPECT_FALSE(queue.Find(first.id)->answer.result);
+  EXPECT_TRUE(queue.Find(first.id)->resultForgotten);
+  EXPECT_TRUE(queue.Find(second.id)->answer.result);
+  const Task largest = Await(queue, [] { return AnswerOf(1001); });
+  EXPECT_TRUE(largest.answer.result);
+  EXPECT_TRUE(queue.Find(largest.id)->answer.result) << "whoever did not wait for it can still ask";
+  EXPECT_TRUE(queue.Find(second.id)->resultForgotten);
+  EXPECT_TRUE(queue.Find(third.id)->resultForgotten);
+  EXPECT_EQ(queue.List().size(), 4u) << "the tasks are still known";
+}
+
+TEST(TaskQueue, CountsNoResultOfATaskThatIsForgotten) {
+  TaskQueue queue({.remembered = 1, .rememberedBytes = 1000});
+  Await(queue, [] { return AnswerOf(900); });
+  Await(queue, [] { return AnswerOf(900); });
+  const Task last = Await(queue, [] { return AnswerOf(900); });
+  EXPECT_FALSE(queue.Find(last.id)->resultForgotten);
+}
+
+TEST(TaskQueue, TakesOnNoMoreBytesThanItsLimit) {
+  Gate gate;
+  std::promise<void> done;
+  TaskQueue queue({.waitingBytes = 1000});
+  queue.Submit("Slow", "", [&gate] {
+    gate.Enter();
+    return Answer();
+  });
+  gate.WaitUntilEntered();
+  queue.Submit(
+      "Large", "", &Nothing, [&done](const Task&) { done.set_value(); }, 2000);
+  EXPECT_THROW(queue.Submit("Small", "", &Nothing, {}, 1), Nox::Fault::Busy::Exception);
+  gate.Open();
+  done.get_future().wait();
+  EXPECT_EQ(WhyBusy(queue), "taken on") << "there is room again";
 }
 
 }  // namespace

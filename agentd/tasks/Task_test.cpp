@@ -56,6 +56,8 @@ TEST(Task, ThatHasEndedCarriesItsAnswer) {
   task.answer = {};
   task.state = TaskState::Done;
   EXPECT_TRUE(Json(task).find(R"("result":null,"fault":null})") != std::string::npos);
+  task.resultForgotten = true;
+  EXPECT_TRUE(Json(task).find(R"("result":null,"resultForgotten":true,"fault":null})") != std::string::npos);
 }
 
 TEST(Task, StatesHaveNames) {

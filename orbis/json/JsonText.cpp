@@ -1,11 +1,13 @@
 #include "orbis/json/JsonText.h"
 
+#include <algorithm>
 #include <cstddef>
 #include <iterator>
 #include <limits>
 #include <nlohmann/json.hpp>
 #include <set>
 
+#include "orbis/Excerpt.h"
 #include "orbis/ParseException.h"
 
 namespace Orbis::Json {
@@ -166,6 +168,13 @@ class Builder final : public Library::json_sax_t {
   std::size_t _count = 0;
 };
 
+// Whether every character stands for itself in a JSON string.
+bool IsPlain(std::string_view text) {
+  return std::all_of(text.begin(), text.end(), [](char character) {
+    return character >= ' ' && character < 0x7F && character != '"' && character != '\\';
+  });
+}
+
 }  // namespace
 
 const Value* Value::Find(std::string_view key) const noexcept {
@@ -186,9 +195,9 @@ std::string Describe(const Value& value) {
     case Kind::Integer:
       return "the number " + std::to_string(value.integer);
     case Kind::Number:
-      return "the number " + value.text.substr(0, 64);
+      return "the number " + std::string(Excerpt(value.text));
     case Kind::String:
-      return "the text '" + value.text.substr(0, 64) + "'";
+      return "the text '" + std::string(Excerpt(value.text)) + "'";
     case Kind::Array:
       return "an array";
     case Kind::Object:
@@ -210,6 +219,10 @@ Value Parse(std::string_view text, const Limits& limits) {
 }
 
 void AppendString(std::string_view text, std::string& out) {
+  if (IsPlain(text)) {
+    out.append("\"").append(text).append("\"");  // as nearly all texts are: the library takes its time
+    return;
+  }
   out += Library(text).dump(-1, ' ', false, Library::error_handler_t::replace);
 }
 

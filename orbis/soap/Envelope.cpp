@@ -6,7 +6,9 @@
 #include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/Types.h"
+#include "orbis/WrittenSoap.h"
 #include "orbis/soap/ElementCodec.h"
+#include "orbis/soap/WrittenText.h"
 #include "orbis/xml/XmlReader.h"
 #include "orbis/xml/XmlWriter.h"
 
@@ -65,6 +67,20 @@ const Element& ContentOf(const Element& root) {
   return *content;
 }
 
+// The next item of a list, under another name.
+void AppendRenamed(Soap::WrittenText& written, std::string_view name, std::string& out) {
+  const Soap::WrittenTag item = written.Open();
+  if (item.name != "item") {
+    throw Soap::Unfamiliar();
+  }
+  out.append("<").append(name);
+  if (!item.type.empty()) {
+    out.append(" xsi:type=\"").append(item.type).append("\"");
+  }
+  out.append(">").append(written.TakeContent()).append("</").append(name).append(">");
+  written.Close(item.name);
+}
+
 // The envelope round what `append` writes into the body; all or nothing.
 template <class Append>
 void AppendEnvelope(std::string& out, Append append) {
@@ -110,6 +126,28 @@ Ref<Any> SoapMessage::Read(const TypeDescriptor& type) const {
 
 void AppendSoapMessage(std::string_view name, const DataObject& content, std::string& out) {
   AppendEnvelope(out, [&] { Soap::AppendElement(name, content, &content.GetType(), out); });
+}
+
+bool AppendMessageOfSoap(std::string_view name, std::string_view field, const TypeDescriptor& list,
+                         std::string_view text, std::string& out) {
+  const auto append = [&] {
+    Soap::WrittenText written(text);
+    if (written.OpenRoot() != list.name) {
+      throw Soap::Unfamiliar();
+    }
+    out.append("<").append(name).append(" xmlns=\"").append(apiNamespace).append("\">");
+    while (!written.IsAtEndTag()) {
+      AppendRenamed(written, field, out);
+    }
+    written.CloseRoot();
+    out.append("</").append(name).append(">");
+  };
+  try {
+    AppendEnvelope(out, append);
+    return true;
+  } catch (const Soap::Unfamiliar&) {
+    return false;
+  }
 }
 
 void AppendSoapFault(std::string_view code, std::string_view text, const MethodFault* fault,

@@ -1,5 +1,6 @@
 #include <string>
 
+#include "orbis/Excerpt.h"
 #include "orbis/ParseException.h"
 #include "orbis/Scalar.h"
 #include "orbis/Soap.h"
@@ -183,7 +184,7 @@ class SoapReader {
       Refuse(*element.firstChild, "unexpected element inside a simple value");
     }
     if (!ParseScalar(kind, element.text, value)) {
-      Refuse(element, Quoted(element.text.substr(0, 64)) + " is not " + std::string(DescribeKind(kind)));
+      Refuse(element, Quoted(Excerpt(element.text)) + " is not " + std::string(DescribeKind(kind)));
     }
   }
 
@@ -206,7 +207,7 @@ class SoapReader {
 
   static void CheckNoText(const Element& element) {
     if (element.text.find_first_not_of(" \t\r\n") != std::string_view::npos) {
-      Refuse(element, "unexpected text " + Quoted(element.text.substr(0, 64)));
+      Refuse(element, "unexpected text " + Quoted(Excerpt(element.text)));
     }
   }
 

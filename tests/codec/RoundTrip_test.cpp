@@ -16,6 +16,7 @@
 #include "orbis/ParseException.h"
 #include "orbis/Soap.h"
 #include "orbis/Types.h"
+#include "orbis/WrittenSoap.h"
 #include "tests/codec/CleanText.h"
 #include "tests/codec/Samples.h"
 #include "tests/codec/SchemaCheck.h"
@@ -170,6 +171,16 @@ TEST_P(RoundTrip, KeepsTheTypeOfAnEmptyListThatStandsForAnyValue) {
 
 INSTANTIATE_TEST_SUITE_P(Codecs, RoundTrip, ::testing::ValuesIn(codecs),
                          [](const auto& row) { return row.param.name; });
+
+TEST(WrittenSoap, TurnsIntoTheJsonOfItsObject) {
+  for (std::uint64_t seed = FirstSeed(); seed < FirstSeed() + objectCount; ++seed) {
+    const Ref<Any> original = RandomObjects(seed, Texts::Dirty).Make(TypeFor(seed));
+    const std::string text = WriteSoap(*original);
+    std::string json;
+    ASSERT_TRUE(Orbis::AppendJsonOfSoap(text, json)) << "seed " << seed << "\n" << text;
+    ASSERT_EQ(json, WriteJson(*ReadSoap(text, original->GetType()))) << "seed " << seed << "\n" << text;
+  }
+}
 
 TEST(RandomTexts, AreValidInTheSchema) {
   constexpr std::uint64_t textCount = 600;

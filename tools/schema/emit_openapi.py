@@ -26,6 +26,7 @@ TASK = {
         "percent": {"type": "integer"},
         "step": {"type": "string"},
         "result": {"description": "Of one that has ended, and asked for by its id."},
+        "resultForgotten": {"type": "boolean", "description": "Of one whose result was too large to be kept."},
         "fault": {"anyOf": [{"$ref": "#/components/schemas/AnyMethodFault"}, {"type": "null"}]},
     },
     "required": ["id", "label", "operation", "state", "created", "percent", "step"],

@@ -1,0 +1,126 @@
+// The part of the gate that asks the kernel.
+
+#include <algorithm>
+#include <unordered_map>
+
+#include "host/Gate.h"
+#include "host/KnownDisks.h"
+#include "host/Refusal.h"
+#include "kova/agentd/include/HostCtlException.h"
+#include "kova/agentd/include/KovaInfo.h"
+#include "nox/Host.h"
+#include "nox/Kova.h"
+
+namespace Host::Gate {
+
+using Orbis::Fault::SystemError;
+using Tessa::MakeRef;
+
+namespace {
+
+using Positions = std::unordered_map<std::string, std::size_t>;
+
+// Which of the flash disks belong to groups that are not mounted, as the kernel says; and where each stands.
+Positions CacheDisksOffline(const DiskList& disks, HostCtl::Kova::KovaInfo& kernel) {
+  Positions flash;
+  std::vector<std::string> names;
+  for (std::size_t i = 0; i < disks.Size(); ++i) {
+    if (disks[i]->GetSsd() && flash.emplace(disks[i]->GetCanonicalName(), i).second) {
+      names.push_back(disks[i]->GetCanonicalName());
+    }
+  }
+  if (names.empty()) {
+    return {};  // a query without names would answer for every disk of the host
+  }
+  std::vector<HostCtl::Kova::DiskResult> records;
+  kernel.QueryDisks(names, records, true);
+  Positions offline;
+  for (const HostCtl::Kova::DiskResult& record : records) {
+    const auto at = flash.find(record.name);
+    if (record.isSsd && record.reason == HostCtl::Kova::DiskReason::GroupNotMounted && at != flash.end()) {
+      offline.insert(*at);
+    }
+  }
+  return offline;
+}
+
+// How requests name one of the kernel's disks when the inventory lacks it; empty when it does not.
+std::string NameIfMissing(const HostCtl::Kova::DiskName& disk, const KnownDisks& known) {
+  if (disk.deviceName.empty()) {
+    return AbsentName(disk.kovaUuid);
+  }
+  return known.Find(disk.deviceName) ? std::string() : disk.deviceName;
+}
+
+// The first of the group's disks that the inventory lacks; empty when all are there.
+std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDisks& known) {
+  std::string missing = NameIfMissing(group.ssd, known);
+  for (auto disk = group.capacityDisks.begin(); missing.empty() && disk != group.capacityDisks.end();
+       ++disk) {
+    missing = NameIfMissing(*disk, known);
+  }
+  return missing;
+}
+
+[[noreturn]] void RefuseBrokenGroup(const std::string& place, const std::string& ssd,
+                                    const std::string& missing) {
+  Refuse(place, "'" + ssd + "' heads a disk group that is not mounted and lacks its disk '" + missing +
+                    "'; bring that disk back, or remove it from the group first");
+}
+
+// Runs what asks the kernel. When the kernel fails, that is a SystemError with both texts.
+template <class Work>
+void AskOrFail(const char* what, Work ask) {
+  try {
+    ask();
+  } catch (const HostCtl::Lib::HostCtlException& failed) {
+    throw SystemError::Exception(MakeRef<SystemError>(what + failed.Describe()));
+  }
+}
+
+}  // namespace
+
+void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel) {
+  AskOrFail("Whether the disks belong to groups that lack a disk could not be found out: ", [&] {
+    const Positions offline = CacheDisksOffline(disks, kernel);
+    if (offline.empty()) {
+      return;
+    }
+    std::vector<HostCtl::Kova::DiskMapping> groups;
+    kernel.GetDiskMappings(groups, true);
+    for (const HostCtl::Kova::DiskMapping& group : groups) {
+      const auto at = offline.find(group.ssd.deviceName);
+      const std::string missing = at == offline.end() ? std::string() : MissingMember(group, known);
+      if (!missing.empty()) {
+        RefuseBrokenGroup(Indexed("disks", at->second), at->first, missing);
+      }
+    }
+  });
+}
+
+void DemandAnswers(HostCtl::Kova::KovaInfo& kernel) {
+  AskOrFail("Nothing is formatted, for the kernel could not be asked about its disks: ", [&] {
+    kernel.RefreshKovaInfo();
+    std::vector<HostCtl::Kova::DiskResult> records;
+    kernel.QueryDisks({}, records, true);
+  });
+}
+
+void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::Kova::KovaInfo& kernel) {
+  const std::string& name = mapping.GetSsd()->GetCanonicalName();
+  if (!HasAbsentPrefix(name)) {
+    return;
+  }
+  AskOrFail("The disk groups of the host could not be found out: ", [&] {
+    std::vector<HostCtl::Kova::DiskMapping> groups;
+    kernel.GetDiskMappings(groups, true);
+    const auto isHead = [&name](const HostCtl::Kova::DiskMapping& group) {
+      return group.ssd.deviceName.empty() && AbsentName(group.ssd.kovaUuid) == name;
+    };
+    if (std::none_of(groups.begin(), groups.end(), isHead)) {
+      Refuse("mapping.ssd", "no disk group of this host has the absent cache disk '" + name + "'");
+    }
+  });
+}
+
+}  // namespace Host::Gate

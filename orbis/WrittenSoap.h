@@ -1,0 +1,25 @@
+// SOAP texts that this program's own writer wrote, turned into what clients are sent.
+//
+// The outcome is what reading the text and writing the object would give, to the letter, without the object
+// and for a fraction of the time. A text that is not just as the writer writes it gives false, and `out` is
+// as it was: whoever must have an answer then reads the text in full.
+//
+// Threads: any.
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "orbis/Any.h"
+
+namespace Orbis {
+
+// Appends the value's JSON, as WriteJson does.
+TESSA_API bool AppendJsonOfSoap(std::string_view text, std::string& out);
+
+// Appends a message, as AppendSoapMessage does, of an object whose one field that is set is the list. The
+// text must be that of a list of exactly that type.
+TESSA_API bool AppendMessageOfSoap(std::string_view name, std::string_view field, const TypeDescriptor& list,
+                                   std::string_view text, std::string& out);
+
+}  // namespace Orbis

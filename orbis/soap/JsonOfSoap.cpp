@@ -1,0 +1,166 @@
+#include <string>
+
+#include "orbis/Limits.h"
+#include "orbis/TypeDescriptor.h"
+#include "orbis/WrittenSoap.h"
+#include "orbis/json/JsonText.h"
+#include "orbis/soap/WrittenText.h"
+
+namespace Orbis {
+namespace {
+
+using Soap::Unfamiliar;
+using Soap::WrittenTag;
+using Soap::WrittenText;
+
+constexpr std::string_view simplePrefix = "xsd:";
+
+// Walks the text along the descriptors, and writes each value as soon as it is met.
+class Transcriber {
+ public:
+  Transcriber(std::string_view text, std::string& out) : _text(text), _out(out) {}
+
+  void WriteRoot() {
+    WriteContent(TypeNamed(_text.OpenRoot()), false);
+    _text.CloseRoot();
+  }
+
+ private:
+  static const TypeDescriptor& TypeNamed(std::string_view name) {
+    const bool isSimple = name.substr(0, simplePrefix.size()) == simplePrefix;
+    const TypeDescriptor* const type =
+        isSimple ? FindSimpleType(name.substr(simplePrefix.size())) : FindType(name);
+    if (type == nullptr || type->IsAbstract()) {
+      throw Unfamiliar();
+    }
+    return *type;
+  }
+
+  // An element whose declared type may be null (any).
+  void WriteElement(const TypeDescriptor* declared) {
+    const WrittenTag tag = _text.Open();
+    if (declared == nullptr ? tag.type.empty() : tag.type.empty() && declared->IsAbstract()) {
+      throw Unfamiliar();
+    }
+    const TypeDescriptor& type = tag.type.empty() ? *declared : TypeNamed(tag.type);
+    if (declared != nullptr && !type.IsA(*declared)) {
+      throw Unfamiliar();
+    }
+    WriteContent(type, declared == nullptr);
+    _text.Close(tag.name);
+  }
+
+  // `any`: the value stands where any may stand, so a list must say its type.
+  void WriteContent(const TypeDescriptor& type, bool any) {
+    if (++_depth > Limits::OwnOutput().depth) {
+      throw Unfamiliar();
+    }
+    if (type.kind == TypeKind::DataObject) {
+      WriteObject(type);
+    } else if (type.kind == TypeKind::Simple) {
+      WriteHead(simplePrefix, type.name);
+      WriteValue(type.simple);
+      _out += '}';
+    } else {
+      if (any) {
+        WriteHead("", type.name);
+      }
+      WriteList("item", type.kind == TypeKind::StringArray ? nullptr : type.element);
+      if (any) {
+        _out += '}';
+      }
+    }
+    --_depth;
+  }
+
+  void WriteHead(std::string_view prefix, std::string_view type) {
+    _out.append("{\"@type\":\"").append(prefix).append(type).append("\",\"@value\":");
+  }
+
+  void WriteObject(const TypeDescriptor& type) {
+    _out.append("{\"@type\":\"").append(type.name).append("\"");
+    for (const FieldDescriptor* field : type.fields) {
+      if (_text.IsAtElement(field->name)) {
+        _out.append(",\"").append(field->name).append("\":");
+        WriteField(*field);
+      } else if (field->presence == Presence::Required) {
+        throw Unfamiliar();
+      }
+    }
+    _out += '}';
+  }
+
+  void WriteField(const FieldDescriptor& field) {
+    if (field.presence == Presence::List) {
+      WriteList(field.name, field.kind == FieldKind::Strings ? nullptr : &field.declaredType());
+    } else if (IsScalar(field.kind) || field.kind == FieldKind::Base64) {
+      WriteSimpleElement(field.kind);
+    } else {
+      WriteElement(field.kind == FieldKind::Any ? nullptr : &field.declaredType());
+    }
+  }
+
+  // The elements of that name that follow one another. No element type: they are texts.
+  void WriteList(std::string_view name, const TypeDescriptor* element) {
+    _out += '[';
+    for (const char* separator = ""; _text.IsAtElement(name); separator = ",") {
+      _out += separator;
+      if (element == nullptr) {
+        WriteSimpleElement(FieldKind::String);
+      } else {
+        WriteElement(element);
+      }
+    }
+    _out += ']';
+  }
+
+  void WriteSimpleElement(FieldKind kind) {
+    const WrittenTag tag = _text.Open();
+    if (!tag.type.empty()) {
+      throw Unfamiliar();
+    }
+    WriteValue(kind);
+    _text.Close(tag.name);
+  }
+
+  // Values but texts look the same in both forms, quotes aside.
+  void WriteValue(FieldKind kind) {
+    const std::string_view value = _text.TakeValue();
+    if (kind == FieldKind::String) {
+      WriteText(value);
+      return;
+    }
+    const bool quoted = kind == FieldKind::DateTime || kind == FieldKind::Base64;
+    _out.append(quoted ? "\"" : "").append(value).append(quoted ? "\"" : "");
+  }
+
+  void WriteText(std::string_view value) {
+    if (value.find('&') == std::string_view::npos) {
+      Json::AppendString(value, _out);
+      return;
+    }
+    _unescaped.clear();
+    Soap::AppendUnescaped(value, _unescaped);
+    Json::AppendString(_unescaped, _out);
+  }
+
+  WrittenText _text;
+  std::string& _out;
+  std::string _unescaped;
+  std::size_t _depth = 0;
+};
+
+}  // namespace
+
+bool AppendJsonOfSoap(std::string_view text, std::string& out) {
+  const std::size_t before = out.size();
+  try {
+    Transcriber(text, out).WriteRoot();
+    return true;
+  } catch (const Unfamiliar&) {
+    out.resize(before);
+    return false;
+  }
+}
+
+}  // namespace Orbis

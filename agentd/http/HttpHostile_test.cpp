@@ -31,7 +31,7 @@ constexpr std::size_t mib = kib * kib;
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 constexpr std::size_t mostMemory = 1024 * mib;
 #else
-constexpr std::size_t mostMemory = 48 * mib;  // one body of the greatest length, and what it takes to read it
+constexpr std::size_t mostMemory = 64 * mib;  // a body of 16 MiB grows in steps of twice its size: 48 at most
 #endif
 constexpr std::chrono::seconds mostTime(20);
 

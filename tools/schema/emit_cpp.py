@@ -315,12 +315,23 @@ def documents_header(origin):
 
 
 def documents_source(schema, origin):
-    lines = [BANNER.format(origin=origin), '#include "nox/Documents.h"', "", "namespace Nox {"]
+    lines = [BANNER.format(origin=origin), '#include "nox/Documents.h"', "", "#include <string>", "", "namespace Nox {"]
     for name, document in (("Wsdl", emit_xsd.wsdl(schema)), ("Xsd", emit_xsd.xsd(schema)),
                            ("OpenApi", emit_openapi.openapi(schema))):
-        lines += ["", f"std::string_view {name}Text() noexcept {{", '  return R"document(' + document[0]]
-        lines += document[1:] + [')document";', "}"]
+        lines += ["", f"std::string_view {name}Text() noexcept {{", "  static const std::string* const text = new std::string("]
+        lines += [" +\n".join(f'std::string(R"document({piece})document")' for piece in pieces(document)) + ");"]
+        lines += ["  return *text;", "}"]
     return lines + ["", "}  // namespace Nox"]
+
+
+def pieces(document, most=30_000):
+    """The text of the lines in pieces: compilers need not understand longer literals."""
+    found = [""]
+    for line in document:
+        if len(found[-1]) + len(line) > most:
+            found.append("")
+        found[-1] += line + "\n"
+    return found
 
 
 def write(path, lines):

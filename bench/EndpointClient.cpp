@@ -14,8 +14,11 @@ namespace Bench {
 namespace asio = boost::asio;
 namespace http = boost::beast::http;
 
-Address UnixAddress(const std::string& path) {
-  return asio::local::stream_protocol::endpoint(path);
+Address ToAddress(const Agentd::HttpAddress& address) {
+  if (address.isUnix) {
+    return asio::local::stream_protocol::endpoint(address.place);
+  }
+  return asio::ip::tcp::endpoint(asio::ip::make_address(address.place), address.port);
 }
 
 std::string GetRequest(std::string_view target) {

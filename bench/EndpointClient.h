@@ -12,12 +12,14 @@
 #include <string>
 #include <string_view>
 
+#include "agentd/http/HttpAddress.h"
+
 namespace Bench {
 
 // Where a server answers, whatever kind of socket that is.
 using Address = boost::asio::generic::stream_protocol::endpoint;
 
-Address UnixAddress(const std::string& path);
+Address ToAddress(const Agentd::HttpAddress& address);
 
 // Requests as they go over the wire.
 std::string GetRequest(std::string_view target);

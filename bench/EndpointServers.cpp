@@ -11,10 +11,11 @@ namespace asio = boost::asio;
 namespace http = boost::beast::http;
 using boost::system::error_code;
 
-AgentServer::AgentServer(const std::string& socketPath, Host::HostRuntime& runtime)
+AgentServer::AgentServer(const std::vector<Agentd::HttpAddress>& listen, Host::HostRuntime& runtime)
     : _service(runtime.Hooks(), &runtime.SimulatedHost()),
       _router(_service, _tasks),
-      _server(Agentd::HttpOptions{.listen = {Agentd::UnixAddress(socketPath)}},
+      // By that name clients reach it whatever port was found.
+      _server(Agentd::HttpOptions{.listen = listen, .serverNames = {"localhost"}},
               [this](const Agentd::HttpRequest& request, const Agentd::HttpResponder& responder) {
                 _router.Serve(request, responder);
               }),

@@ -20,11 +20,14 @@ namespace Bench {
 // The agent as it is shipped, but for its command line: HTTP server, routes, tasks, gate and plug-in.
 class AgentServer {
  public:
-  AgentServer(const std::string& socketPath, Host::HostRuntime& runtime);
+  AgentServer(const std::vector<Agentd::HttpAddress>& listen, Host::HostRuntime& runtime);
   // Clients must have gone, and their changes ended.
   ~AgentServer();
   AgentServer(const AgentServer&) = delete;
   AgentServer& operator=(const AgentServer&) = delete;
+
+  // Of the listener of that place in the list, with the port that was found.
+  Address At(std::size_t listener) const { return ToAddress(_server.Addresses().at(listener)); }
 
  private:
   Host::KovaService _service;
@@ -43,6 +46,8 @@ class BareServer {
   ~BareServer();
   BareServer(const BareServer&) = delete;
   BareServer& operator=(const BareServer&) = delete;
+
+  Address At() const { return _acceptor.local_endpoint(); }
 
  private:
   using Protocol = boost::asio::generic::stream_protocol;

@@ -57,17 +57,27 @@ Host::HostRuntime& StartRuntime(std::shared_ptr<OtxCtl::Fault::CallRecorder> rec
   return Host::HostRuntime::Start(options);
 }
 
+// One kind of socket, and both servers on it.
+struct Listener {
+  std::string name;
+  Bench::Address agent;
+  Bench::Address bare;
+};
+
 // Both servers, side by side on one simulated host.
 class World {
  public:
   World()
       : _recorder(std::make_shared<OtxCtl::Fault::CallRecorder>()),
         _runtime(StartRuntime(_recorder)),
-        _agent(_folder.PathOf("agent.sock"), _runtime),
-        _bare(Bench::UnixAddress(_folder.PathOf("bare.sock")), _runtime.Hooks()) {}
+        _agent({Agentd::UnixAddress(_folder.PathOf("agent.sock")), AnyPort()}, _runtime),
+        _bareUnix(Bench::ToAddress(Agentd::UnixAddress(_folder.PathOf("bare.sock"))), _runtime.Hooks()),
+        _bareTcp(Bench::ToAddress(AnyPort()), _runtime.Hooks()) {}
 
-  Bench::Address Agent() const { return Bench::UnixAddress(_folder.PathOf("agent.sock")); }
-  Bench::Address Bare() const { return Bench::UnixAddress(_folder.PathOf("bare.sock")); }
+  // Over which sockets each server answers.
+  std::vector<Listener> Listeners() const {
+    return {{"unix", _agent.At(0), _bareUnix.At()}, {"tcp", _agent.At(1), _bareTcp.At()}};
+  }
   OtxCtl::Fault::CallRecorder& Kernel() { return *_recorder; }
 
   // Another host, of so many disks, none of them in use.
@@ -80,11 +90,14 @@ class World {
   }
 
  private:
+  static Agentd::HttpAddress AnyPort() { return Agentd::ParseAddress("tcp:127.0.0.1:0"); }
+
   SocketFolder _folder;
   std::shared_ptr<OtxCtl::Fault::CallRecorder> _recorder;
   Host::HostRuntime& _runtime;
   Bench::AgentServer _agent;
-  Bench::BareServer _bare;
+  Bench::BareServer _bareUnix;
+  Bench::BareServer _bareTcp;
 };
 
 // One kind of query: whom it goes to, and how the answer names each disk.
@@ -101,10 +114,14 @@ std::string SoapQuery() {
                             "<QueryDisksForKova xmlns=\"urn:nox\"/></e:Body></e:Envelope>");
 }
 
-std::vector<Query> Queries(const World& world) {
-  return {{"unix/bare", world.Bare(), Bench::GetRequest("/"), "<item>"},
-          {"unix/json", world.Agent(), Bench::GetRequest("/api/v1/disks"), "\"disk\":"},
-          {"unix/soap", world.Agent(), SoapQuery(), "<returnval>"}};
+Query JsonQuery(const Listener& listener) {
+  return {listener.name + "/json", listener.agent, Bench::GetRequest("/api/v1/disks"), "\"disk\":"};
+}
+
+std::vector<Query> Queries(const Listener& listener) {
+  return {{listener.name + "/bare", listener.bare, Bench::GetRequest("/"), "<item>"},
+          JsonQuery(listener),
+          {listener.name + "/soap", listener.agent, SoapQuery(), "<returnval>"}};
 }
 
 std::size_t CountOf(const std::string& text, const std::string& part) {
@@ -166,7 +183,7 @@ class SlowFormat {
     slow.operation = "FormatDiskMapping";
     slow.delayMs = formatMs;
     _kernel.Inject(slow);
-    _change = std::async(std::launch::async, [address = world.Agent()] {
+    _change = std::async(std::launch::async, [address = world.Listeners().front().agent] {
       Bench::EndpointClient(address).Ask(Bench::PostRequest("/api/v1/InitializeDisks", "application/json",
                                                             "{\"mappings\":[{\"ssd\":\"" +
                                                                 Bench::DiskName(0) + "\",\"nonSsd\":[\"" +
@@ -207,30 +224,36 @@ void LatencyWhileFormatting(benchmark::State& state, World& world, const Query& 
   }
 }
 
+void RegisterEndpoint(World& world, const Query& query) {
+  const auto run = [&world, query](benchmark::State& state) { Endpoint(state, world, query); };
+  benchmark::RegisterBenchmark(("Endpoint/" + query.name).c_str(), run)
+      ->ArgName("disks")
+      ->Arg(12)
+      ->Arg(512)
+      ->Threads(1)
+      ->Threads(8)
+      ->MeasureProcessCPUTime()  // of server and client: what a busy machine leaves as it is
+      ->UseRealTime();
+}
+
+using Latency = void (*)(benchmark::State&, World&, const Query&);
+
+void RegisterLatency(World& world, const char* name, Latency latency) {
+  constexpr int samples = 4000;  // well inside the time of a slow format
+  const auto run = [&world, latency, query = JsonQuery(world.Listeners().front())](benchmark::State& state) {
+    latency(state, world, query);
+  };
+  benchmark::RegisterBenchmark(name, run)->ArgName("disks")->Arg(12)->Iterations(samples)->UseRealTime();
+}
+
 void RegisterAll(World& world) {
-  constexpr int latencySamples = 4000;  // well inside the time of a slow format
-  for (const Query& query : Queries(world)) {
-    const auto endpoint = [&world, query](benchmark::State& state) { Endpoint(state, world, query); };
-    benchmark::RegisterBenchmark(("Endpoint/" + query.name).c_str(), endpoint)
-        ->ArgName("disks")
-        ->Arg(12)
-        ->Arg(512)
-        ->Threads(1)
-        ->Threads(8)
-        ->MeasureProcessCPUTime()  // of server and client: what a busy machine leaves as it is
-        ->UseRealTime();
+  for (const Listener& listener : world.Listeners()) {
+    for (const Query& query : Queries(listener)) {
+      RegisterEndpoint(world, query);
+    }
   }
-  const Query json = Queries(world)[1];
-  using Latency = void (*)(benchmark::State&, World&, const Query&);
-  for (const auto& [name, run] : {std::pair<const char*, Latency>{"LatencyIdle", &LatencyIdle},
-                                  {"LatencyWhileFormatting", &LatencyWhileFormatting}}) {
-    const auto latency = [&world, json, run = run](benchmark::State& state) { run(state, world, json); };
-    benchmark::RegisterBenchmark(name, latency)
-        ->ArgName("disks")
-        ->Arg(12)
-        ->Iterations(latencySamples)
-        ->UseRealTime();
-  }
+  RegisterLatency(world, "LatencyIdle", &LatencyIdle);
+  RegisterLatency(world, "LatencyWhileFormatting", &LatencyWhileFormatting);
 }
 
 }  // namespace

@@ -10,7 +10,6 @@ namespace Orbis {
 namespace {
 
 using Soap::Unfamiliar;
-using Soap::WrittenTag;
 using Soap::WrittenText;
 
 constexpr std::string_view simplePrefix = "xsd:";
@@ -36,18 +35,18 @@ class Transcriber {
     return *type;
   }
 
-  // An element whose declared type may be null (any).
-  void WriteElement(const TypeDescriptor* declared) {
-    const WrittenTag tag = _text.Open();
-    if (declared == nullptr ? tag.type.empty() : tag.type.empty() && declared->IsAbstract()) {
+  // The element of that name, which begins here. Its declared type may be null (any).
+  void WriteElement(std::string_view name, const TypeDescriptor* declared) {
+    const std::string_view typeName = _text.OpenKnown(name);
+    if (typeName.empty() && (declared == nullptr || declared->IsAbstract())) {
       throw Unfamiliar();
     }
-    const TypeDescriptor& type = tag.type.empty() ? *declared : TypeNamed(tag.type);
+    const TypeDescriptor& type = typeName.empty() ? *declared : TypeNamed(typeName);
     if (declared != nullptr && !type.IsA(*declared)) {
       throw Unfamiliar();
     }
     WriteContent(type, declared == nullptr);
-    _text.Close(tag.name);
+    _text.Close(name);
   }
 
   // `any`: the value stands where any may stand, so a list must say its type.
@@ -94,9 +93,9 @@ class Transcriber {
     if (field.presence == Presence::List) {
       WriteList(field.name, field.kind == FieldKind::Strings ? nullptr : &field.declaredType());
     } else if (IsScalar(field.kind) || field.kind == FieldKind::Base64) {
-      WriteSimpleElement(field.kind);
+      WriteSimpleElement(field.name, field.kind);
     } else {
-      WriteElement(field.kind == FieldKind::Any ? nullptr : &field.declaredType());
+      WriteElement(field.name, field.kind == FieldKind::Any ? nullptr : &field.declaredType());
     }
   }
 
@@ -106,21 +105,20 @@ class Transcriber {
     for (const char* separator = ""; _text.IsAtElement(name); separator = ",") {
       _out += separator;
       if (element == nullptr) {
-        WriteSimpleElement(FieldKind::String);
+        WriteSimpleElement(name, FieldKind::String);
       } else {
-        WriteElement(element);
+        WriteElement(name, element);
       }
     }
     _out += ']';
   }
 
-  void WriteSimpleElement(FieldKind kind) {
-    const WrittenTag tag = _text.Open();
-    if (!tag.type.empty()) {
+  void WriteSimpleElement(std::string_view name, FieldKind kind) {
+    if (!_text.OpenKnown(name).empty()) {
       throw Unfamiliar();
     }
     WriteValue(kind);
-    _text.Close(tag.name);
+    _text.Close(name);
   }
 
   // Values but texts look the same in both forms, quotes aside.

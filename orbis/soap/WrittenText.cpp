@@ -43,12 +43,13 @@ void WrittenText::CloseRoot() {
 
 bool WrittenText::IsAtElement(std::string_view name) const {
   const std::size_t end = 1 + name.size();
-  return _rest.size() > end && _rest.front() == '<' && _rest.compare(1, name.size(), name) == 0 &&
-         (_rest[end] == '>' || _rest[end] == ' ');
+  // The end of the name first: it tells most names apart.
+  return _rest.size() > end && (_rest[end] == '>' || _rest[end] == ' ') && _rest.front() == '<' &&
+         _rest.compare(1, name.size(), name) == 0;
 }
 
 WrittenTag WrittenText::Open() {
-  Take("<");
+  Take('<');
   std::size_t end = 0;
   while (end < _rest.size() && !EndsName(_rest[end])) {
     ++end;
@@ -56,21 +57,32 @@ WrittenTag WrittenText::Open() {
   if (end == 0 || end == _rest.size()) {
     throw Unfamiliar();
   }
-  WrittenTag tag{_rest.substr(0, end), {}};
+  const std::string_view name = _rest.substr(0, end);
   _rest.remove_prefix(end);
+  return {name, TakeTypeAndTagEnd()};
+}
+
+std::string_view WrittenText::OpenKnown(std::string_view name) {
+  _rest.remove_prefix(1 + name.size());
+  return TakeTypeAndTagEnd();
+}
+
+std::string_view WrittenText::TakeTypeAndTagEnd() {
+  std::string_view type;
   if (_rest.front() != '>') {
     Take(typeAttribute);
-    tag.type = TakeUntil('"');
-    Take("\"");
+    type = TakeUntil('"');
+    Take('"');
   }
-  Take(">");
-  return tag;
+  Take('>');
+  return type;
 }
 
 void WrittenText::Close(std::string_view name) {
-  Take("</");
+  Take('<');
+  Take('/');
   Take(name);
-  Take(">");
+  Take('>');
 }
 
 std::string_view WrittenText::TakeValue() {
@@ -96,6 +108,13 @@ void WrittenText::Take(std::string_view expected) {
     throw Unfamiliar();
   }
   _rest.remove_prefix(expected.size());
+}
+
+void WrittenText::Take(char expected) {
+  if (_rest.empty() || _rest.front() != expected) {
+    throw Unfamiliar();
+  }
+  _rest.remove_prefix(1);
 }
 
 std::string_view WrittenText::TakeUntil(char end) {

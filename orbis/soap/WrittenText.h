@@ -32,6 +32,8 @@ class WrittenText {
   // Whether the element of that name begins here.
   bool IsAtElement(std::string_view name) const;
   WrittenTag Open();
+  // The same where the element of that name is known to begin; its type.
+  std::string_view OpenKnown(std::string_view name);
   void Close(std::string_view name);
   // A value, escaped as it stands; what is behind the tag of an element without children.
   std::string_view TakeValue();
@@ -40,6 +42,8 @@ class WrittenText {
 
  private:
   void Take(std::string_view expected);
+  void Take(char expected);
+  std::string_view TakeTypeAndTagEnd();
   std::string_view TakeUntil(char end);
 
   std::string_view _rest;

@@ -314,6 +314,14 @@ TEST_P(RepeatedNames, AreAFaultWhenTheyAreNeighbours) {
   EXPECT_TRUE(IsCacheValid());
 }
 
+TEST_F(AddDisks, LooksForRepeatsBeforeItAsksForEligibleDisks) {
+  Know({Hdd("a"), Hdd("b")});
+  _app.SetObject("storageSystem", nullptr);
+  Add({Hdd("a"), Hdd("a")});
+  EXPECT_THAT(Fault(), NamesDevice("DuplicateDisks", "a"))
+      << "the question needs an inventory, the check none";
+}
+
 TEST_F(AddDisks, LooksForRepeatsAmongTheDisksThatAreLeft) {
   const Disks known = {Ssd("f"), Ssd("tagged"), Ssd("s"), Hdd("a")};
   Know(known, {ARecord("f").Ssd(), TaggedFlash("tagged"), ARecord("s").Ssd(), ARecord("a")});

@@ -323,6 +323,17 @@ TEST_P(MissingGroups, AreNotFoundAndNothingIsRemoved) {
   EXPECT_FALSE(IsCacheValid());
 }
 
+TEST_F(RemoveGroup, SaysWhichGroupBeforeItLooksForIt) {
+  LogIntoTimeline();
+  Remove(AMapping(Ssd("x"), {Hdd("a")}));
+  const std::string group = "log verbose: LogDiskMappings: Mapping[0]: { SSD: x, MDs: a }";
+  EXPECT_THAT(
+      EventsFrom(group),
+      ElementsAre(group, "GetDiskMappings(false)",
+                  "log warning: Failed to validate existing disk mapping: SSD: x, Disks: a", releaseOperation,
+                  takeCache, releaseCache, std::string("log verbose: ") + noResultLine));
+}
+
 TEST_F(RemoveGroup, DoesNotFindAnUnmountedGroup) {
   _kernel.unmountedGroups = _kernel.groups;
   _kernel.groups.clear();

@@ -119,6 +119,16 @@ TEST_F(Unmount, SaysWhichGroupsItUnmounts) {
                           LogLineIs(LogLevel::Verbose, noFaultLine)));
 }
 
+TEST_F(Unmount, SaysSoBeforeItAsksTheKernel) {
+  LogIntoTimeline();
+  Run({_first});
+  EXPECT_THAT(
+      EventsFrom("GetDiskMappings(false)"),
+      ElementsAre("GetDiskMappings(false)", "log verbose: LogDiskMappings: Mapping[0]: { SSD: s1, MDs: a }",
+                  "UnmountDiskMapping(s1)", releaseOperation, takeCache, releaseCache,
+                  std::string("log verbose: ") + noFaultLine));
+}
+
 TEST_F(Unmount, AnswersNothingToDoWithAnEmptyList) {
   RunTexts({});
   EXPECT_TRUE(Results()->IsEmpty());

@@ -1,6 +1,5 @@
 // Requested disk groups are checked before anything is formatted: the request as a whole, then each group.
 
-#include <algorithm>
 #include <utility>
 
 #include "kova/agentd/KovaManagerImpl.h"
@@ -30,12 +29,6 @@ namespace {
 
 constexpr std::size_t fewestDisks = 2;  // a cache disk and a capacity disk
 
-// The first name of the sorted list that stands twice, or null.
-const std::string* FindDuplicate(const std::vector<std::string>& sortedNames) {
-  const auto duplicate = std::adjacent_find(sortedNames.begin(), sortedNames.end());
-  return duplicate == sortedNames.end() ? nullptr : &*duplicate;
-}
-
 void LogDone(Logger& logger, std::string_view format, const Ref<MethodFault>& fault) {
   LogInternal(logger, LogLevel::Verbose, format, fault ? "FAIL" : "OK");
 }
@@ -49,9 +42,10 @@ Ref<MethodFault> CheckShape(Logger& logger, const DiskMapping& mapping,
   }
   LogInternal(logger, LogLevel::Verbose, "Checking %1 disks for uniqueness", names.size());
   Ref<MethodFault> fault;
-  if (const std::string* duplicate = FindDuplicate(names)) {
+  NameSet named(names);
+  if (const std::string_view* duplicate = named.FindRepeated()) {
     LogInternal(logger, LogLevel::Warning, "Duplicate disks found in mapping: %1", *duplicate);
-    fault = MakeRef<DuplicateDisks>(*duplicate);
+    fault = MakeRef<DuplicateDisks>(std::string(*duplicate));
   }
   LogDone(logger, "Done checking disk uniqueness: %1", fault);
   if (fault) {

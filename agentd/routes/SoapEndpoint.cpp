@@ -45,6 +45,10 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
   try {
     SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
     const Operation& operation = *read.operation;
+    if (const auto refusal = RefusalOf(request, operation.changes ? HttpRole::Change : HttpRole::Read)) {
+      responder.Answer(ToSoap("", *refusal));
+      return;
+    }
     Bound(read.arguments);
     if (operation.callWritten != nullptr) {
       responder.Answer(Written(operation.name, operation.callWritten(api, read.arguments)));
@@ -52,10 +56,6 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
     }
     if (!operation.changes) {
       responder.Answer(Written(operation.name, operation.call(api, read.arguments)));
-      return;
-    }
-    if (const auto refusal = RefusalOf(request, HttpRole::Change)) {
-      responder.Answer(ToSoap("", *refusal));
       return;
     }
     const std::size_t bytes = WeightOf(read.arguments);

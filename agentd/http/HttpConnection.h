@@ -2,9 +2,10 @@
 //
 // Threads: a connection belongs to one thread at a time. That is the network's, except while a request is
 // handled: from PassOn on it is the worker's, and whoever answers sends what it can, begins to read the next
-// request, and so gives the connection back. Only then does the network look at it again. Ownership: a
-// connection keeps itself alive while something of it is under way, an outstanding answer included, and
-// leaves the list of connections when it goes.
+// request, and so gives the connection back. Only then does the network look at it again.
+//
+// Ownership: a connection keeps itself alive while something of it is under way, an outstanding answer
+// included, and leaves the list of connections when it goes.
 #pragma once
 
 #include <array>

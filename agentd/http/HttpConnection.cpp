@@ -295,6 +295,7 @@ void HttpConnection::SetDeadline(std::chrono::milliseconds time) {
     const auto self = weak.lock();
     // One that was cleared or moved when it had just passed counts no more.
     if (!error && self && self->_deadlines == number) {
+      const std::lock_guard guard(self->_context.givingBack);  // that worker may not have let go of it yet
       self->_stream.Bare().Expire();
     }
   });

@@ -41,7 +41,8 @@ struct HttpContext {
   std::function<void()> onLastGone;  // told when the last connection has gone
   std::set<HttpConnection*> connections = {};
   std::atomic<bool> draining{false};  // answers are the last on their connection
-  // Held while draining begins, and while a worker gives a connection back: that one must not be missed.
+  // Held by a worker while it gives a connection back; and by the network to begin draining, which must not
+  // miss that one, and before it lets the time of one be over.
   std::mutex givingBack = {};
 };
 

@@ -17,7 +17,6 @@ namespace Agentd {
 
 using Nox::Fault::Busy;
 using Orbis::DateTime;
-using Tessa::MakeRef;
 using Tessa::Ref;
 
 namespace {

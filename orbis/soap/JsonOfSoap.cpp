@@ -114,7 +114,7 @@ class Transcriber {
   // The elements of that name that follow one another. No element type: they are texts.
   void WriteList(std::string_view name, const TypeDescriptor* element) {
     _out.Append("[");
-    for (std::string_view separator = ""; _text.IsAtElement(name); separator = ",") {
+    for (std::string_view separator; _text.IsAtElement(name); separator = ",") {
       _out.Append(separator);
       if (element == nullptr) {
         WriteSimpleElement(name, FieldKind::String);

@@ -80,6 +80,12 @@ void HttpConnection::Start(std::optional<HttpAnswer> refusal) {
 
 void HttpConnection::OnHandshake(Error error, std::optional<HttpAnswer> refusal) {
   if (error) {
+    // The client may still be sending: closed at once, it might never read what is wrong with its
+    // certificate.
+    SetDeadline(discardTime);
+    _waiting = false;
+    _refused = true;
+    CloseSending();
     return;
   }
   HttpPeer known = _context.access.PeerOf(CertificateNames(_stream.Secured()->native_handle()));

@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
@@ -232,6 +233,26 @@ TEST_F(HostRuntimeTest, SavesEveryChangeIfAskedTo) {
     HostRuntime::Start(options).SimulatedHost().Change([](HostDescription& host) { host.name = "changed"; });
     EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile).name, "changed");
   });
+}
+
+// File and memory are one, whatever the folder does once the file is in its place.
+TEST_F(HostRuntimeTest, WarnsOfAChangeThatMayNotLastAndKeepsIt) {
+  auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
+  options.save = true;
+  options.syncFolder = [](int) {
+    errno = EIO;
+    return -1;
+  };
+  InOwnProcess(
+      [&options] {
+        HostRuntime& runtime = HostRuntime::Start(options);
+        const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+        EXPECT_FALSE(service.AddAllEligibleDisks().fault);
+        EXPECT_EQ(runtime.SimulatedHost().Snapshot().groups.size(), 1u);
+        EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile), runtime.SimulatedHost().Snapshot());
+        FlushLogs();
+      },
+      0, "may not last a power cut: Input/output error");
 }
 
 TEST_F(HostRuntimeTest, LeavesTheFileAloneUnlessAskedTo) {

@@ -40,14 +40,18 @@ def untruth(operation, answer, before, after):
     for disk in after["disks"]:
         called.setdefault(request_name(disk), set()).add(disk["name"])
     for names in answer.groups:
-        candidates = [heads[name] for name in called.get(names[0], ()) if name in heads]
-        # A group that was offline, or whose cache disk has left, gets another identity; whatever other disks the
-        # request gives it, it stays as it is.
-        is_named_by_uuid = names[0].startswith("kova:")
-        if not any(is_named_by_uuid or group["ssd"] in offline or holds(group, names, called) for group in candidates):
+        if names[0].startswith("kova:"):  # such a group gets another identity, and stays as it is otherwise
+            known = any("kova:" + disk.get("kovaUuid", "") == names[0] and disk["name"] in heads
+                        for disk in after["disks"])
+            if not known:
+                return f"no group is headed by '{names[0]}'"
+            continue
+        group = heads.get(names[0])
+        # One that was offline comes back as it is, whatever disks the request gives it.
+        if group is None or not (names[0] in offline or holds(group, names, called)):
             return f"there is no group of {names}"
         mounted = operation != "UnmountDiskMapping"
-        if not is_named_by_uuid and not any(is_mounted(group) == mounted for group in candidates):
+        if is_mounted(group) != mounted:
             return f"the group of '{names[0]}' is not {'mounted' if mounted else 'unmounted'}"
     return None
 

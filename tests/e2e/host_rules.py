@@ -40,7 +40,7 @@ def untruth(operation, answer, before, after):
     for disk in after["disks"]:
         called.setdefault(request_name(disk), set()).add(disk["name"])
     for names in answer.groups:
-        if names[0].startswith("kova:"):  # such a group gets another identity, and stays as it is otherwise
+        if names[0].startswith("kova:") and operation != "UnmountDiskMapping":  # it only gets another identity
             known = any("kova:" + disk.get("kovaUuid", "") == names[0] and disk["name"] in heads
                         for disk in after["disks"])
             if not known:
@@ -108,11 +108,18 @@ class Comparison:
             return f"disks were formatted: {joined}"
         if self.operation != "AddAllEligibleDisks" and joined - self.named:
             return f"disks were formatted that the request does not name: {joined - self.named}"
-        for disk in self.before["disks"]:
-            gone = disk.get("absent") or not disk.get("inKernel", True) or disk.get("partitions")
-            if disk["name"] in joined and gone:
-                return f"the disk '{disk['name']}' was formatted, which is not there or holds partitions"
-        return None
+        unfit = {disk["name"]: self.why_unfit(disk) for disk in self.before["disks"] if disk["name"] in joined}
+        return next((f"the disk '{name}' was formatted, which {why}" for name, why in unfit.items() if why), None)
+
+    def why_unfit(self, disk):
+        """Why no group may be made of the disk; None where one may, or where the kernel has its own mind."""
+        transport = None if "verdict" in disk else disk.get("transport")
+        return next((why for is_so, why in [
+            (disk.get("absent"), "has left"), (not disk.get("inKernel", True), "the kernel does not know"),
+            (disk.get("partitions"), "holds partitions"), (transport == "usb", "is attached by USB"),
+            (not disk.get("inInventory", True), "the inventory lacks"),
+            (self.before.get("storageSystem") == "missing", "no inventory knows"),
+            (not disk.get("local", True) and "verdict" not in disk, "is not local")] if is_so), None)
 
     def of_leaving(self, left):
         if not left:
@@ -121,7 +128,12 @@ class Comparison:
             return f"disks left their groups: {left}"
         # A cache disk that is named takes its group along.
         strangers = {name for name in left if not {name, self.old[name]} & self.named}
-        return f"disks left their groups that the request does not name: {strangers}" if strangers else None
+        if strangers:
+            return f"disks left their groups that the request does not name: {strangers}"
+        heads = {self.old[name] for name in left}
+        if self.operation == "RemoveDiskMapping" and {name for name in self.old if self.old[name] in heads} != left:
+            return f"a part of a group was removed: {left}"
+        return None
 
     def of_groups(self):
         after = {group["ssd"]: group for group in self.after["groups"]}

@@ -28,6 +28,7 @@ PROVIDER_OPERATIONS = ["QueryDisks", "GetDiskMappings", "FormatDiskMapping", "Re
                        "RestampDiskMappingByUuid", "RemoveDisk", "RemoveDiskMapping", "UnmountDiskMapping",
                        "RemoveDiskByUuid", "IsAutoModeEnabled", "GetKovaOtxNicConfigs", "GetClusterInfoDetailed",
                        "GetFaultDomainName", "ClaimUnmountedDiskgroups", "RefreshKovaInfo"]
+ASKED_ALWAYS = ["RefreshKovaInfo", "QueryDisks", "GetDiskMappings", "FormatDiskMapping"]
 OPERATIONS = ["QueryDisksForKova", "GetStorageInfo", "GetDiskGroups", "GetConfigInfo", "AddDisks",
               "AddAllEligibleDisks", "InitializeDisks", "UnmountDiskMapping", "RemoveDisk", "RemoveDiskMapping",
               "ClaimUnmountedDiskgroup"]
@@ -80,7 +81,14 @@ class Draw:
             members = [free.pop() for _ in range(self.rng.randint(1, min(5, len(free))))]
             members[0]["ssd"] = not self.chance(12)
             groups.append(self.group([disk["name"] for disk in members]))
+            if self.chance(3):
+                self.rng.choice(members).update(self.loss())
         return disks, groups
+
+    def loss(self):
+        """How a disk goes missing: from the host, from the inventory, from the kernel."""
+        return self.rng.choice([{"absent": True, "kovaUuid": self.rng.choice(UUIDS)}, {"inInventory": False},
+                                {"inKernel": False}])
 
     def full_host(self):
         """Five groups or more, with all the disks that a group may have or nearly so, and some to spare."""
@@ -109,8 +117,7 @@ class Draw:
     def oddity(self):
         """Some keys of a disk, as they may be or become."""
         return self.rng.choice([
-            {"absent": True, "kovaUuid": self.rng.choice(UUIDS)}, {"absent": False}, {"inInventory": False},
-            {"inInventory": True}, {"inKernel": False}, {"inKernel": True}, {"partitions": self.rng.choice([0, 1, 99])},
+            self.loss(), self.loss(), {"absent": False}, {"inInventory": True}, {"inKernel": True}, {"partitions": self.rng.choice([0, 1, 99])},
             {"bytes": self.rng.choice([0, 1, (1 << 63) - 1])}, {"local": self.chance(2)},
             {"transport": self.rng.choice(TRANSPORTS)}, {"ssd": self.chance(2)}, {"capacityFlash": self.chance(2)},
             {"blockSize": self.rng.choice([1, 4096, (1 << 31) - 1])}, {"formatVersion": self.rng.choice([0, 1, 255])},
@@ -138,7 +145,7 @@ class Draw:
         """Faults of the provider in its next calls; `calls` of each operation were made until now."""
         rules = []
         while not rules or self.chance(2):
-            operation = self.rng.choice(PROVIDER_OPERATIONS)
+            operation = self.rng.choice(PROVIDER_OPERATIONS + ASKED_ALWAYS * 4)
             call = 0 if self.chance(4) else calls.get(operation, 0) + self.rng.randint(1, 6)
             rules.append({"operation": operation, "call": call, "exception": self.rng.choice(EXCEPTIONS),
                           "message": self.rng.choice(["text", "", "a&b<\u00fc>%1"]),
@@ -171,10 +178,13 @@ class Draw:
         return disk["name"] if odd < 8 else request_name(disk)
 
     def names(self, host):
-        kind = self.rng.randrange(4)
+        kind = self.rng.randrange(5)
         if kind == 0:
             return [self.name(host) for _ in range(self.rng.randrange(8))]
-        some = [request_name(disk) for disk in host["disks"]] if kind == 1 else self.free(host)
+        if kind == 1 and host["groups"]:  # a group again, by its cache disk, and perhaps some more
+            names = self.group_names(host)
+            return names[:self.rng.choice([1, 1, len(names)])] + self.free(host)[:self.rng.randrange(3)]
+        some = [request_name(disk) for disk in host["disks"]] if kind == 2 else self.free(host)
         return self.rng.sample(some, self.rng.randint(len(some) // 2, len(some)))
 
     @staticmethod
@@ -199,6 +209,8 @@ class Draw:
             names.insert(self.rng.randint(0, len(names)), self.name(host))
         if self.chance(12):
             names.pop(self.rng.randrange(len(names)))
+        if self.chance(12):
+            self.rng.shuffle(names)
         return {"ssd": self.named(names[0]), "nonSsd": [self.named(name) for name in names[1:]]}
 
     def group_names(self, host):

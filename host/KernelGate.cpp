@@ -68,6 +68,27 @@ std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDi
                     "'; bring that disk back, or remove it from the group first");
 }
 
+// How many of the disks are absent and called that.
+std::ptrdiff_t CountListed(const std::string& name, const std::vector<HostCtl::Kova::DiskResult>& records) {
+  return std::count_if(records.begin(), records.end(), [&name](const HostCtl::Kova::DiskResult& record) {
+    return record.name.empty() && AbsentName(record.kovaUuid) == name;
+  });
+}
+
+bool IsCalled(const HostCtl::Kova::DiskName& disk, const std::string& name) {
+  return disk.deviceName.empty() && AbsentName(disk.kovaUuid) == name;
+}
+
+std::ptrdiff_t CountMembers(const std::string& name, const std::vector<HostCtl::Kova::DiskMapping>& groups) {
+  const auto isCalled = [&name](const HostCtl::Kova::DiskName& disk) { return IsCalled(disk, name); };
+  std::ptrdiff_t count = 0;
+  for (const HostCtl::Kova::DiskMapping& group : groups) {
+    count += isCalled(group.ssd) ? 1 : 0;
+    count += std::count_if(group.capacityDisks.begin(), group.capacityDisks.end(), isCalled);
+  }
+  return count;
+}
+
 // Runs what asks the kernel. When the kernel fails, that is a SystemError with both texts.
 template <class Work>
 void AskOrFail(const char* what, Work ask) {
@@ -115,10 +136,27 @@ void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::K
     std::vector<HostCtl::Kova::DiskMapping> groups;
     kernel.GetDiskMappings(groups, true);
     const auto isHead = [&name](const HostCtl::Kova::DiskMapping& group) {
-      return group.ssd.deviceName.empty() && AbsentName(group.ssd.kovaUuid) == name;
+      return IsCalled(group.ssd, name);
     };
     if (std::none_of(groups.begin(), groups.end(), isHead)) {
       Refuse("mapping.ssd", "no disk group of this host has the absent cache disk '" + name + "'");
+    }
+  });
+}
+
+void DemandOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel) {
+  if (!HasAbsentPrefix(name)) {
+    return;
+  }
+  AskOrFail("Which disks have left the host could not be found out: ", [&] {
+    std::vector<HostCtl::Kova::DiskResult> records;
+    kernel.QueryDisks({}, records, true);
+    std::vector<HostCtl::Kova::DiskMapping> groups;
+    kernel.GetDiskMappings(groups, true);
+    // Groups may hold disks that are not among the records.
+    if (std::max(CountListed(name, records), CountMembers(name, groups)) > 1) {
+      Refuse(place, "more than one disk that has left this host is called '" + name +
+                        "'; bring the one that is meant back, and name it by its own name");
     }
   });
 }

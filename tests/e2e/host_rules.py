@@ -108,6 +108,9 @@ class Comparison:
             return f"disks were formatted: {joined}"
         if self.operation != "AddAllEligibleDisks" and joined - self.named:
             return f"disks were formatted that the request does not name: {joined - self.named}"
+        flash = {disk["name"] for disk in self.before["disks"] if disk["ssd"]}
+        if not {self.new[name] for name in joined} <= flash | set(self.old.values()):
+            return "a group was made with a hard disk for its cache"
         unfit = {disk["name"]: self.why_unfit(disk) for disk in self.before["disks"] if disk["name"] in joined}
         return next((f"the disk '{name}' was formatted, which {why}" for name, why in unfit.items() if why), None)
 

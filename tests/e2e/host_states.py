@@ -14,8 +14,8 @@ UUIDS = [UUID, OTHER_UUID, UUID[:-1], UUID + "0", "", "x", "../" + UUID]
 # Names that a host may have, if an odd one.
 ODD_NAMES = ['naa."quoted"', "naa.with blank", " ", "'", "--save", "-", "../../etc/passwd", "/dev/sda", "kova:", "kova",
              "kova:" + UUID, "KOVA:" + UUID, "Kova:" + UUID, "kova:" + UUID[:-1], "kova:" + UUID + "0",
-             " kova:" + UUID, "a&b<c>]]>", "%s%n%1%2%9", "\\", "\\u0000", "naa.\u00fc\u4e2d\U0001f4be", "unknown", "null",
-             "x" * 1024, "y" * 1025, "z" * 65536]
+             " kova:" + UUID, "a&b<c>]]>", "%s%n%1%2%9", "\\", "\\u0000", "naa.\u00fc\u4e2d\U0001f4be", "unknown",
+             "null", "x" * 1024, "y" * 1025, "z" * 65536]
 # Names and texts that only a client comes up with.
 BAD_NAMES = ["", "a\nb", "\t", "\r", "a\u0000b", "\u001b[2J", "\u007f", "\u0085", "\ufffe", "w" * (1 << 17)]
 TRANSPORTS = ["sas", "sata", "nvme", "usb", ""]
@@ -42,10 +42,20 @@ def request_name(disk):
 
 
 class Draw:
-    """Draws hosts, events and requests."""
+    """Draws a host, and the events and requests of its life.
+
+    Most lives lean towards something, since rare things seldom meet by themselves: many disks have the same flaw, the
+    kernel cannot be asked, half of the requests are of one operation.
+    """
 
     def __init__(self, rng):
         self.rng = rng
+        self.favourite = rng.choice(OPERATIONS[4:])
+        self.flaw = self.oddity() if self.chance(2) else {}
+        self.is_kernel_away = self.chance(6)
+        if self.is_kernel_away:
+            self.favourite = rng.choice(["AddDisks", "InitializeDisks", "InitializeDisks", "AddAllEligibleDisks"])
+            self.flaw = rng.choice([{"local": False}, {"transport": "usb"}, {"partitions": 1}, {"inInventory": False}])
 
     def chance(self, one_in):
         return self.rng.randrange(one_in) == 0
@@ -110,6 +120,8 @@ class Draw:
         disk = {"name": name, "ssd": ssd, "bytes": 1 << 40}
         while self.chance(odd):
             disk.update(self.oddity())
+        if self.chance(3):
+            disk.update(self.flaw)
         if self.chance(4):
             disk["kovaUuid"] = self.rng.choice(UUIDS)
         return disk
@@ -117,7 +129,8 @@ class Draw:
     def oddity(self):
         """Some keys of a disk, as they may be or become."""
         return self.rng.choice([
-            self.loss(), self.loss(), {"absent": False}, {"inInventory": True}, {"inKernel": True}, {"partitions": self.rng.choice([0, 1, 99])},
+            self.loss(), self.loss(), {"absent": False}, {"inInventory": True}, {"inKernel": True},
+            {"partitions": self.rng.choice([0, 1, 99])},
             {"bytes": self.rng.choice([0, 1, (1 << 63) - 1])}, {"local": self.chance(2)},
             {"transport": self.rng.choice(TRANSPORTS)}, {"ssd": self.chance(2)}, {"capacityFlash": self.chance(2)},
             {"blockSize": self.rng.choice([1, 4096, (1 << 31) - 1])}, {"formatVersion": self.rng.choice([0, 1, 255])},
@@ -143,7 +156,7 @@ class Draw:
 
     def faults(self, calls):
         """Faults of the provider in its next calls; `calls` of each operation were made until now."""
-        rules = []
+        rules = [{"operation": "QueryDisks", "exception": self.rng.choice(EXCEPTIONS)}] if self.is_kernel_away else []
         while not rules or self.chance(2):
             operation = self.rng.choice(PROVIDER_OPERATIONS + ASKED_ALWAYS * 4)
             call = 0 if self.chance(4) else calls.get(operation, 0) + self.rng.randint(1, 6)
@@ -155,7 +168,7 @@ class Draw:
     # ---- requests
 
     def request(self, host):
-        operation = self.rng.choice(OPERATIONS + ["AddDisks", "InitializeDisks"] * 3)
+        operation = self.favourite if self.chance(2) else self.rng.choice(OPERATIONS)
         parameters = {
             "QueryDisksForKova": lambda: {"names": self.names(host)} if not self.chance(3) else {},
             "AddDisks": lambda: {"disks": [self.named(name) for name in self.names(host)]},
@@ -204,7 +217,8 @@ class Draw:
         return disk
 
     def mapping(self, host):
-        names = self.rng.choice([self.group_names, self.group_names, self.new_group, lambda _: []])(host)
+        names = self.rng.choice([self.group_names, self.group_names, self.new_group, self.new_group, self.absent_first,
+                                 lambda _: []])(host)
         while len(names) < 2 or self.chance(12):
             names.insert(self.rng.randint(0, len(names)), self.name(host))
         if self.chance(12):
@@ -219,6 +233,11 @@ class Draw:
         called = {disk["name"]: request_name(disk) for disk in host["disks"]}
         group = self.rng.choice(host["groups"])
         return [called.get(name, name) for name in [group["ssd"], *group["capacity"]]]
+
+    def absent_first(self, host):
+        """Disks of a group, one that has left in the place of the cache disk."""
+        names = self.group_names(host)
+        return sorted(names, key=lambda name: not name.startswith("kova:"))
 
     def new_group(self, host):
         heads, capacity = self.free(host, [True]), self.free(host, [False])

@@ -129,6 +129,10 @@ class Comparison:
             return None
         if self.operation not in ("RemoveDisk", "RemoveDiskMapping"):
             return f"disks left their groups: {left}"
+        absent = [disk for disk in self.before["disks"] if disk.get("absent") and disk["name"] in self.named
+                  and (disk.get("inKernel", True) or disk["name"] in self.old)]
+        if self.operation == "RemoveDisk" and len(absent) > 1:
+            return f"of several disks that have left with one name, one was removed: {left}"
         # A cache disk that is named takes its group along.
         strangers = {name for name in left if not {name, self.old[name]} & self.named}
         if strangers:

@@ -51,11 +51,40 @@ class Draw:
     def __init__(self, rng):
         self.rng = rng
         self.favourite = rng.choice(OPERATIONS[4:])
-        self.flaw = self.oddity() if self.chance(2) else {}
-        self.is_kernel_away = self.chance(6)
-        if self.is_kernel_away:
-            self.favourite = rng.choice(["AddDisks", "InitializeDisks", "InitializeDisks", "AddAllEligibleDisks"])
-            self.flaw = rng.choice([{"local": False}, {"transport": "usb"}, {"partitions": 1}, {"inInventory": False}])
+        self.is_kernel_away = False
+        flaw = self.oddity() if self.chance(2) else {}
+        self.flaw = lambda: flaw
+        rng.choice([self.lean_to_nothing] * 2 + [self.lean_to_silence, self.lean_to_absence, self.lean_to_strangers])()
+
+    def lean_to_nothing(self):
+        pass
+
+    def lean_to_silence(self):
+        """The kernel cannot be asked about disks that it would refuse."""
+        self.is_kernel_away = True
+        self.favourite = self.rng.choice(["AddDisks", "InitializeDisks", "InitializeDisks", "AddAllEligibleDisks"])
+        flaw = self.rng.choice([{"local": False}, {"transport": "usb"}])
+        self.flaw = lambda: flaw
+
+    def lean_to_absence(self):
+        """Disks have left, perhaps all with one UUID, and are to be removed."""
+        self.favourite = self.rng.choice(["RemoveDisk", "RemoveDiskMapping"])
+        same = self.absence()
+        self.flaw = (lambda: same) if self.chance(2) else self.absence
+
+    def lean_to_strangers(self):
+        """Disks are used that the kernel knows and the inventory does not."""
+        self.favourite = self.rng.choice(["AddDisks", "InitializeDisks", "AddAllEligibleDisks"])
+        self.flaw = lambda: {"inInventory": False}
+
+    def uuid(self):
+        """One of its own, or one that several disks may bear."""
+        digits = f"{self.rng.getrandbits(128):032x}"
+        own = "-".join([digits[:8], digits[8:12], digits[12:16], digits[16:20], digits[20:]])
+        return own if self.chance(2) else self.rng.choice(UUIDS)
+
+    def absence(self):
+        return {"absent": True, "kovaUuid": self.uuid()}
 
     def chance(self, one_in):
         return self.rng.randrange(one_in) == 0
@@ -97,8 +126,7 @@ class Draw:
 
     def loss(self):
         """How a disk goes missing: from the host, from the inventory, from the kernel."""
-        return self.rng.choice([{"absent": True, "kovaUuid": self.rng.choice(UUIDS)}, {"inInventory": False},
-                                {"inKernel": False}])
+        return self.rng.choice([self.absence(), {"inInventory": False}, {"inKernel": False}])
 
     def full_host(self):
         """Five groups or more, with all the disks that a group may have or nearly so, and some to spare."""
@@ -121,9 +149,9 @@ class Draw:
         while self.chance(odd):
             disk.update(self.oddity())
         if self.chance(3):
-            disk.update(self.flaw)
+            disk.update(self.flaw())
         if self.chance(4):
-            disk["kovaUuid"] = self.rng.choice(UUIDS)
+            disk["kovaUuid"] = self.uuid()
         return disk
 
     def oddity(self):

@@ -5,7 +5,7 @@ One agent is put through generated hosts. Between requests disks leave, return a
 rules say. After every request: the same process answers, the answer is well formed and of its type, and the host has
 changed in nothing that the request did not name.
 
-KOVA_STATES: how many hosts (default 300). KOVA_SEED: the generator's seed, printed with a failure. KOVA_CASE: that host
+KOVA_STATES: how many hosts (default 400). KOVA_SEED: the generator's seed, printed with a failure. KOVA_CASE: that host
 only.
 """
 
@@ -19,7 +19,7 @@ import unittest
 from checked import CheckedTest
 from host_states import QUERIES, Draw, is_soap
 
-STATES = int(os.environ.get("KOVA_STATES", "300"))
+STATES = int(os.environ.get("KOVA_STATES", "400"))
 SEED = int(os.environ.get("KOVA_SEED", "1"))
 CASE = os.environ.get("KOVA_CASE")
 STEPS = 8  # requests to each host

@@ -2,12 +2,12 @@
 
 #include <utility>
 
+#include "host/CautiousProvider.h"
 #include "host/HostError.h"
 #include "nox/Host.h"
 #include "otxctl/ProviderFactory.h"
 #include "otxctl/fault/CallRecorder.h"
 #include "otxctl/fault/RecordingProvider.h"
-#include "otxctl/fault/StrictProvider.h"
 #include "otxctl/sim/DefaultHost.h"
 #include "otxctl/sim/SimProvider.h"
 #include "tessa/Logger.h"
@@ -28,7 +28,7 @@ std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(const std::shared_ptr<SimH
     provider = std::make_unique<OtxCtl::Fault::RecordingProvider>(std::move(provider), options.recorder);
   }
   if (!options.bare) {
-    provider = std::make_unique<OtxCtl::Fault::StrictProvider>(std::move(provider));
+    provider = std::make_unique<CautiousProvider>(std::move(provider));
   }
   return provider;
 }

@@ -30,7 +30,8 @@ struct RuntimeOptions {
   OtxCtl::Sim::HostFileWriter::FolderSync syncFolder = &fsync;
   std::string pluginFile;  // empty: where FindPlugin finds it
   // Lets every exception of the provider through to the plug-in, which ends the process over those that no
-  // provider may throw. Otherwise these are turned into ones that it may.
+  // provider may throw. Otherwise these are turned into ones that it may, and nothing is formatted while the
+  // kernel cannot tell about its disks (CautiousProvider.h).
   bool bare = false;
   // Records every call of the provider, if set.
   std::shared_ptr<OtxCtl::Fault::CallRecorder> recorder;

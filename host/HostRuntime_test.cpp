@@ -226,6 +226,25 @@ TEST_F(HostRuntimeTest, RecordsTheCallsOfTheProvider) {
   });
 }
 
+// The gate's own question is the first call, the plug-in's the second.
+TEST_F(HostRuntimeTest, MakesNoGroupOfADiskThatTheKernelCouldNotTellAbout) {
+  auto host =
+      AHost().WithSsd("naa.1").WithDisk("naa.2", false, [](auto& disk) { disk.local = false; }).Build();
+  host.faults = {
+      {.operation = "QueryDisks", .call = 2, .exception = "HostCtlException", .message = {}, .disk = {}}};
+  RuntimeOptions options;
+  options.hostText = WriteHostDescription(host);
+  options.pluginFile = KOVA_PLUGIN;
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+    const Answer answer =
+        service.InitializeDisks(*Testing::Mappings({Testing::MappingOf("naa.1", {"naa.2"})}));
+    EXPECT_TRUE(answer.fault);
+    EXPECT_TRUE(runtime.SimulatedHost().Snapshot().groups.empty());
+  });
+}
+
 TEST_F(HostRuntimeTest, SavesEveryChangeIfAskedTo) {
   auto options = On(AHost().WithSsd("naa.1"));
   options.save = true;

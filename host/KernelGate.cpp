@@ -68,25 +68,31 @@ std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDi
                     "'; bring that disk back, or remove it from the group first");
 }
 
-// How many of the disks are absent and called that.
-std::ptrdiff_t CountListed(const std::string& name, const std::vector<HostCtl::Kova::DiskResult>& records) {
-  return std::count_if(records.begin(), records.end(), [&name](const HostCtl::Kova::DiskResult& record) {
-    return record.name.empty() && AbsentName(record.kovaUuid) == name;
-  });
+bool IsCalled(const HostCtl::Kova::DiskResult& record, const std::string& name) {
+  return record.name.empty() && AbsentName(record.kovaUuid) == name;
+}
+
+bool IsInGroup(const HostCtl::Kova::DiskResult& record) {
+  return record.state == HostCtl::Kova::DiskState::InUse ||
+         record.reason == HostCtl::Kova::DiskReason::GroupNotMounted;
 }
 
 bool IsCalled(const HostCtl::Kova::DiskName& disk, const std::string& name) {
   return disk.deviceName.empty() && AbsentName(disk.kovaUuid) == name;
 }
 
-std::ptrdiff_t CountMembers(const std::string& name, const std::vector<HostCtl::Kova::DiskMapping>& groups) {
-  const auto isCalled = [&name](const HostCtl::Kova::DiskName& disk) { return IsCalled(disk, name); };
-  std::ptrdiff_t count = 0;
+// How many absent disks are called that. Groups may hold disks that are not among the records, so whichever
+// way finds more of them counts.
+std::ptrdiff_t CountCalled(const std::string& name, const std::vector<HostCtl::Kova::DiskResult>& records,
+                           const std::vector<HostCtl::Kova::DiskMapping>& groups) {
+  const auto isCalled = [&name](const auto& disk) { return IsCalled(disk, name); };
+  const auto isLoose = [&name](const auto& record) { return IsCalled(record, name) && !IsInGroup(record); };
+  std::ptrdiff_t ofGroups = std::count_if(records.begin(), records.end(), isLoose);
   for (const HostCtl::Kova::DiskMapping& group : groups) {
-    count += isCalled(group.ssd) ? 1 : 0;
-    count += std::count_if(group.capacityDisks.begin(), group.capacityDisks.end(), isCalled);
+    ofGroups += isCalled(group.ssd) ? 1 : 0;
+    ofGroups += std::count_if(group.capacityDisks.begin(), group.capacityDisks.end(), isCalled);
   }
-  return count;
+  return std::max(std::count_if(records.begin(), records.end(), isCalled), ofGroups);
 }
 
 // Runs what asks the kernel. When the kernel fails, that is a SystemError with both texts.
@@ -153,8 +159,7 @@ void DemandOneIfAbsent(const std::string& place, const std::string& name, HostCt
     kernel.QueryDisks({}, records, true);
     std::vector<HostCtl::Kova::DiskMapping> groups;
     kernel.GetDiskMappings(groups, true);
-    // Groups may hold disks that are not among the records.
-    if (std::max(CountListed(name, records), CountMembers(name, groups)) > 1) {
+    if (CountCalled(name, records, groups) > 1) {
       Refuse(place, "more than one disk that has left this host is called '" + name +
                         "'; bring the one that is meant back, and name it by its own name");
     }

@@ -263,9 +263,15 @@ TEST_F(KovaServiceChanges, RemovesNoAbsentDiskThatCouldBeAnother) {
               StartsWith("mapping.ssd | mapping.ssd: more than one disk"));
   _host->Change([](HostDescription& host) { host.disks[0].inKernel = host.disks[2].inKernel = false; });
   EXPECT_THAT(Told(_service.RemoveDisk(both, {}).fault.Get()), StartsWith("disk | "))
-      << "both in their group";
+      << "both in their group, which is all that the kernel knows of them";
+  _host->Change([](HostDescription& host) {
+    host.disks[1].absent = true;
+    host.disks[2].absent = false;
+  });
+  EXPECT_THAT(Told(_service.RemoveDisk(both, {}).fault.Get()), StartsWith("disk | "))
+      << "one in a group and one in none";
   EXPECT_THAT(heard, IsEmpty());
-  _host->Change([](HostDescription& host) { host.disks[2].absent = false; });
+  _host->Change([](HostDescription& host) { host.disks[1].absent = false; });
   _service.RemoveDisk(both, {});
   _service.RemoveDiskMapping(*MappingOf(both, {}), {});
   EXPECT_EQ(heard.size(), 2u) << "one is absent: disks that are there have names of their own";

@@ -4,8 +4,9 @@ import json
 
 from answers import PLAIN, Checker
 from host_rules import untruth, violation
-from host_states import names_in, soap
+from host_states import names_in
 from programs import ProgramTest
+from soap_requests import soap
 
 OF_THE_GATE = "nox.agentd.gate."  # begins the key of a fault with which a request was not let in
 

@@ -7,8 +7,9 @@ Each such request is refused as the client's mistake; the agent stays alive and 
 import unittest
 
 from checked import CheckedTest
-from host_states import ENVELOPE, QUERIES, WITHOUT_SOAP, element
+from host_states import QUERIES
 from programs import disk
+from soap_requests import ENVELOPE, WITHOUT_SOAP, element
 
 HOST = {"name": "a", "groups": [{"ssd": "naa.s2", "capacity": ["naa.h3", "naa.h4"]}],
         "disks": [disk("naa.s1", True), disk("naa.h1"), disk("naa.s2", True), disk("naa.h3"), disk("naa.h4")]}

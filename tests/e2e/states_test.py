@@ -17,7 +17,8 @@ import time
 import unittest
 
 from checked import CheckedTest
-from host_states import QUERIES, Draw, is_soap
+from host_states import QUERIES, Draw
+from soap_requests import is_soap
 
 STATES = int(os.environ.get("KOVA_STATES", "400"))
 SEED = int(os.environ.get("KOVA_SEED", "1"))

@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test check bench soak build format-check format asan tsan clang tidy fuzz clean
+.PHONY: help demo test check bench growth soak build format-check format asan tsan clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -11,6 +11,7 @@ help:
 	@echo "make test    build and run every test that needs no virtual machine"
 	@echo "make check   format, second compiler, clang-tidy on what changed, sanitizers, fuzzing"
 	@echo "make bench   benchmarks"
+	@echo "make growth  instructions per disk of planning, among few disks and among many"
 	@echo "make soak    an agent under mixed clients for SECONDS (180): its memory must stay flat"
 	@echo "make build   the release build only: build/release"
 
@@ -82,6 +83,13 @@ bench:
 	@cmake --preset release -DKOVA_BENCHMARKS=ON >/dev/null
 	@cmake --build --preset release -j $(JOBS) --target benchmarks
 	@bench/run.sh build/release
+
+# Counted, not timed: the same on every machine, however busy.
+growth:
+	@$(SETUP) build count
+	@cmake --preset release -DKOVA_BENCHMARKS=ON >/dev/null
+	@cmake --build --preset release -j $(JOBS) --target planning_bench
+	@python3 -B bench/instructions.py build/release/bench/planning_bench
 
 # An agent under load for SECONDS.
 soak:

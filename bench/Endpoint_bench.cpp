@@ -156,7 +156,8 @@ void Load(benchmark::State& state, const Query& query) {
 // A host of that size, and a server that answers with all of it.
 void Prepare(benchmark::State& state, World& world, const Query& query) {
   world.ReplaceHost(static_cast<int>(state.range(0)));
-  const std::string& answer = Bench::EndpointClient(query.server).Ask(query.request);
+  Bench::EndpointClient client(query.server);
+  const std::string& answer = client.Ask(query.request);
   if (CountOf(answer, query.eachDisk) != static_cast<std::size_t>(state.range(0))) {
     throw std::runtime_error(query.name + " does not answer with every disk");
   }

@@ -87,7 +87,7 @@ std::size_t WeightOf(const DiskList& disks) {
 }
 
 std::size_t WeightOf(const DiskMapping& mapping) {
-  const Ref<DiskList> disks = mapping.GetNonSsd();
+  const Ref<DiskList>& disks = mapping.GetNonSsd();
   return WeightOfDisk(mapping.GetSsd().Get()) + (disks ? WeightOf(*disks) : 0);
 }
 

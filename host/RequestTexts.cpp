@@ -24,7 +24,7 @@ Names NamesOf(const ScsiDisk& disk) {
 
 Names NamesOf(const DiskMapping& mapping) {
   Names names = NamesOf(*mapping.GetSsd());
-  if (const auto disks = mapping.GetNonSsd()) {
+  if (const auto& disks = mapping.GetNonSsd()) {
     for (const ScsiDisk* disk : *disks) {
       names.push_back(NamesOf(*disk).front());
     }

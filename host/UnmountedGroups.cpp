@@ -70,7 +70,7 @@ Names NamesOf(const GroupRecord& group) {
 
 Names NamesOf(const DiskMapping& mapping) {
   Names names = {mapping.GetSsd()->GetCanonicalName()};
-  if (const auto disks = mapping.GetNonSsd()) {
+  if (const auto& disks = mapping.GetNonSsd()) {
     for (const ScsiDisk* disk : *disks) {
       names.push_back(disk->GetCanonicalName());
     }
@@ -100,6 +100,7 @@ std::vector<bool> Among(const std::vector<Names>& groups, std::vector<Names> oth
 
 std::vector<Names> NamesOf(const std::vector<GroupRecord>& groups) {
   std::vector<Names> names;
+  names.reserve(groups.size());
   for (const GroupRecord& group : groups) {
     names.push_back(NamesOf(group));
   }
@@ -132,6 +133,7 @@ void AppendUnlisted(const std::vector<KernelGroup>& groups, const KnownDisks& kn
     }
   }
   std::vector<Names> names;
+  names.reserve(groups.size());
   for (const KernelGroup& group : groups) {
     names.push_back(NamesOf(group.disks));
   }

@@ -30,6 +30,30 @@ std::unique_ptr<Host::ManagementApi> ServiceOf(Host::HostRuntime& runtime) {
   return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.SimulatedHost());
 }
 
+// What an agent of that address is asked with.
+Agentd::TlsClientFiles TlsFilesOf(const GlobalOptions& options) {
+  Agentd::TlsClientFiles files = options.tls;
+  const bool hasOwn = !files.certificate.empty() || !files.key.empty();
+  if (!Agentd::ParseAgentAddress(options.agent).isTls) {
+    if (hasOwn || !files.ca.empty()) {
+      throw BadInput("--ca, --cert and --key go with an agent on tls:HOST:PORT; this one is " +
+                     options.agent);
+    }
+    return {};
+  }
+  if (files.ca.empty()) {
+    files.ca = options.usualTls.ca;
+  }
+  if (!hasOwn) {
+    files.certificate = options.usualTls.certificate;
+    files.key = options.usualTls.key;
+  }
+  if (files.certificate.empty() != files.key.empty()) {
+    throw BadInput("a certificate goes with its key: give both --cert and --key");
+  }
+  return files;
+}
+
 }  // namespace
 
 std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options) {
@@ -44,7 +68,7 @@ std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options
     throw BadInput("--save goes with --host; an agent saves its host itself");
   }
   try {
-    return std::make_unique<Agentd::AgentClient>(options.agent);
+    return std::make_unique<Agentd::AgentClient>(options.agent, TlsFilesOf(options));
   } catch (const std::invalid_argument& refused) {
     throw BadInput(refused.what());
   }

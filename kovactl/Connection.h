@@ -4,6 +4,7 @@
 #include <memory>
 #include <string>
 
+#include "agentd/http/HttpClient.h"
 #include "host/HostRuntime.h"
 #include "host/ManagementApi.h"
 #include "tessa/Logger.h"
@@ -17,8 +18,10 @@ namespace Kovactl {
 // What all commands share.
 struct GlobalOptions {
   std::string agent = "unix:/run/kova/agentd.sock";
-  Host::RuntimeOptions runtime;  // with a host file, the command hosts the plug-in itself
-  std::string output = "table";  // table, json or soap
+  Agentd::TlsClientFiles tls;       // as they were given; for an agent that is asked by TLS
+  Agentd::TlsClientFiles usualTls;  // in place of what was not given
+  Host::RuntimeOptions runtime;     // with a host file, the command hosts the plug-in itself
+  std::string output = "table";     // table, json or soap
   std::string logLevel = "warning";
 
   bool HostsThePlugIn() const noexcept { return !runtime.hostFile.empty(); }

@@ -9,7 +9,7 @@ enum class ExitStatus : int {
   Done = 0,
   Fault = 1,        // the host answered with a fault
   BadInput = 2,     // usage, a file or a name
-  Unreachable = 3,  // no agent answers
+  Unreachable = 3,  // no agent answers, or none that can be trusted
   Panic = 70,       // the plug-in ended the process
 };
 

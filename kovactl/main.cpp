@@ -21,12 +21,15 @@ void AddEverything(CLI::App& app, CommandLine& line) {
   Kovactl::AddReplayCommand(app, line);
   app.footer(
       "Exit status: 0 done; 1 the host answered with a fault; 2 usage or bad input, or no consent;\n"
-      "3 no agent answers; 70 the plug-in panicked.");
+      "3 no agent answers, or none that can be trusted; 70 the plug-in panicked.");
 }
 
 ExitStatus Run(const CommandLine& line) {
   try {
     return line.action();
+  } catch (const Agentd::TlsError& error) {
+    std::cerr << "kovactl: " << Host::Printable(error.what()) << "\n";
+    return ExitStatus::Unreachable;
   } catch (const Agentd::ConnectionError& error) {
     std::cerr << "kovactl: " << Host::Printable(error.what())
               << "\nStart one with `agentd`, or work on a description with --host FILE.\n";

@@ -42,6 +42,7 @@ LockableObject::~LockableObject() = default;
 
 SystemFactory& GetSystemFactory() noexcept {
   // Never destroyed: objects that outlive the program's statics may still make locks.
+  // NOLINTNEXTLINE(bugprone-unhandled-exception-at-new): without memory for this, nothing works
   static SystemFactory* const runtimeFactory = new MutexFactory;
   SystemFactory* const installed = installedFactory.load();
   return installed != nullptr ? *installed : *runtimeFactory;

@@ -29,7 +29,7 @@ SessionMixin::SessionMixin() : SessionMixin(Lifetime{}) {}
 SessionMixin::SessionMixin(Lifetime lifetime)
     : _id(RandomText()),
       _nonce(RandomText()),
-      _lifetime(std::move(lifetime)),
+      _lifetime(lifetime),
       _loginTime(std::chrono::system_clock::now()),
       _lastActive(std::chrono::steady_clock::now()),
       _lastActiveUtc(_loginTime) {}

@@ -3,7 +3,6 @@
 #include <stdexcept>
 #include <utility>
 
-#include "agentd/http/HttpClient.h"
 #include "nox/Kova.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
@@ -72,7 +71,8 @@ constexpr const Orbis::TypeDescriptor* noResult = nullptr;
 
 }  // namespace
 
-AgentClient::AgentClient(const std::string& url) : _address(ParseAddress(url)) {}
+AgentClient::AgentClient(const std::string& url, TlsClientFiles files)
+    : _address(ParseAgentAddress(url)), _files(std::move(files)) {}
 
 Answer AgentClient::QueryDisksForKova(const std::vector<std::string>& names) const {
   const std::string body = Body().Add("names", Orbis::ArrayOfString(names)).Done();
@@ -139,8 +139,8 @@ std::string AgentClient::Task(const std::string& id) const {
 
 Answer AgentClient::Ask(const std::string& operation, const std::string& body,
                         const Orbis::TypeDescriptor* resultType, std::chrono::milliseconds patience) const {
-  const HttpAnswer http =
-      Exchange(_address, {"POST", std::string(folder) + operation, std::string(jsonType), body}, patience);
+  const HttpAnswer http = Exchange(
+      _address, {"POST", std::string(folder) + operation, std::string(jsonType), body}, patience, _files);
   DemandJson(http);
   try {
     return Host::ReadJsonAnswer(http.body, resultType);
@@ -151,7 +151,7 @@ Answer AgentClient::Ask(const std::string& operation, const std::string& body,
 }
 
 std::string AgentClient::Get(const std::string& target) const {
-  HttpAnswer http = Exchange(_address, {"GET", std::string(folder) + target, "", ""}, queryPatience);
+  HttpAnswer http = Exchange(_address, {"GET", std::string(folder) + target, "", ""}, queryPatience, _files);
   DemandJson(http);
   return std::move(http.body);
 }

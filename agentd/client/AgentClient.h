@@ -1,12 +1,11 @@
-// The management API of an agent, over a socket or TCP: objects in, objects out.
+// The management API of an agent, over a socket, TLS or TCP: objects in, objects out.
 #pragma once
 
 #include <chrono>
 #include <string>
 #include <vector>
 
-#include "agentd/http/HttpAddress.h"
-#include "agentd/http/HttpTypes.h"
+#include "agentd/http/HttpClient.h"
 #include "host/ManagementApi.h"
 
 namespace Agentd {
@@ -18,8 +17,10 @@ namespace Agentd {
 // other.
 class AgentClient final : public Host::ManagementApi {
  public:
-  // A URL: "unix:/run/kova/agentd.sock" or "tcp:127.0.0.1:8080". Throws std::invalid_argument for any other.
-  explicit AgentClient(const std::string& url);
+  // A URL: "unix:/run/kova/agentd.sock", "tls:kova.example:9443" or "tcp:127.0.0.1:8080". Throws
+  // std::invalid_argument for any other. The files are for TLS, and read by each call, which throws
+  // std::runtime_error where they cannot be used.
+  explicit AgentClient(const std::string& url, TlsClientFiles files = {});
 
   Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override;
   Host::Answer GetStorageInfo() const override;
@@ -50,6 +51,7 @@ class AgentClient final : public Host::ManagementApi {
   void DemandJson(const HttpAnswer& http) const;
 
   HttpAddress _address;
+  TlsClientFiles _files;
 };
 
 }  // namespace Agentd

@@ -27,9 +27,9 @@ using testing::HasSubstr;
 using Testing::RunningServer;
 
 HttpDeferringHandler Serving(const Host::ManagementApi& api, TaskQueue& tasks) {
-  return [router = Router(api, tasks)](const HttpRequest& request, const HttpResponder& responder) {
-    router.Serve(request, responder);
-  };
+  return
+      [router = std::make_shared<const Router>(api, tasks)](
+          const HttpRequest& request, const HttpResponder& responder) { router->Serve(request, responder); };
 }
 
 std::string WhyNot(const HttpAnswer& answer) {

@@ -12,6 +12,7 @@ namespace ip = boost::asio::ip;
 
 constexpr std::string_view unixScheme = "unix:";
 constexpr std::string_view tcpScheme = "tcp:";
+constexpr std::string_view tlsScheme = "tls:";
 
 bool StartsWith(std::string_view text, std::string_view start) {
   return text.substr(0, start.size()) == start;
@@ -24,30 +25,57 @@ std::optional<std::uint16_t> ParsePort(std::string_view text) {
   return whole && !text.empty() ? std::optional(port) : std::nullopt;
 }
 
-// "127.0.0.1:80" or "[::1]:80".
-std::optional<HttpAddress> ParseTcp(std::string_view text) {
+constexpr std::string_view nameCharacters =
+    "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-.";
+constexpr std::size_t longestName = 253;
+
+bool IsHostName(std::string_view text) {
+  return !text.empty() && text.size() <= longestName && text.front() != '-' &&
+         text.find_first_not_of(nameCharacters) == std::string_view::npos;
+}
+
+// "127.0.0.1" or "[::1]", without brackets.
+std::optional<std::string> ParseNumeric(std::string_view text) {
+  const bool bracketed = text.size() > 2 && text.front() == '[' && text.back() == ']';
+  const std::string place(bracketed ? text.substr(1, text.size() - 2) : text);
+  boost::system::error_code error;
+  const ip::address address = ip::make_address(place, error);
+  return error || address.is_v6() != bracketed ? std::nullopt : std::optional(address.to_string());
+}
+
+// "127.0.0.1:80", "[::1]:80" or, with TLS, "kova.example:80".
+std::optional<HttpAddress> ParseTcp(std::string_view text, bool isTls) {
   const std::size_t colon = text.rfind(':');
   if (colon == std::string_view::npos) {
     return std::nullopt;
   }
   const std::optional<std::uint16_t> port = ParsePort(text.substr(colon + 1));
-  std::string_view place = text.substr(0, colon);
-  const bool bracketed = place.size() > 2 && place.front() == '[' && place.back() == ']';
-  if (bracketed) {
-    place = place.substr(1, place.size() - 2);
+  std::optional<std::string> place = ParseNumeric(text.substr(0, colon));
+  if (!place && isTls && IsHostName(text.substr(0, colon))) {
+    place = text.substr(0, colon);
   }
-  boost::system::error_code error;
-  const ip::address address = ip::make_address(std::string(place), error);
-  if (error || !port || address.is_v6() != bracketed) {
-    return std::nullopt;
+  return port && place ? std::optional(HttpAddress{false, *place, *port, isTls}) : std::nullopt;
+}
+
+std::optional<HttpAddress> ParseAny(std::string_view text) {
+  if (StartsWith(text, unixScheme) && text.size() > unixScheme.size()) {
+    return UnixAddress(std::string(text.substr(unixScheme.size())));
   }
-  return HttpAddress{false, address.to_string(), *port};
+  if (StartsWith(text, tcpScheme)) {
+    return ParseTcp(text.substr(tcpScheme.size()), false);
+  }
+  return StartsWith(text, tlsScheme) ? ParseTcp(text.substr(tlsScheme.size()), true) : std::nullopt;
+}
+
+[[noreturn]] void Refuse(std::string_view text, const char* forms) {
+  throw std::invalid_argument("'" + std::string(text) + "' is no address; addresses are " + forms +
+                              ", with a numeric address such as 127.0.0.1 or [::1]");
 }
 
 }  // namespace
 
 std::string HttpAddress::Text() const {
-  return std::string(isUnix ? unixScheme : tcpScheme) + Name();
+  return std::string(isUnix ? unixScheme : isTls ? tlsScheme : tcpScheme) + Name();
 }
 
 std::string HttpAddress::Name() const {
@@ -67,17 +95,19 @@ HttpAddress UnixAddress(const std::string& path) {
 }
 
 HttpAddress ParseAddress(std::string_view text) {
-  if (StartsWith(text, unixScheme) && text.size() > unixScheme.size()) {
-    return UnixAddress(std::string(text.substr(unixScheme.size())));
+  const std::optional<HttpAddress> address = ParseAny(text);
+  if (!address || address->isTls) {
+    Refuse(text, "unix:PATH and tcp:ADDRESS:PORT");
   }
-  if (StartsWith(text, tcpScheme)) {
-    if (const std::optional<HttpAddress> address = ParseTcp(text.substr(tcpScheme.size()))) {
-      return *address;
-    }
+  return *address;
+}
+
+HttpAddress ParseAgentAddress(std::string_view text) {
+  const std::optional<HttpAddress> address = ParseAny(text);
+  if (!address) {
+    Refuse(text, "unix:PATH, tls:HOST:PORT and tcp:ADDRESS:PORT");
   }
-  throw std::invalid_argument("'" + std::string(text) +
-                              "' is no address; addresses are unix:PATH and tcp:ADDRESS:PORT, with a numeric "
-                              "address such as 127.0.0.1 or [::1]");
+  return *address;
 }
 
 }  // namespace Agentd

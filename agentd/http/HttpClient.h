@@ -1,4 +1,4 @@
-// One HTTP request to a server, over a Unix socket or TCP, and its answer.
+// One HTTP request to a server, over a Unix socket or TCP, with or without TLS, and its answer.
 #pragma once
 
 #include <chrono>
@@ -16,9 +16,26 @@ class ConnectionError : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
+// Somebody answers, but TLS comes to nothing: one side does not trust the other, or does not speak it. The
+// text says whose fault it is, and names the file where it is a file's.
+class TlsError : public ConnectionError {
+ public:
+  using ConnectionError::ConnectionError;
+};
+
+// Files in PEM form, for an address with TLS.
+struct TlsClientFiles {
+  std::string ca = {};           // of the server's certificate; empty: any that this host trusts
+  std::string certificate = {};  // the client's, with those between it and its root; empty: it shows none
+  std::string key = {};
+};
+
 // Connects, asks, reads the whole answer (at most 1 GiB) and closes. `request.contentType` goes with a
-// body. Throws ConnectionError. Blocks; without an answer for `patience`, it gives up.
+// body. With TLS (1.2 or newer), the server's certificate must be for the address's place. Throws
+// ConnectionError, and std::runtime_error for files that cannot be used. Blocks; without an answer for
+// `patience`, it gives up.
 HttpAnswer Exchange(const HttpAddress& address, const HttpRequest& request,
-                    std::chrono::milliseconds patience = std::chrono::seconds(600));
+                    std::chrono::milliseconds patience = std::chrono::seconds(600),
+                    const TlsClientFiles& files = {});
 
 }  // namespace Agentd

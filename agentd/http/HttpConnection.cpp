@@ -92,18 +92,18 @@ void HttpConnection::Begin(std::optional<HttpAnswer> refusal) {
   if (refusal) {
     Refuse(std::move(*refusal));
   } else {
-    Read();
+    Read(shared_from_this());
   }
 }
 
-void HttpConnection::Read() {
-  _waiting = true;
-  _parser.emplace();
-  _parser->header_limit(static_cast<std::uint32_t>(_context.limits.headerBytes));
-  _parser->body_limit(_context.limits.bodyBytes);
-  http::async_read_header(
-      _stream, _buffer, *_parser,
-      [self = shared_from_this()](error_code error, std::size_t) { self->OnHeader(error); });
+void HttpConnection::Read(std::shared_ptr<HttpConnection> self) {
+  HttpConnection& connection = *self;
+  connection._waiting = true;
+  connection._parser.emplace();
+  connection._parser->header_limit(static_cast<std::uint32_t>(connection._context.limits.headerBytes));
+  connection._parser->body_limit(connection._context.limits.bodyBytes);
+  http::async_read_header(connection._stream, connection._buffer, *connection._parser,
+                          [self = std::move(self)](error_code error, std::size_t) { self->OnHeader(error); });
 }
 
 void HttpConnection::OnHeader(Error error) {
@@ -144,7 +144,7 @@ void HttpConnection::OnBody(Error error) {
     return;
   }
   _waiting = false;
-  _deadline.cancel();
+  ClearDeadline();
   PassOn();
 }
 
@@ -166,12 +166,8 @@ void HttpConnection::PassOn() {
 
 void HttpConnection::Handle(std::shared_ptr<HttpConnection> self, const HttpRequest& request) {
   const HttpDeferringHandler& handler = self->_context.handler;
-  const HttpResponder responder([self = std::move(self)](HttpAnswer answer) mutable {
-    asio::io_context& network = self->_context.network;
-    asio::post(network, [self = std::move(self), answer = std::move(answer)]() mutable {
-      self->Write(std::move(answer));
-    });
-  });
+  const HttpResponder responder(
+      [self = std::move(self)](HttpAnswer answer) mutable { Answer(std::move(self), std::move(answer)); });
   try {
     handler(request, responder);
   } catch (const std::exception& exception) {
@@ -181,14 +177,16 @@ void HttpConnection::Handle(std::shared_ptr<HttpConnection> self, const HttpRequ
   }
 }
 
-void HttpConnection::Refuse(HttpAnswer answer) {
-  _waiting = false;
-  _keepAlive = false;
-  _refused = true;
-  Write(std::move(answer));
+void HttpConnection::Answer(std::shared_ptr<HttpConnection> self, HttpAnswer answer) {
+  self->Compose(std::move(answer));
+  if (self->SendAtOnce() && GiveBack(self)) {
+    return;
+  }
+  asio::io_context& network = self->_context.network;
+  asio::post(network, [self = std::move(self)] { self->Write(); });
 }
 
-void HttpConnection::Write(HttpAnswer answer) {
+void HttpConnection::Compose(HttpAnswer answer) {
   _keepAlive = _keepAlive && !_context.draining;
   _response.emplace(static_cast<http::status>(answer.status), _version);
   _response->set(http::field::content_type, answer.contentType);
@@ -201,8 +199,46 @@ void HttpConnection::Write(HttpAnswer answer) {
     _response->body() = std::move(answer.body);
   }
   _response->keep_alive(_keepAlive);
+  _unsent.emplace(*_response);
+}
+
+bool HttpConnection::SendAtOnce() {
+  if (_stream.Secured() != nullptr) {
+    return false;
+  }
+  error_code error;
+  while (!error && !_unsent->is_done()) {
+    http::write_some(_stream.Bare().Plain(), *_unsent, error);
+  }
+  return !error;
+}
+
+bool HttpConnection::GiveBack(std::shared_ptr<HttpConnection>& self) {
+  HttpContext& context = self->_context;
+  const std::lock_guard guard(context.givingBack);
+  if (!self->_keepAlive || context.draining) {
+    return false;
+  }
+  self->SetDeadline(context.limits.readTime);
+  Read(std::move(self));
+  return true;
+}
+
+void HttpConnection::Refuse(HttpAnswer answer) {
+  _waiting = false;
+  _keepAlive = false;
+  _refused = true;
+  Compose(std::move(answer));
+  Write();
+}
+
+void HttpConnection::Write() {
+  if (_unsent->is_done()) {
+    OnWritten({});
+    return;
+  }
   SetDeadline(_context.limits.writeTime);
-  http::async_write(_stream, *_response,
+  http::async_write(_stream, *_unsent,
                     [self = shared_from_this()](error_code error, std::size_t) { self->OnWritten(error); });
 }
 
@@ -212,7 +248,7 @@ void HttpConnection::OnWritten(Error error) {
   }
   if (_keepAlive && !_context.draining) {
     SetDeadline(_context.limits.readTime);
-    Read();
+    Read(shared_from_this());
   } else {
     End();
   }
@@ -245,7 +281,6 @@ void HttpConnection::Discard() {
 }
 
 void HttpConnection::Drain() {
-  _keepAlive = false;
   // One that only waits for a request has nothing to lose.
   if (_waiting && !HasBegun()) {
     _stream.Bare().Cancel();
@@ -256,13 +291,19 @@ void HttpConnection::SetDeadline(std::chrono::milliseconds time) {
   _stream.Bare().Renew();
   _deadline.expires_after(time);
   // Weak: a deadline far away must not keep a client alive that has gone.
-  _deadline.async_wait([weak = weak_from_this()](error_code error) {
+  _deadline.async_wait([weak = weak_from_this(), number = ++_deadlines](error_code error) {
     const auto self = weak.lock();
-    // A deadline that was moved when it had just passed counts no more.
-    if (!error && self && self->_deadline.expiry() <= std::chrono::steady_clock::now()) {
+    // One that was cleared or moved when it had just passed counts no more.
+    if (!error && self && self->_deadlines == number) {
+      const std::lock_guard guard(self->_context.givingBack);  // that worker may not have let go of it yet
       self->_stream.Bare().Expire();
     }
   });
+}
+
+void HttpConnection::ClearDeadline() {
+  ++_deadlines;
+  _deadline.cancel();
 }
 
 }  // namespace Agentd

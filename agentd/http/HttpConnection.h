@@ -1,11 +1,15 @@
 // One client of the HTTP server. Part of the server; nobody else includes this.
 //
-// Threads: everything here runs on the thread of the network, except for Handle, which runs on a worker.
+// Threads: a connection belongs to one thread at a time. That is the network's, except while a request is
+// handled: from PassOn on it is the worker's, and whoever answers sends what it can, begins to read the next
+// request, and so gives the connection back. Only then does the network look at it again.
+//
 // Ownership: a connection keeps itself alive while something of it is under way, an outstanding answer
 // included, and leaves the list of connections when it goes.
 #pragma once
 
 #include <array>
+#include <atomic>
 #include <boost/asio/io_context.hpp>
 #include <boost/asio/ssl/context.hpp>
 #include <boost/asio/steady_timer.hpp>
@@ -14,6 +18,7 @@
 #include <boost/beast/http.hpp>
 #include <functional>
 #include <memory>
+#include <mutex>
 #include <optional>
 #include <set>
 
@@ -35,7 +40,10 @@ struct HttpContext {
   boost::asio::thread_pool& workers;
   std::function<void()> onLastGone;  // told when the last connection has gone
   std::set<HttpConnection*> connections = {};
-  bool draining = false;  // answers are the last on their connection
+  std::atomic<bool> draining{false};  // answers are the last on their connection
+  // Held by a worker while it gives a connection back; and by the network to begin draining, which must not
+  // miss that one, and before it lets the time of one be over.
+  std::mutex givingBack = {};
 };
 
 class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
@@ -57,8 +65,8 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
 
   void OnHandshake(Error error, std::optional<HttpAnswer> refusal);
   void Begin(std::optional<HttpAnswer> refusal);
-  // Waits for the next request, within the time that runs already.
-  void Read();
+  // Waits for the next request, within the time that runs already. Takes the reference along, as Handle does.
+  static void Read(std::shared_ptr<HttpConnection> self);
   void OnHeader(Error error);
   void ReadBody();
   void OnBody(Error error);
@@ -68,9 +76,18 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
   // Takes the reference along to where the answer comes from: the network's thread must be the one that sees
   // the connection go, so no worker may keep one.
   static void Handle(std::shared_ptr<HttpConnection> self, const HttpRequest& request);
+  // Sends it and goes on to the next request without the network's thread, which would have to wake up for
+  // it; or leaves to the network what remains.
+  static void Answer(std::shared_ptr<HttpConnection> self, HttpAnswer answer);
+  void Compose(HttpAnswer answer);
+  // What the socket takes without waiting. Whether that was all.
+  bool SendAtOnce();
+  // Reads on, and takes the reference; or leaves it, when the connection has to end.
+  static bool GiveBack(std::shared_ptr<HttpConnection>& self);
   // Answers without having read a request to its end, and closes.
   void Refuse(HttpAnswer answer);
-  void Write(HttpAnswer answer);
+  // What is left of the answer.
+  void Write();
   void OnWritten(Error error);
   void End();
   void CloseSending();
@@ -78,6 +95,7 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
   void Discard();
   // Ends what is under way on the stream after that time.
   void SetDeadline(std::chrono::milliseconds time);
+  void ClearDeadline();
   bool HasBegun() const { return _parser && _parser->got_some(); }
 
   HttpContext& _context;
@@ -85,9 +103,12 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
   HttpPeer _peer;
   HttpStream _stream;
   boost::asio::steady_timer _deadline;
+  std::atomic<unsigned> _deadlines{0};  // set or cleared so far; only the last counts
   boost::beast::flat_buffer _buffer;
   std::optional<boost::beast::http::request_parser<boost::beast::http::string_body>> _parser;
   std::optional<boost::beast::http::response<boost::beast::http::string_body>> _response;
+  // How much of the answer has been sent.
+  std::optional<boost::beast::http::response_serializer<boost::beast::http::string_body>> _unsent;
   std::array<char, 16384> _discarded;
   HttpRequest _request;  // what the header says; the fields behind a body in chunks change nothing of it
   unsigned _version = 11;

@@ -9,6 +9,7 @@
 #include <boost/asio/write.hpp>
 #include <csignal>
 #include <cstring>
+#include <mutex>
 #include <stdexcept>
 #include <utility>
 
@@ -173,7 +174,10 @@ void HttpServer::Impl::BeginDrain() {
   if (_context.draining) {
     return;
   }
-  _context.draining = true;
+  {
+    const std::lock_guard guard(_context.givingBack);
+    _context.draining = true;
+  }
   for (const auto& listener : _listeners) {
     listener->Close();
   }

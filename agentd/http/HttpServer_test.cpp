@@ -193,6 +193,31 @@ TEST(HttpServer, StoppedClosesConnectionsThatOnlyWait) {
   EXPECT_TRUE(client.IsClosed());
 }
 
+// A connection may be given back by a worker just when the server begins to end all that wait for a request:
+// each round stops the server a little earlier before that.
+TEST(HttpServer, StoppedJustWhenAnAnswerIsSentMissesNoConnection) {
+  HttpLimits limits;
+  limits.readTime = std::chrono::minutes(2);  // one that was missed would wait as long, and the server for it
+  limits.drainTime = std::chrono::seconds(10);
+  for (int round = 0; round < 200; ++round) {
+    std::atomic<HttpServer*> running{nullptr};
+    RunningServer server(
+        [&running, round](const HttpRequest& request) {
+          running.load()->Stop();
+          for (std::atomic<int> delay{0}; delay < 100 * round; ++delay) {
+          }
+          return Testing::Echo(request);
+        },
+        limits);
+    running = &server.Server();
+    RawClient client(server.Path());
+    client.Send("GET /a HTTP/1.1\r\nHost: x\r\n\r\n");
+    ASSERT_EQ(client.Receive().status, 200u);
+    ASSERT_TRUE(server.Wait()) << "in round " << round;
+    ASSERT_TRUE(client.IsClosed());
+  }
+}
+
 TEST(HttpServer, ASignalEndsItAfterTheRequestsInFlight) {
   Gate gate;
   RunningServer server([&gate](const HttpRequest& request) {

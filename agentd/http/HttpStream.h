@@ -22,7 +22,10 @@ class TimedSocket {
   using executor_type = Socket::executor_type;
   using Error = boost::system::error_code;
 
-  explicit TimedSocket(Socket socket) : _socket(std::move(socket)) {}
+  explicit TimedSocket(Socket socket) : _socket(std::move(socket)) {
+    Error ignored;
+    _socket.non_blocking(true, ignored);  // whoever writes past this class must not be held up
+  }
 
   executor_type get_executor() { return _socket.get_executor(); }
   lowest_layer_type& lowest_layer() { return _socket.lowest_layer(); }

@@ -48,7 +48,7 @@ struct HttpLimits {
   std::chrono::milliseconds readTime = std::chrono::seconds(30);
   std::chrono::milliseconds writeTime = std::chrono::seconds(60);  // for one whole answer; beyond: closed
   std::chrono::milliseconds drainTime = std::chrono::seconds(60);  // for what is in flight when stopping
-  unsigned workers = 4;  // requests handled at the same time; one that is answered later counts no more
+  unsigned workers = 6;  // requests handled at the same time; one that is answered later counts no more
 };
 
 }  // namespace Agentd

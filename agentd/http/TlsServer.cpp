@@ -4,19 +4,13 @@
 #include <openssl/x509v3.h>
 
 #include <memory>
-#include <stdexcept>
+
+#include "agentd/http/TlsContext.h"
 
 namespace Agentd {
 namespace {
 
 namespace ssl = boost::asio::ssl;
-using boost::system::error_code;
-
-void Demand(const error_code& error, const char* what, const std::string& file) {
-  if (error) {
-    throw std::runtime_error(std::string("cannot use ") + what + " " + file + ": " + error.message());
-  }
-}
 
 // Empty for what is no text. A byte of zero stays in the name, which then equals no other.
 std::string ToText(const ASN1_STRING* value) {
@@ -60,16 +54,10 @@ void ForgetSessions(SSL_CTX* context) {
 }  // namespace
 
 ssl::context MakeTlsContext(const TlsFiles& files) {
-  ssl::context context(ssl::context::tls_server);
-  SSL_CTX_set_min_proto_version(context.native_handle(), TLS1_2_VERSION);
+  ssl::context context = MakeTlsContext(ssl::context::tls_server);
   ForgetSessions(context.native_handle());
-  error_code error;
-  context.use_certificate_chain_file(files.certificate, error);
-  Demand(error, "the certificate", files.certificate);
-  context.use_private_key_file(files.key, ssl::context::pem, error);
-  Demand(error, "the key", files.key);
-  context.load_verify_file(files.clientCa, error);
-  Demand(error, "the CA of clients", files.clientCa);
+  UseCertificate(context, files.certificate, files.key);
+  UseCa(context, files.clientCa, "of clients");
   // Tells clients whose certificates are wanted.
   SSL_CTX_set_client_CA_list(context.native_handle(), SSL_load_client_CA_file(files.clientCa.c_str()));
   context.set_verify_mode(ssl::verify_peer);

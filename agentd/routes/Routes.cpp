@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <optional>
 #include <string>
 #include <utility>
@@ -9,6 +10,7 @@
 #include "agentd/http/HttpTarget.h"
 #include "agentd/http/Shown.h"
 #include "agentd/routes/JsonAnswers.h"
+#include "agentd/routes/Metrics.h"
 #include "agentd/routes/Operations.h"
 #include "agentd/routes/Permission.h"
 #include "agentd/routes/RequestReader.h"
@@ -29,10 +31,13 @@ using Host::ManagementApi;
 constexpr std::string_view jsonType = "application/json";
 constexpr std::string_view xmlType = "text/xml";
 
-// A request on its way: who serves it, what was asked, and the way back.
+// A request on its way: who serves it, what was asked, and the way back. Gone when it is served; an answer
+// that comes later keeps what it needs.
 struct Call {
   const ManagementApi& api;
   TaskQueue& tasks;
+  QueryQueue& queries;
+  const Metrics& metrics;
   const HttpTarget& target;
   const HttpRequest& request;
   const HttpResponder& responder;
@@ -52,20 +57,49 @@ bool HasOnly(std::string_view known, const Call& call) {
   return true;
 }
 
+// What `make` makes, or what its exception comes to.
+template <class Make>
+HttpAnswer Made(const Make& make) {
+  try {
+    return make();
+  } catch (const Orbis::ParseException& refused) {
+    return PlainText(400, refused.what());
+  } catch (const Orbis::MethodFault::Exception& refused) {
+    return ToHttp(Host::Answer{.result = nullptr, .fault = refused.GetFault()});
+  } catch (const std::exception& mistake) {
+    return ToHttp(Host::FailedWith(mistake.what()));
+  }
+}
+
+// Answers with what the query makes, once there is a place for it.
+template <class Query>
+void Ask(const Call& call, Query query) {
+  call.queries.Run([responder = call.responder, query = std::move(query)] { responder.Answer(Made(query)); });
+}
+
 void Health(const Call& call) {
   call.responder.Answer(PlainText(200, "ok"));
 }
 
+void GetMetrics(const Call& call) {
+  if (HasOnly("", call)) {
+    call.responder.Answer({200, "text/plain; version=0.0.4; charset=utf-8",
+                           call.metrics.Text(call.tasks.Now(), call.queries.Now())});
+  }
+}
+
 void GetDisks(const Call& call) {
   if (HasOnly("names", call)) {
-    call.responder.Answer(ToHttp(call.api.QueryDisksWritten(call.target.ValuesOf("names"))));
+    Ask(call, [&api = call.api, names = call.target.ValuesOf("names")] {
+      return ToHttp(api.QueryDisksWritten(names));
+    });
   }
 }
 
 template <Host::Answer (ManagementApi::*operation)() const>
 void GetPlain(const Call& call) {
   if (HasOnly("", call)) {
-    call.responder.Answer(ToHttp((call.api.*operation)()));
+    Ask(call, [&api = call.api] { return ToHttp((api.*operation)()); });
   }
 }
 
@@ -90,12 +124,11 @@ void PostOperation(const Call& call) {
   }
   ReadRequest request = ReadJsonRequest(operation, call.request.body);
   Bound(request.arguments);
-  if (operation.callWritten != nullptr) {
-    call.responder.Answer(ToHttp(operation.callWritten(call.api, request.arguments)));
-    return;
-  }
   if (!operation.changes) {
-    call.responder.Answer(ToHttp(operation.call(call.api, request.arguments)));
+    Ask(call, [&api = call.api, &operation, arguments = std::move(request.arguments)] {
+      return operation.callWritten != nullptr ? ToHttp(operation.callWritten(api, arguments))
+                                              : ToHttp(operation.call(api, arguments));
+    });
     return;
   }
   const std::size_t bytes = WeightOf(request.arguments);
@@ -145,7 +178,7 @@ void GetDescription(const Call& call) {
 }
 
 void PostSoap(const Call& call) {
-  ServeSoap(call.api, call.tasks, call.request, call.responder);
+  ServeSoap({call.api, call.tasks, call.queries}, call.request, call.responder);
 }
 
 void GetSoap(const Call& call) {
@@ -172,8 +205,9 @@ struct Route {
   void (*serve)(const Call& call);
 };
 
-constexpr std::array<Route, 12> routes = {{
+constexpr std::array<Route, 13> routes = {{
     {HttpRole::None, "", "/healthz", &IsNothing, &Health},
+    {HttpRole::Read, "", "/metrics", &IsNothing, &GetMetrics},
     {HttpRole::Read, "", "/api/v1/disks", &IsNothing, &GetDisks},
     {HttpRole::Read, "", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
     {HttpRole::Read, "", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
@@ -216,19 +250,40 @@ void Follow(const Route& route, const Call& call) {
   }
   try {
     route.serve(call);
-  } catch (const Orbis::ParseException& refused) {
-    call.responder.Answer(PlainText(400, refused.what()));
-  } catch (const Orbis::MethodFault::Exception& refused) {
-    call.responder.Answer(ToHttp(Host::Answer{.result = nullptr, .fault = refused.GetFault()}));
+  } catch (...) {
+    call.responder.Answer(Made([]() -> HttpAnswer { throw; }));  // that exception again
   }
+}
+
+// Of the route, for people who count: an operation stands with its name, a task without its id.
+std::string NameOf(const Route& route, std::string_view rest) {
+  return std::string(route.path) + (route.takes == &IsOperation ? std::string(rest) : "");
+}
+
+// Counts the answer on its way.
+HttpResponder Counted(const std::shared_ptr<Metrics>& metrics, std::string route,
+                      const HttpResponder& responder) {
+  using Clock = std::chrono::steady_clock;
+  return HttpResponder(
+      [metrics, route = std::move(route), responder, begun = Clock::now()](HttpAnswer answer) {
+        metrics->Count(route, answer.status, Clock::now() - begun);
+        responder.Answer(std::move(answer));
+      });
 }
 
 }  // namespace
 
+Router::Router(const ManagementApi& api, TaskQueue& tasks, const QueryLimits& limits)
+    : _api(api),
+      _tasks(tasks),
+      _queries(std::make_unique<QueryQueue>(limits)),
+      _metrics(std::make_shared<Metrics>()) {}
+Router::~Router() = default;
+
 void Router::Serve(const HttpRequest& request, const HttpResponder& responder) const {
   const std::optional<HttpTarget> target = ParseTarget(request.target);
   if (!target) {
-    responder.Answer(PlainText(400, "the target holds a broken escape"));
+    Counted(_metrics, "none", responder).Answer(PlainText(400, "the target holds a broken escape"));
     return;
   }
   const std::string_view path = target->path;
@@ -238,13 +293,16 @@ void Router::Serve(const HttpRequest& request, const HttpResponder& responder) c
       continue;
     }
     if (request.method == (route.bodyType.empty() ? "GET" : "POST")) {
-      Follow(route, {_api, _tasks, *target, request, responder, path.substr(route.path.size())});
+      const std::string_view rest = path.substr(route.path.size());
+      const HttpResponder counted = Counted(_metrics, NameOf(route, rest), responder);
+      Follow(route, {_api, _tasks, *_queries, *_metrics, *target, request, counted, rest});
       return;
     }
     pathKnown = true;
   }
-  responder.Answer(pathKnown ? PlainText(405, "that method is not served here")
-                             : PlainText(404, "nothing is served here"));
+  Counted(_metrics, "none", responder)
+      .Answer(pathKnown ? PlainText(405, "that method is not served here")
+                        : PlainText(404, "nothing is served here"));
 }
 
 }  // namespace Agentd

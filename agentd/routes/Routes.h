@@ -1,6 +1,7 @@
 // Which request calls which operation.
 //
 //   GET  /healthz                    "ok" while the agent serves
+//   GET  /metrics                    what it has served, and what waits (see Metrics.h)
 //   GET  /api/v1/disks?names=N&..    QueryDisksForKova
 //   GET  /api/v1/groups              GetDiskGroups
 //   GET  /api/v1/config              GetConfigInfo
@@ -24,12 +25,17 @@
 // A request takes the role read, or change if it changes something; /healthz takes none. A client without the
 // role is answered with NotPermitted.
 //
-// Queries are answered on the calling thread. Changes are handed to the task queue, and answered by it when
-// their turn has come: however many wait, and however long one takes, no thread waits for them here.
+// Queries are answered on the calling thread if there is a place for one more, and left to another that
+// answers one already if not (see QueryQueue.h). Changes are handed to the task queue, and answered by it
+// when their turn has come. So however many wait, and however slow the kernel is, no thread waits for them
+// here.
 #pragma once
+
+#include <memory>
 
 #include "agentd/http/HttpResponder.h"
 #include "agentd/http/HttpTypes.h"
+#include "agentd/tasks/QueryQueue.h"
 
 namespace Host {
 class ManagementApi;
@@ -37,12 +43,14 @@ class ManagementApi;
 
 namespace Agentd {
 
+class Metrics;
 class TaskQueue;
 
 class Router {
  public:
   // Both outlive the router and whatever it handed to the queue.
-  Router(const Host::ManagementApi& api, TaskQueue& tasks) : _api(api), _tasks(tasks) {}
+  Router(const Host::ManagementApi& api, TaskQueue& tasks, const QueryLimits& limits = {});
+  ~Router();
 
   // Threads: any. Throws nothing that a client could bring about.
   void Serve(const HttpRequest& request, const HttpResponder& responder) const;
@@ -50,6 +58,8 @@ class Router {
  private:
   const Host::ManagementApi& _api;
   TaskQueue& _tasks;
+  const std::unique_ptr<QueryQueue> _queries;
+  const std::shared_ptr<Metrics> _metrics;  // answers that come late are still counted
 };
 
 }  // namespace Agentd

@@ -8,6 +8,7 @@
 #include "agentd/routes/Permission.h"
 #include "agentd/routes/SoapAnswer.h"
 #include "agentd/routes/SoapRequest.h"
+#include "agentd/tasks/QueryQueue.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "nox/Documents.h"
 #include "orbis/ParseException.h"
@@ -17,13 +18,18 @@ namespace {
 
 constexpr std::string_view schemaFile = "nox.xsd";
 
-// An answer that cannot be written is the host's mistake, and still an answer.
-template <class Answer>
-HttpAnswer Written(std::string_view operation, const Answer& answer) {
+// What `make` makes, or what its exception comes to: an answer that cannot be made is the host's mistake, and
+// still an answer.
+template <class Make>
+HttpAnswer Made(const Make& make) {
   try {
-    return ToSoap(operation, answer);
+    return make();
+  } catch (const Orbis::ParseException& refused) {
+    return ToSoap(refused);
+  } catch (const Orbis::MethodFault::Exception& refused) {
+    return ToSoap("", Host::Answer{.result = nullptr, .fault = refused.GetFault()});
   } catch (const std::exception& mistake) {
-    return ToSoap(operation, Host::FailedWith(mistake.what()));
+    return ToSoap("", Host::FailedWith(mistake.what()));
   }
 }
 
@@ -38,10 +44,30 @@ std::string Wsdl() {
   return text;
 }
 
+void Submit(const SoapService& service, SoapRequest& read, const HttpResponder& responder) {
+  const std::size_t bytes = WeightOf(read.arguments);
+  service.tasks.Submit(
+      std::string(read.operation->name), read.label,
+      [&api = service.api, &operation = *read.operation, arguments = std::move(read.arguments)] {
+        return operation.call(api, arguments);
+      },
+      [responder](const Task& ended) {
+        responder.Answer(Made([&ended] { return ToSoap(ended.operation, ended.answer); }));
+      },
+      bytes);
+}
+
+void Ask(const SoapService& service, SoapRequest& read, const HttpResponder& responder) {
+  auto answer = [&api = service.api, &operation = *read.operation, arguments = std::move(read.arguments)] {
+    return operation.callWritten != nullptr ? ToSoap(operation.name, operation.callWritten(api, arguments))
+                                            : ToSoap(operation.name, operation.call(api, arguments));
+  };
+  service.queries.Run([answer = std::move(answer), responder] { responder.Answer(Made(answer)); });
+}
+
 }  // namespace
 
-void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpRequest& request,
-               const HttpResponder& responder) {
+void ServeSoap(const SoapService& service, const HttpRequest& request, const HttpResponder& responder) {
   try {
     SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
     const Operation& operation = *read.operation;
@@ -50,23 +76,13 @@ void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpReque
       return;
     }
     Bound(read.arguments);
-    if (operation.callWritten != nullptr) {
-      responder.Answer(Written(operation.name, operation.callWritten(api, read.arguments)));
-      return;
+    if (operation.changes) {
+      Submit(service, read, responder);
+    } else {
+      Ask(service, read, responder);
     }
-    if (!operation.changes) {
-      responder.Answer(Written(operation.name, operation.call(api, read.arguments)));
-      return;
-    }
-    const std::size_t bytes = WeightOf(read.arguments);
-    tasks.Submit(
-        std::string(operation.name), read.label,
-        [&api, &operation, arguments = std::move(read.arguments)] { return operation.call(api, arguments); },
-        [responder](const Task& ended) { responder.Answer(Written(ended.operation, ended.answer)); }, bytes);
-  } catch (const Orbis::ParseException& refused) {
-    responder.Answer(ToSoap(refused));
-  } catch (const Orbis::MethodFault::Exception& refused) {
-    responder.Answer(ToSoap("", Host::Answer{.result = nullptr, .fault = refused.GetFault()}));
+  } catch (...) {
+    responder.Answer(Made([]() -> HttpAnswer { throw; }));  // that exception again
   }
 }
 

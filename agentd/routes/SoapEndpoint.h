@@ -11,12 +11,18 @@ class ManagementApi;
 namespace Agentd {
 
 struct HttpTarget;
+class QueryQueue;
 class TaskQueue;
 
-// Answers a message: queries on the calling thread, changes when the queue has carried them out. Whatever is
-// wrong is a SOAP fault.
-void ServeSoap(const Host::ManagementApi& api, TaskQueue& tasks, const HttpRequest& request,
-               const HttpResponder& responder);
+struct SoapService {
+  const Host::ManagementApi& api;
+  TaskQueue& tasks;
+  QueryQueue& queries;
+};
+
+// Answers a message when its query has had its place, or its change its turn. Whatever is wrong is a SOAP
+// fault.
+void ServeSoap(const SoapService& service, const HttpRequest& request, const HttpResponder& responder);
 
 // "/soap?wsdl" and, as it refers to, "/soap?xsd=nox.xsd".
 HttpAnswer DescribeService(const HttpTarget& target);

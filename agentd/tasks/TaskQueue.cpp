@@ -6,6 +6,7 @@
 #include <random>
 #include <utility>
 
+#include "agentd/tasks/Busy.h"
 #include "nox/Faults.h"
 #include "orbis/Json.h"
 #include "otxctl/TaskScope.h"
@@ -16,28 +17,15 @@ namespace Agentd {
 
 using Nox::Fault::Busy;
 using Orbis::DateTime;
-using Tessa::MakeRef;
 using Tessa::Ref;
 
 namespace {
-
-constexpr int retryAfterSeconds = 5;
 
 // Ids of one process must not be taken for those of the next, whose first task is number one again.
 std::string RandomPrefix() {
   char text[24];
   std::snprintf(text, sizeof text, "task-%08x-", static_cast<unsigned>(std::random_device()()));
   return text;
-}
-
-Ref<Busy> TooBusy(const char* key, const std::string& reason) {
-  const auto fault = MakeRef<Busy>();
-  fault->SetRetryAfterSeconds(retryAfterSeconds);
-  const auto message = MakeRef<Orbis::LocalizableMessage>();
-  message->SetKey(key);
-  message->SetMessage(reason);
-  fault->GetFaultMessage()->Append(message);
-  return fault;
 }
 
 Ref<Busy> Stopping() {
@@ -67,7 +55,7 @@ struct TaskQueue::Entry {
   std::size_t resultBytes = 0;
 };
 
-DateTime TaskQueue::Now() {
+DateTime TaskQueue::WallClock() {
   using std::chrono::duration_cast;
   using std::chrono::microseconds;
   const auto now = std::chrono::system_clock::now().time_since_epoch();
@@ -129,6 +117,11 @@ std::vector<Task> TaskQueue::List() const {
   return tasks;
 }
 
+TaskQueue::Load TaskQueue::Now() const {
+  const std::lock_guard guard(_mutex);
+  return {.waiting = _waiting.size(), .running = _running, .done = _done, .failed = _failed};
+}
+
 void TaskQueue::Close() {
   std::deque<std::shared_ptr<Entry>> refused;
   {
@@ -153,6 +146,7 @@ void TaskQueue::RunAll() {
   while (const std::shared_ptr<Entry> entry = NextWaiting(lock)) {
     entry->task.state = TaskState::Running;
     entry->task.started = _clock();
+    _running = 1;
     lock.unlock();
     Run(*entry);
     lock.lock();
@@ -197,6 +191,8 @@ void TaskQueue::End(Entry& entry, Host::Answer answer) {
   {
     const std::lock_guard guard(_mutex);
     entry.task.state = answer.fault ? TaskState::Failed : TaskState::Done;
+    ++(answer.fault ? _failed : _done);
+    _running -= entry.task.started ? 1 : 0;
     entry.task.ended = _clock();
     entry.task.answer = std::move(answer);
     entry.work = {};  // and what it holds of the request

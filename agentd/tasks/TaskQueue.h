@@ -37,9 +37,9 @@ class TaskQueue {
   using Listener = std::function<void(const Task&)>;
   using Clock = std::function<Orbis::DateTime()>;
 
-  static Orbis::DateTime Now();
+  static Orbis::DateTime WallClock();
 
-  explicit TaskQueue(const TaskLimits& limits = {}, Clock clock = &TaskQueue::Now);
+  explicit TaskQueue(const TaskLimits& limits = {}, Clock clock = &TaskQueue::WallClock);
   // As Close and Finish.
   ~TaskQueue();
   TaskQueue(const TaskQueue&) = delete;
@@ -54,6 +54,14 @@ class TaskQueue {
   std::optional<Task> Find(const std::string& id) const;
   // In order of creation.
   std::vector<Task> List() const;
+
+  struct Load {
+    std::size_t waiting = 0;
+    std::size_t running = 0;  // 0 or 1
+    std::size_t done = 0;     // since the queue was made; without a fault
+    std::size_t failed = 0;   // with one
+  };
+  Load Now() const;
 
   // Takes on nothing more; tasks that wait end with a Busy fault, nothing of them done. The one that runs
   // goes on.
@@ -84,6 +92,9 @@ class TaskQueue {
   std::deque<std::shared_ptr<Entry>> _entries;  // in order of creation
   std::deque<std::shared_ptr<Entry>> _waiting;
   std::size_t _created = 0;
+  std::size_t _done = 0;
+  std::size_t _failed = 0;
+  std::size_t _running = 0;
   std::size_t _waitingBytes = 0;
   std::size_t _resultBytes = 0;  // of all entries
   bool _closed = false;

@@ -20,6 +20,7 @@ class FakeApi final : public Host::ManagementApi {
   // Set before the operation is called.
   Host::Answer answer;             // of every operation
   std::function<void()> onChange;  // called first by every operation that changes disks; may wait or throw
+  std::function<void()> onQuery;   // the same by every other
   std::string description;         // empty: the host is not simulated
 
   // The operations so far: "RemoveDisk naa.1 p o 1 2".
@@ -33,11 +34,11 @@ class FakeApi final : public Host::ManagementApi {
     for (const std::string& name : names) {
       text += " " + name;
     }
-    return Note("QueryDisksForKova" + text);
+    return Query("QueryDisksForKova" + text);
   }
-  Host::Answer GetStorageInfo() const override { return Note("GetStorageInfo"); }
-  Host::Answer GetDiskGroups() const override { return Note("GetDiskGroups"); }
-  Host::Answer GetConfigInfo() const override { return Note("GetConfigInfo"); }
+  Host::Answer GetStorageInfo() const override { return Query("GetStorageInfo"); }
+  Host::Answer GetDiskGroups() const override { return Query("GetDiskGroups"); }
+  Host::Answer GetConfigInfo() const override { return Query("GetConfigInfo"); }
   Host::Answer AddDisks(const Host::DiskList& disks) const override {
     return Change("AddDisks" + Show(&disks));
   }
@@ -65,6 +66,12 @@ class FakeApi final : public Host::ManagementApi {
   Host::Answer ChangeHost(const std::string& change) const override { return Change("ChangeHost " + change); }
 
  private:
+  Host::Answer Query(const std::string& asked) const {
+    if (onQuery) {
+      onQuery();
+    }
+    return Note(asked);
+  }
   Host::Answer Note(const std::string& asked) const {
     const std::lock_guard guard(_mutex);
     _asked.push_back(asked);

@@ -5,23 +5,45 @@
 namespace Kovactl {
 namespace {
 
-constexpr const char* agentVariable = "KOVA_AGENT";
+// The value of a variable of the environment, unless there is none.
+void ReadVariable(const char* name, std::string& value) {
+  const char* const found = std::getenv(name);
+  if (found != nullptr && *found != '\0') {
+    value = found;
+  }
+}
+
+void AddTlsOptions(CLI::App& app, GlobalOptions& global, CLI::Option* host) {
+  ReadVariable("KOVA_AGENT_CA", global.usualTls.ca);
+  ReadVariable("KOVA_AGENT_CERT", global.usualTls.certificate);
+  ReadVariable("KOVA_AGENT_KEY", global.usualTls.key);
+  app.add_option(
+         "--ca", global.tls.ca,
+         "With tls:HOST:PORT, CA of the agent's certificate, PEM; otherwise KOVA_AGENT_CA, or any that "
+         "this machine trusts")
+      ->excludes(host);
+  app.add_option("--cert", global.tls.certificate,
+                 "With tls:HOST:PORT, certificate to show the agent, with its chain, PEM; otherwise "
+                 "KOVA_AGENT_CERT, or none")
+      ->excludes(host);
+  app.add_option("--key", global.tls.key, "Its key, PEM; otherwise KOVA_AGENT_KEY")->excludes(host);
+}
 
 }  // namespace
 
 void AddGlobalOptions(CLI::App& app, CommandLine& line) {
   GlobalOptions& global = line.global;
-  const char* const usualAgent = std::getenv(agentVariable);
-  if (usualAgent != nullptr && *usualAgent != '\0') {
-    global.agent = usualAgent;
-  }
+  ReadVariable("KOVA_AGENT", global.agent);
   auto* const agent =
-      app.add_option("--agent", global.agent,
-                     "Agent to ask: unix:PATH or tcp:ADDRESS:PORT; the environment's KOVA_AGENT unless given")
+      app.add_option(
+             "--agent", global.agent,
+             "Agent to ask: unix:PATH, tls:HOST:PORT or tcp:ADDRESS:PORT; the environment's KOVA_AGENT "
+             "unless given")
           ->capture_default_str();
-  app.add_option("--host", global.runtime.hostFile,
-                 "Host description to work on in this process, without an agent")
-      ->excludes(agent);
+  auto* const host = app.add_option("--host", global.runtime.hostFile,
+                                    "Host description to work on in this process, without an agent")
+                         ->excludes(agent);
+  AddTlsOptions(app, global, host);
   app.add_flag("--save", global.runtime.save, "With --host, write changes back to the host description");
   app.add_option("-o,--output", global.output, "How to print: table, json or soap")
       ->check(CLI::IsMember({"table", "json", "soap"}))

@@ -168,11 +168,8 @@ class Builder final : public Library::json_sax_t {
   std::size_t _count = 0;
 };
 
-// Whether every character stands for itself in a JSON string.
 bool IsPlain(std::string_view text) {
-  return std::all_of(text.begin(), text.end(), [](char character) {
-    return character >= ' ' && character < 0x7F && character != '"' && character != '\\';
-  });
+  return std::all_of(text.begin(), text.end(), [](char character) { return Json::IsPlain(character); });
 }
 
 }  // namespace

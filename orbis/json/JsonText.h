@@ -38,6 +38,11 @@ std::string Describe(const Value& value);
 // Throws ParseException.
 Value Parse(std::string_view text, const Limits& limits);
 
+// Whether the character stands for itself in a JSON string, alone.
+constexpr bool IsPlain(char character) {
+  return character >= ' ' && character < 0x7F && character != '"' && character != '\\';
+}
+
 // Appends a JSON string, quotes included. What is not UTF-8 becomes U+FFFD.
 void AppendString(std::string_view text, std::string& out);
 

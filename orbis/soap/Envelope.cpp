@@ -3,6 +3,7 @@
 #include <utility>
 
 #include "orbis/DataObject.h"
+#include "orbis/GrowingText.h"
 #include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/Types.h"
@@ -68,16 +69,16 @@ const Element& ContentOf(const Element& root) {
 }
 
 // The next item of a list, under another name.
-void AppendRenamed(Soap::WrittenText& written, std::string_view name, std::string& out) {
+void AppendRenamed(Soap::WrittenText& written, std::string_view name, GrowingText& out) {
   const Soap::WrittenTag item = written.Open();
   if (item.name != "item") {
     throw Soap::Unfamiliar();
   }
-  out.append("<").append(name);
+  out.Append("<", name);
   if (!item.type.empty()) {
-    out.append(" xsi:type=\"").append(item.type).append("\"");
+    out.Append(" xsi:type=\"", item.type, "\"");
   }
-  out.append(">").append(written.TakeContent()).append("</").append(name).append(">");
+  out.Append(">", written.TakeContent(), "</", name, ">");
   written.Close(item.name);
 }
 
@@ -132,16 +133,16 @@ bool AppendMessageOfSoap(std::string_view name, std::string_view field, const Ty
                          std::string_view text, std::string& out) {
   const auto append = [&] {
     Soap::WrittenText written(text);
-    out.reserve(out.size() + text.size() + text.size() / 8);  // the new name may be longer than the old
     if (written.OpenRoot() != list.name) {
       throw Soap::Unfamiliar();
     }
-    out.append("<").append(name).append(" xmlns=\"").append(apiNamespace).append("\">");
+    GrowingText message(out, text.size() + text.size() / 8);  // the new name may be longer than the old
+    message.Append("<", name, " xmlns=\"", apiNamespace, "\">");
     while (!written.IsAtEndTag()) {
-      AppendRenamed(written, field, out);
+      AppendRenamed(written, field, message);
     }
     written.CloseRoot();
-    out.append("</").append(name).append(">");
+    message.Append("</", name, ">");
   };
   try {
     AppendEnvelope(out, append);

@@ -1,5 +1,7 @@
+#include <array>
 #include <string>
 
+#include "orbis/GrowingText.h"
 #include "orbis/Limits.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/WrittenSoap.h"
@@ -14,10 +16,20 @@ using Soap::WrittenText;
 
 constexpr std::string_view simplePrefix = "xsd:";
 
+// By character: whether it is the same in a value of the text and in a string of JSON.
+constexpr std::array<bool, 256> SameInBoth() {
+  std::array<bool, 256> same{};
+  for (std::size_t character = 0; character < same.size(); ++character) {
+    same[character] = Json::IsPlain(static_cast<char>(character)) && character != '<' && character != '&';
+  }
+  return same;
+}
+constexpr std::array<bool, 256> sameInBoth = SameInBoth();
+
 // Walks the text along the descriptors, and writes each value as soon as it is met.
 class Transcriber {
  public:
-  Transcriber(std::string_view text, std::string& out) : _text(text), _out(out) {}
+  Transcriber(std::string_view text, GrowingText& out) : _text(text), _out(out) {}
 
   void WriteRoot() {
     WriteContent(TypeNamed(_text.OpenRoot()), false);
@@ -59,34 +71,34 @@ class Transcriber {
     } else if (type.kind == TypeKind::Simple) {
       WriteHead(simplePrefix, type.name);
       WriteValue(type.simple);
-      _out += '}';
+      _out.Append("}");
     } else {
       if (any) {
         WriteHead("", type.name);
       }
       WriteList("item", type.kind == TypeKind::StringArray ? nullptr : type.element);
       if (any) {
-        _out += '}';
+        _out.Append("}");
       }
     }
     --_depth;
   }
 
   void WriteHead(std::string_view prefix, std::string_view type) {
-    _out.append("{\"@type\":\"").append(prefix).append(type).append("\",\"@value\":");
+    _out.Append("{\"@type\":\"", prefix, type, "\",\"@value\":");
   }
 
   void WriteObject(const TypeDescriptor& type) {
-    _out.append("{\"@type\":\"").append(type.name).append("\"");
+    _out.Append("{\"@type\":\"", type.name, "\"");
     for (const FieldDescriptor* field : type.fields) {
       if (_text.IsAtElement(field->name)) {
-        _out.append(",\"").append(field->name).append("\":");
+        _out.Append(",\"", field->name, "\":");
         WriteField(*field);
       } else if (field->presence == Presence::Required) {
         throw Unfamiliar();
       }
     }
-    _out += '}';
+    _out.Append("}");
   }
 
   void WriteField(const FieldDescriptor& field) {
@@ -101,16 +113,16 @@ class Transcriber {
 
   // The elements of that name that follow one another. No element type: they are texts.
   void WriteList(std::string_view name, const TypeDescriptor* element) {
-    _out += '[';
-    for (const char* separator = ""; _text.IsAtElement(name); separator = ",") {
-      _out += separator;
+    _out.Append("[");
+    for (std::string_view separator; _text.IsAtElement(name); separator = ",") {
+      _out.Append(separator);
       if (element == nullptr) {
         WriteSimpleElement(name, FieldKind::String);
       } else {
         WriteElement(name, element);
       }
     }
-    _out += ']';
+    _out.Append("]");
   }
 
   void WriteSimpleElement(std::string_view name, FieldKind kind) {
@@ -121,30 +133,34 @@ class Transcriber {
     _text.Close(name);
   }
 
-  // Values but texts look the same in both forms, quotes aside.
   void WriteValue(FieldKind kind) {
-    const std::string_view value = _text.TakeValue();
     if (kind == FieldKind::String) {
-      WriteText(value);
-      return;
+      WriteText();
+    } else if (kind == FieldKind::DateTime || kind == FieldKind::Base64) {
+      _out.Append("\"", _text.TakeValue(), "\"");
+    } else {
+      _out.Append(_text.TakeValue());
     }
-    const bool quoted = kind == FieldKind::DateTime || kind == FieldKind::Base64;
-    _out.append(quoted ? "\"" : "").append(value).append(quoted ? "\"" : "");
   }
 
-  void WriteText(std::string_view value) {
-    if (value.find('&') == std::string_view::npos) {
-      Json::AppendString(value, _out);
+  void WriteText() {
+    const std::string_view same =
+        _text.TakeWhile([](char character) { return sameInBoth[static_cast<unsigned char>(character)]; });
+    if (_text.IsAtTag()) {  // as nearly all texts end there
+      _out.Append("\"", same, "\"");
       return;
     }
-    _unescaped.clear();
-    Soap::AppendUnescaped(value, _unescaped);
-    Json::AppendString(_unescaped, _out);
+    _unescaped = same;
+    Soap::AppendUnescaped(_text.TakeValue(), _unescaped);
+    _quoted.clear();
+    Json::AppendString(_unescaped, _quoted);
+    _out.Append(_quoted);
   }
 
   WrittenText _text;
-  std::string& _out;
+  GrowingText& _out;
   std::string _unescaped;
+  std::string _quoted;
   std::size_t _depth = 0;
 };
 
@@ -152,9 +168,9 @@ class Transcriber {
 
 bool AppendJsonOfSoap(std::string_view text, std::string& out) {
   const std::size_t before = out.size();
-  out.reserve(before + text.size());  // JSON is the shorter of the two
   try {
-    Transcriber(text, out).WriteRoot();
+    GrowingText json(out, text.size());  // JSON is the shorter of the two
+    Transcriber(text, json).WriteRoot();
     return true;
   } catch (const Unfamiliar&) {
     out.resize(before);

@@ -89,6 +89,18 @@ TEST(AppendJsonOfSoap, WritesEveryKindOfValue) {
             R"({"@type":"KeyAnyValue","key":"none","value":{"@type":"ArrayOfKeyAnyValue","@value":[]}}])");
 }
 
+TEST(AppendJsonOfSoap, TakesTextsThatGrowInJson) {
+  const std::string quotes(100'000, '"');
+  std::string json;
+  EXPECT_TRUE(AppendJsonOfSoap(Written(*APair(quotes.c_str(), MakeRef<Boxed<bool>>(true))), json));
+  std::string wanted;
+  for (std::size_t count = 0; count < quotes.size(); ++count) {
+    wanted += "\\\"";
+  }
+  EXPECT_EQ(json, R"({"@type":"KeyAnyValue","key":")" + wanted +
+                      R"(","value":{"@type":"xsd:boolean","@value":true}})");
+}
+
 std::string Replaced(std::string text, const std::string& part, const std::string& by) {
   return text.replace(text.find(part), part.size(), by);
 }

@@ -28,103 +28,45 @@ constexpr std::pair<std::string_view, char> escapes[] = {
 }  // namespace
 
 std::string_view WrittenText::OpenRoot() {
-  Take(Head());
+  TakeKnown(Head());
   const std::string_view type = TakeUntil('"');
-  Take("\">");
+  TakeKnown("\">");
   return type;
 }
 
 void WrittenText::CloseRoot() {
   Close("object");
-  if (!_rest.empty()) {
+  if (_at != _end) {
     throw Unfamiliar();
   }
-}
-
-bool WrittenText::IsAtElement(std::string_view name) const {
-  const std::size_t end = 1 + name.size();
-  // The end of the name first: it tells most names apart.
-  return _rest.size() > end && (_rest[end] == '>' || _rest[end] == ' ') && _rest.front() == '<' &&
-         _rest.compare(1, name.size(), name) == 0;
 }
 
 WrittenTag WrittenText::Open() {
-  Take('<');
-  std::size_t end = 0;
-  while (end < _rest.size() && !EndsName(_rest[end])) {
-    ++end;
-  }
-  if (end == 0 || end == _rest.size()) {
+  TakeKnown("<");
+  const std::string_view name = TakeWhile([](char character) { return !EndsName(character); });
+  if (name.empty()) {
     throw Unfamiliar();
   }
-  const std::string_view name = _rest.substr(0, end);
-  _rest.remove_prefix(end);
   return {name, TakeTypeAndTagEnd()};
 }
 
-std::string_view WrittenText::OpenKnown(std::string_view name) {
-  _rest.remove_prefix(1 + name.size());
-  return TakeTypeAndTagEnd();
-}
-
-std::string_view WrittenText::TakeTypeAndTagEnd() {
-  std::string_view type;
-  if (_rest.front() != '>') {
-    Take(typeAttribute);
-    type = TakeUntil('"');
-    Take('"');
-  }
-  Take('>');
+std::string_view WrittenText::TakeType() {
+  TakeKnown(typeAttribute);
+  const std::string_view type = TakeUntil('"');
+  TakeKnown("\">");
   return type;
 }
 
-void WrittenText::Close(std::string_view name) {
-  Take('<');
-  Take('/');
-  Take(name);
-  Take('>');
-}
-
-std::string_view WrittenText::TakeValue() {
-  return TakeUntil('<');
-}
-
 std::string_view WrittenText::TakeContent() {
-  std::size_t depth = 0;
-  for (std::size_t at = _rest.find('<'); at != std::string_view::npos; at = _rest.find('<', at + 1)) {
-    const bool ends = _rest.substr(at + 1, 1) == "/";
-    if (ends && depth == 0) {
-      const std::string_view content = _rest.substr(0, at);
-      _rest.remove_prefix(at);
-      return content;
+  const char* const begin = _at;
+  for (std::size_t depth = 0;; ++_at) {
+    TakeUntil('<');
+    if (!IsAtEndTag()) {
+      ++depth;
+    } else if (depth-- == 0) {
+      return {begin, static_cast<std::size_t>(_at - begin)};
     }
-    depth += ends ? -1 : 1;
   }
-  throw Unfamiliar();
-}
-
-void WrittenText::Take(std::string_view expected) {
-  if (_rest.compare(0, expected.size(), expected) != 0) {
-    throw Unfamiliar();
-  }
-  _rest.remove_prefix(expected.size());
-}
-
-void WrittenText::Take(char expected) {
-  if (_rest.empty() || _rest.front() != expected) {
-    throw Unfamiliar();
-  }
-  _rest.remove_prefix(1);
-}
-
-std::string_view WrittenText::TakeUntil(char end) {
-  const std::size_t size = _rest.find(end);
-  if (size == std::string_view::npos) {
-    throw Unfamiliar();
-  }
-  const std::string_view taken = _rest.substr(0, size);
-  _rest.remove_prefix(size);
-  return taken;
 }
 
 void AppendUnescaped(std::string_view value, std::string& out) {

@@ -73,10 +73,11 @@ class DeviceReader {
 
   bool Flag(const char* key) const {
     const json* const value = Find(key);
-    if (value == nullptr || *value == false || *value == 0 || *value == "0") {
+    const auto is = [value](const json& meaning) { return *value == meaning; };
+    if (value == nullptr || is(false) || is(0) || is("0")) {
       return false;
     }
-    if (*value == true || *value == 1 || *value == "1") {
+    if (is(true) || is(1) || is("1")) {
       return true;
     }
     Refuse(_path + "." + key, "must be true or false");

@@ -9,6 +9,7 @@ import socket
 import stat
 import subprocess
 import unittest
+import unittest.mock
 
 from programs import ProgramTest, disk
 
@@ -124,15 +125,19 @@ class PlainTcp(NetworkTest):
                     self.assertNotIn(part, answer)
 
 
-@unittest.skipUnless(shutil.which("curl"), "curl is not installed")
-@unittest.skipUnless(shutil.which("openssl"), "openssl is not installed")
-class Tls(NetworkTest):
+class TlsTest(NetworkTest):
+    """With a CA, strangers of another, and an agent's certificate."""
+
     def setUp(self):
         super().setUp()
         self.make_ca("ca")
         self.make_ca("strangers")
-        self.issue("server", "ca", "/CN=kova", "subjectAltName=IP:127.0.0.1,DNS:kova.example")
-        self.tls = ["--tls-cert", "server.pem", "--tls-key", "server.key", "--tls-client-ca", "ca.pem"]
+        self.issue("server", "ca", "/CN=kova", "subjectAltName=IP:127.0.0.1,DNS:kova.example,DNS:localhost")
+        self.tls = self.tls_of("server")
+
+    @staticmethod
+    def tls_of(server):
+        return ["--tls-cert", server + ".pem", "--tls-key", server + ".key", "--tls-client-ca", "ca.pem"]
 
     def openssl(self, *arguments):
         outcome = self.run_program("openssl", *arguments)
@@ -150,6 +155,10 @@ class Tls(NetworkTest):
         self.openssl("x509", "-req", "-in", name + ".csr", "-CA", ca + ".pem", "-CAkey", ca + ".key", "-CAcreateserial",
                      "-days", days, "-extfile", name + ".ext", "-out", name + ".pem")
 
+
+@unittest.skipUnless(shutil.which("curl"), "curl is not installed")
+@unittest.skipUnless(shutil.which("openssl"), "openssl is not installed")
+class Tls(TlsTest):
     def ask(self, path, *more, **body):
         return self.curl(f"https://127.0.0.1:{self.port}{path}", "--cacert", "ca.pem", *more, **body)
 
@@ -229,6 +238,104 @@ class Tls(NetworkTest):
         self.assert_ended(self.agentd(*listen, *self.tls[:2], "--tls-key", "none.key", *self.tls[4:]), 2, "none.key")
         self.assert_ended(self.agentd(*listen, *self.tls[:2], "--tls-key", "ca.key", *self.tls[4:]), 2, "ca.key")
         self.assertFalse(os.path.exists(self.socket))
+
+
+@unittest.skipUnless(shutil.which("openssl"), "openssl is not installed")
+class CommandLineByTls(TlsTest):
+    def setUp(self):
+        super().setUp()
+        self.issue("operator", "ca", "/CN=operator")
+        self.issue("monitor", "ca", "/CN=monitor")
+
+    def start(self, *arguments):
+        super().start(*(arguments or self.tls), "--change-name", "operator", "--read-name", "monitor")
+        self.address = f"tls:127.0.0.1:{self.port}"
+
+    def ask_as(self, certificate, *command, ca="ca"):
+        shown = ("--cert", certificate + ".pem", "--key", certificate + ".key") if certificate else ()
+        return self.kovactl("--agent", self.address, "--ca", ca + ".pem", *shown, *command)
+
+    def test_may_do_what_its_certificate_may(self):
+        self.start()
+        disks = self.ask_as("monitor", "-o", "json", "disks")
+        self.assert_ended(disks, 0)
+        self.assertEqual(disks.out, self.ask_agent("-o", "json", "disks").out)
+        self.assert_ended(self.ask_as("monitor", "add", "--all", "--yes"), 1, "role does not allow this: change")
+        self.assert_ended(self.ask_as("operator", "add", "--all", "--yes"), 0)
+        self.assertIn("naa.1", self.ask_as("monitor", "groups").out)
+        self.assert_ended(self.ask_as("operator", "tasks"), 0)
+        self.assert_ended(self.ask_as("operator", "plan", "remove-group", "naa.1"), 0)
+        self.assert_ended(self.ask_as(None, "disks"), 1, "role does not allow this: read")
+
+    def test_takes_its_files_from_the_environment(self):
+        self.start()
+        variables = {"KOVA_AGENT": self.address, "KOVA_AGENT_CA": self.path("ca.pem"),
+                     "KOVA_AGENT_CERT": self.path("operator.pem"), "KOVA_AGENT_KEY": self.path("operator.key")}
+        with unittest.mock.patch.dict(os.environ, variables):
+            self.assert_ended(self.kovactl("claim"), 0)
+            self.assert_ended(self.kovactl("--cert", "monitor.pem", "--key", "monitor.key", "claim"), 1, "role")
+            self.assert_ended(self.kovactl("--ca", "strangers.pem", "disks"), 3, "strangers.pem")
+            self.assert_ended(self.ask_agent("disks"), 0)
+
+    def test_trusts_only_the_agent_that_it_asks_for(self):
+        self.start()
+        agent = f"the certificate of the agent on 127.0.0.1:{self.port} "
+        self.assert_ended(self.ask_as("operator", "disks", ca="strangers"), 3, agent + "is not of the CA strangers.pem")
+        self.assert_ended(self.kovactl("--agent", self.address, "disks"), 3, agent + "is of no CA that this host trusts")
+        self.address = f"tls:localhost:{self.port}"
+        self.assert_ended(self.ask_as("operator", "disks"), 0)
+        for name, names, told in (("other", "DNS:other.example,IP:127.0.0.2", "is not for '127.0.0.1'"),
+                                  ("expired", "IP:127.0.0.1", "certificate has expired")):
+            with self.subTest(certificate=name):
+                self.issue(name, "ca", "/CN=127.0.0.1", "subjectAltName=" + names,
+                           days="-1" if name == "expired" else "2")
+                self.socket = self.path(name + ".sock")
+                self.start(*self.tls_of(name))
+                self.assert_ended(self.ask_as("operator", "disks"), 3, told)
+
+    def test_says_what_an_agent_has_against_its_certificate(self):
+        self.start()
+        self.issue("forged", "strangers", "/CN=operator")
+        self.issue("expired", "ca", "/CN=operator", days="-1")
+        for certificate in ("forged", "expired"):
+            refused = self.ask_as(certificate, "claim")
+            self.assert_ended(refused, 3, certificate + ".pem")
+            self.assertIn("refuse", refused.err)
+
+    def test_says_that_an_agent_wants_a_certificate(self):
+        with subprocess.Popen(["openssl", "s_server", "-accept", "127.0.0.1:0", "-cert", "server.pem", "-key",
+                               "server.key", "-CAfile", "ca.pem", "-Verify", "1", "-verify_return_error", "-tls1_2"],
+                              cwd=self.folder, stdin=subprocess.PIPE, stdout=subprocess.PIPE,
+                              stderr=subprocess.DEVNULL, text=True) as server:
+            self.addCleanup(self.end, server)
+            line = next(line for line in server.stdout if line.startswith("ACCEPT"))
+            self.address = "tls:" + line.split()[1]
+            self.assert_ended(self.ask_as(None, "disks"), 3, "wants a certificate")
+            server.kill()
+
+    def test_says_which_side_does_not_speak_tls(self):
+        NetworkTest.start(self)
+        self.address = f"tls:127.0.0.1:{self.port}"
+        self.assert_ended(self.ask_as("operator", "disks"), 3, "does not speak TLS")
+        self.socket = self.path("second.sock")
+        self.start()
+        self.assert_ended(self.kovactl("--agent", f"tcp:127.0.0.1:{self.port}", "disks"), 3, "its address is tls:")
+
+    def test_takes_files_that_go_together(self):
+        self.address = "tls:127.0.0.1:1"
+        self.assert_ended(self.ask_as("operator", "disks"), 3, "no agent answers on 127.0.0.1:1")
+        for arguments, told in ((("--cert", "operator.pem"), "--key"),
+                                (("--key", "operator.key"), "--cert"),
+                                (("--cert", "operator.pem", "--key", "monitor.key"),
+                                 "monitor.key: it is not that of the certificate operator.pem"),
+                                (("--cert", "none.pem", "--key", "monitor.key"), "none.pem"),
+                                (("--ca", "none.pem"), "none.pem"),
+                                (("--agent", "unix:" + self.socket, "--ca", "ca.pem"), "tls:HOST:PORT"),
+                                (("--agent", "tls:127.0.0.1"), "tls:HOST:PORT"),
+                                (("--host", self.write("host.json", HOST), "--ca", "ca.pem"), "--host")):
+            with self.subTest(arguments=arguments), \
+                    unittest.mock.patch.dict(os.environ, {"KOVA_AGENT": self.address}):
+                self.assert_ended(self.kovactl(*arguments, "disks"), 2, told)
 
 
 @unittest.skipUnless(shutil.which("curl"), "curl is not installed")

@@ -178,6 +178,8 @@ def fixed_paths(schema):
                      "requestBody": {"required": True, "content": content(change)},
                      "responses": responses(answer_of(schema, "", False, True), waits=True)}},
         "/healthz": {"get": {"summary": "Whether the agent serves", "responses": {"200": {"description": "ok", **PLAIN}}}},
+        "/metrics": {"get": {"summary": "What the agent has served and what waits, in the text format of Prometheus",
+                             "responses": {"200": {"description": "Metrics", **PLAIN}}}},
     }
 
 

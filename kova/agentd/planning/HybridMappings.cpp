@@ -57,11 +57,11 @@ struct Tally {
 Tally ExtendableGroups(const std::vector<HostCtl::Kova::DiskMapping>& groups, bool allFlash,
                        const Ref<DataArray<ScsiDisk>>& disks) {
   std::vector<Planning::ExistingGroup> existing;
+  std::vector<std::string_view> ssdNames;
+  existing.reserve(groups.size());
+  ssdNames.reserve(groups.size());
   for (const HostCtl::Kova::DiskMapping& group : groups) {
     existing.push_back({.allFlash = group.allFlash, .heldBack = group.thirdFlag});
-  }
-  std::vector<std::string_view> ssdNames;
-  for (const HostCtl::Kova::DiskMapping& group : groups) {
     ssdNames.push_back(group.ssd.deviceName);
   }
   NameSet wanted(std::move(ssdNames));

@@ -29,6 +29,7 @@ Entries NewGroups(const Positions& candidates, const Roles& roles) {
 
 Entries HostGroups(const std::vector<HostGroup>& groups, bool allFlash) {
   std::vector<ExistingGroup> existing;
+  existing.reserve(groups.size());
   for (const HostGroup& group : groups) {
     existing.push_back(group.group);
   }

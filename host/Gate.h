@@ -70,6 +70,11 @@ void DemandAnswers(HostCtl::Kova::KovaInfo& kernel);
 // other groups.
 void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::Kova::KovaInfo& kernel);
 
+// A disk to be taken out that is named as one that has left: no other disk that has left may bear the same
+// UUID, as copies of one disk do, for the kernel would take out any of them, and a cache disk's group with
+// it. `place` is where the request names it. Nothing is asked about other disks.
+void DemandOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel);
+
 // A change of a simulated host that the host would not accept; `error` begins with the path.
 [[noreturn]] void RefuseChange(const std::string& error);
 

@@ -2,14 +2,15 @@
 
 #include <utility>
 
+#include "host/CautiousProvider.h"
 #include "host/HostError.h"
 #include "nox/Host.h"
 #include "otxctl/ProviderFactory.h"
 #include "otxctl/fault/CallRecorder.h"
 #include "otxctl/fault/RecordingProvider.h"
-#include "otxctl/fault/StrictProvider.h"
 #include "otxctl/sim/DefaultHost.h"
 #include "otxctl/sim/SimProvider.h"
+#include "tessa/Logger.h"
 
 namespace Host {
 
@@ -27,7 +28,7 @@ std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(const std::shared_ptr<SimH
     provider = std::make_unique<OtxCtl::Fault::RecordingProvider>(std::move(provider), options.recorder);
   }
   if (!options.bare) {
-    provider = std::make_unique<OtxCtl::Fault::StrictProvider>(std::move(provider));
+    provider = std::make_unique<CautiousProvider>(std::move(provider));
   }
   return provider;
 }
@@ -77,11 +78,19 @@ void HostRuntime::LoadHost(const RuntimeOptions& options) {
     throw HostError("--save needs a host of your own: name its file with --host");
   }
   if (options.save) {
-    _writer.emplace(options.hostFile);  // before reading: nobody else may write from here on
+    _writer.emplace(options.hostFile,
+                    options.syncFolder);  // before reading: nobody else may write from here on
   }
   _host = std::make_shared<SimHost>(DescribedHost(options));
   if (_writer) {
-    _host->SetSaver([this](const HostDescription& changed) { _writer->Save(changed); });
+    _host->SetSaver([this](const HostDescription& changed) { Save(changed); });
+  }
+}
+
+void HostRuntime::Save(const HostDescription& changed) const {
+  if (const std::optional<std::string> warning = _writer->Save(changed)) {
+    Tessa::Service::LogInternal(Tessa::Service::GetDefaultLogger(), Tessa::Service::LogLevel::Warning, "%1",
+                                *warning);
   }
 }
 

@@ -2,6 +2,8 @@
 // the plug-in itself, initialised.
 #pragma once
 
+#include <unistd.h>
+
 #include <functional>
 #include <memory>
 #include <optional>
@@ -23,10 +25,13 @@ struct RuntimeOptions {
   std::string hostFile;  // empty: the embedded example host
   // The host's description itself, instead of a file; it is never saved.
   std::optional<std::string> hostText;
-  bool save = false;       // write every change of the host back to its file
+  bool save = false;  // write every change of the host back to its file
+  // What makes a saved host last; where that fails, the default logger is warned.
+  OtxCtl::Sim::HostFileWriter::FolderSync syncFolder = &fsync;
   std::string pluginFile;  // empty: where FindPlugin finds it
   // Lets every exception of the provider through to the plug-in, which ends the process over those that no
-  // provider may throw. Otherwise these are turned into ones that it may.
+  // provider may throw. Otherwise these are turned into ones that it may, and nothing is formatted while the
+  // kernel cannot tell about its disks (CautiousProvider.h).
   bool bare = false;
   // Records every call of the provider, if set.
   std::shared_ptr<OtxCtl::Fault::CallRecorder> recorder;
@@ -47,6 +52,7 @@ class HostRuntime {
   explicit HostRuntime(const RuntimeOptions& options);
 
   void LoadHost(const RuntimeOptions& options);
+  void Save(const OtxCtl::Sim::HostDescription& changed) const;
   // Makes this the world that the plug-in finds, and takes it away again.
   void Install(const RuntimeOptions& options);
   void Uninstall() noexcept;

@@ -7,6 +7,7 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <cstdio>
 #include <filesystem>
 #include <fstream>
@@ -225,6 +226,25 @@ TEST_F(HostRuntimeTest, RecordsTheCallsOfTheProvider) {
   });
 }
 
+// The gate's own question is the first call, the plug-in's the second.
+TEST_F(HostRuntimeTest, MakesNoGroupOfADiskThatTheKernelCouldNotTellAbout) {
+  auto host =
+      AHost().WithSsd("naa.1").WithDisk("naa.2", false, [](auto& disk) { disk.local = false; }).Build();
+  host.faults = {
+      {.operation = "QueryDisks", .call = 2, .exception = "HostCtlException", .message = {}, .disk = {}}};
+  RuntimeOptions options;
+  options.hostText = WriteHostDescription(host);
+  options.pluginFile = KOVA_PLUGIN;
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+    const Answer answer =
+        service.InitializeDisks(*Testing::Mappings({Testing::MappingOf("naa.1", {"naa.2"})}));
+    EXPECT_TRUE(answer.fault);
+    EXPECT_TRUE(runtime.SimulatedHost().Snapshot().groups.empty());
+  });
+}
+
 TEST_F(HostRuntimeTest, SavesEveryChangeIfAskedTo) {
   auto options = On(AHost().WithSsd("naa.1"));
   options.save = true;
@@ -232,6 +252,26 @@ TEST_F(HostRuntimeTest, SavesEveryChangeIfAskedTo) {
     HostRuntime::Start(options).SimulatedHost().Change([](HostDescription& host) { host.name = "changed"; });
     EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile).name, "changed");
   });
+}
+
+// File and memory are one, whatever the folder does once the file is in its place.
+TEST_F(HostRuntimeTest, WarnsOfAChangeThatMayNotLastAndKeepsIt) {
+  auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
+  options.save = true;
+  options.syncFolder = [](int) {
+    errno = EIO;
+    return -1;
+  };
+  InOwnProcess(
+      [&options] {
+        HostRuntime& runtime = HostRuntime::Start(options);
+        const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+        EXPECT_FALSE(service.AddAllEligibleDisks().fault);
+        EXPECT_EQ(runtime.SimulatedHost().Snapshot().groups.size(), 1u);
+        EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile), runtime.SimulatedHost().Snapshot());
+        FlushLogs();
+      },
+      0, "may not last a power cut: Input/output error");
 }
 
 TEST_F(HostRuntimeTest, LeavesTheFileAloneUnlessAskedTo) {

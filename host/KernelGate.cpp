@@ -68,6 +68,33 @@ std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDi
                     "'; bring that disk back, or remove it from the group first");
 }
 
+bool IsCalled(const HostCtl::Kova::DiskResult& record, const std::string& name) {
+  return record.name.empty() && AbsentName(record.kovaUuid) == name;
+}
+
+bool IsInGroup(const HostCtl::Kova::DiskResult& record) {
+  return record.state == HostCtl::Kova::DiskState::InUse ||
+         record.reason == HostCtl::Kova::DiskReason::GroupNotMounted;
+}
+
+bool IsCalled(const HostCtl::Kova::DiskName& disk, const std::string& name) {
+  return disk.deviceName.empty() && AbsentName(disk.kovaUuid) == name;
+}
+
+// How many absent disks are called that. Groups may hold disks that are not among the records, so whichever
+// way finds more of them counts.
+std::ptrdiff_t CountCalled(const std::string& name, const std::vector<HostCtl::Kova::DiskResult>& records,
+                           const std::vector<HostCtl::Kova::DiskMapping>& groups) {
+  const auto isCalled = [&name](const auto& disk) { return IsCalled(disk, name); };
+  const auto isLoose = [&name](const auto& record) { return IsCalled(record, name) && !IsInGroup(record); };
+  std::ptrdiff_t ofGroups = std::count_if(records.begin(), records.end(), isLoose);
+  for (const HostCtl::Kova::DiskMapping& group : groups) {
+    ofGroups += isCalled(group.ssd) ? 1 : 0;
+    ofGroups += std::count_if(group.capacityDisks.begin(), group.capacityDisks.end(), isCalled);
+  }
+  return std::max(std::count_if(records.begin(), records.end(), isCalled), ofGroups);
+}
+
 // Runs what asks the kernel. When the kernel fails, that is a SystemError with both texts.
 template <class Work>
 void AskOrFail(const char* what, Work ask) {
@@ -115,10 +142,26 @@ void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::K
     std::vector<HostCtl::Kova::DiskMapping> groups;
     kernel.GetDiskMappings(groups, true);
     const auto isHead = [&name](const HostCtl::Kova::DiskMapping& group) {
-      return group.ssd.deviceName.empty() && AbsentName(group.ssd.kovaUuid) == name;
+      return IsCalled(group.ssd, name);
     };
     if (std::none_of(groups.begin(), groups.end(), isHead)) {
       Refuse("mapping.ssd", "no disk group of this host has the absent cache disk '" + name + "'");
+    }
+  });
+}
+
+void DemandOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel) {
+  if (!HasAbsentPrefix(name)) {
+    return;
+  }
+  AskOrFail("Which disks have left the host could not be found out: ", [&] {
+    std::vector<HostCtl::Kova::DiskResult> records;
+    kernel.QueryDisks({}, records, true);
+    std::vector<HostCtl::Kova::DiskMapping> groups;
+    kernel.GetDiskMappings(groups, true);
+    if (CountCalled(name, records, groups) > 1) {
+      Refuse(place, "more than one disk that has left this host is called '" + name +
+                        "'; bring the one that is meant back, and name it by its own name");
     }
   });
 }

@@ -156,6 +156,7 @@ Answer KovaService::UnmountDiskMapping(const MappingList& mappings) const {
 Answer KovaService::RemoveDisk(const std::string& disk, const RemovalArguments& arguments) const {
   return Guarded([&] {
     Gate::CheckRemoval(disk, arguments);
+    Gate::DemandOneIfAbsent("disk", disk, *Kernel());
     return Ask([&](std::string& faultText, std::string&) {
       _hooks.removeDisks(disk, arguments.passThrough, arguments.optionText, arguments.optionFirst,
                          arguments.optionSecond, faultText);
@@ -167,7 +168,9 @@ Answer KovaService::RemoveDiskMapping(const DiskMapping& mapping, const RemovalA
   return Guarded([&] {
     Gate::CheckRemovalArguments(arguments);
     const Ref<DiskMapping> admitted = Gate::AdmitGroup(mapping, KnownDisks::Now());
-    Gate::DemandGroupIfAbsent(*admitted, *Kernel());
+    const auto kernel = Kernel();
+    Gate::DemandGroupIfAbsent(*admitted, *kernel);
+    Gate::DemandOneIfAbsent("mapping.ssd", admitted->GetSsd()->GetCanonicalName(), *kernel);
     const std::string text = ToText(*admitted);
     return Ask([&](std::string& faultText, std::string&) {
       _hooks.removeDiskMapping(text, arguments.passThrough, arguments.optionText, arguments.optionFirst,

@@ -248,6 +248,48 @@ TEST_F(KovaServiceChanges, RemovesAGroupByAnAbsentDiskOnlyIfThatIsItsCacheDisk) 
   EXPECT_THAT(heard, ElementsAre("remove group kova:uuid-of-naa.1!<>   0 0"));
 }
 
+// Copies of a disk bear its UUID. Of those that have left the kernel would take out any.
+TEST_F(KovaServiceChanges, RemovesNoAbsentDiskThatCouldBeAnother) {
+  _host->Change([](HostDescription& host) {
+    for (OtxCtl::Sim::HostDisk& disk : host.disks) {
+      disk.kovaUuid = "same";
+      disk.absent = true;
+    }
+    host.disks[1].absent = false;
+  });
+  const std::string both = "kova:same";
+  EXPECT_THAT(Told(_service.RemoveDisk(both, {}).fault.Get()), StartsWith("disk | disk: more than one disk"));
+  EXPECT_THAT(Told(_service.RemoveDiskMapping(*MappingOf(both, {}), {}).fault.Get()),
+              StartsWith("mapping.ssd | mapping.ssd: more than one disk"));
+  _host->Change([](HostDescription& host) { host.disks[0].inKernel = host.disks[2].inKernel = false; });
+  EXPECT_THAT(Told(_service.RemoveDisk(both, {}).fault.Get()), StartsWith("disk | "))
+      << "both in their group, which is all that the kernel knows of them";
+  _host->Change([](HostDescription& host) {
+    host.disks[1].absent = true;
+    host.disks[2].absent = false;
+  });
+  EXPECT_THAT(Told(_service.RemoveDisk(both, {}).fault.Get()), StartsWith("disk | "))
+      << "one in a group and one in none";
+  EXPECT_THAT(heard, IsEmpty());
+  _host->Change([](HostDescription& host) { host.disks[1].absent = false; });
+  _service.RemoveDisk(both, {});
+  _service.RemoveDiskMapping(*MappingOf(both, {}), {});
+  EXPECT_EQ(heard.size(), 2u) << "one is absent: disks that are there have names of their own";
+}
+
+TEST_F(KovaServiceChanges, RemovesNoAbsentDiskWhileTheKernelCannotBeAsked) {
+  for (const char* operation : {"GetDiskMappings", "QueryDisks"}) {
+    _host->Change([operation](HostDescription& host) {
+      host.faults = {
+          {.operation = operation, .exception = "HostCtlException", .message = "busy", .disk = {}}};
+    });
+    EXPECT_THAT(Told(_service.RemoveDisk("kova:uuid-of-naa.3", {}).fault.Get()), HasSubstr("busy"));
+  }
+  EXPECT_THAT(heard, IsEmpty());
+  _service.RemoveDisk("naa.3", {});
+  EXPECT_EQ(heard.size(), 1u) << "nothing is asked about disks that are called by their own names";
+}
+
 TEST_F(KovaServiceChanges, AnswersAnExceptionOfAHookByASystemErrorWithItsText) {
   PluginHooks hooks = Listeners();
   hooks.addAllEligibleDisks = [](const std::string&, std::string&, std::string&) {

@@ -48,8 +48,11 @@ ExitStatus RunHostImport(const ImportOptions& options, std::istream& in, std::os
                                  {.hostName = options.name, .minimumDiskBytes = options.minimumDiskBytes});
     description = OtxCtl::Sim::WriteHostDescription(host);
     if (!options.output.empty()) {
-      OtxCtl::Sim::HostFileWriter(options.output).Save(host);
+      const std::optional<std::string> warning = OtxCtl::Sim::HostFileWriter(options.output).Save(host);
       out << "Wrote " << options.output << ": " << Count(host.disks.size(), "disk") << ".\n";
+      if (warning) {
+        out << "Warning: " << *warning << ".\n";
+      }
       return ExitStatus::Done;
     }
   } catch (const HostDescriptionError& refused) {

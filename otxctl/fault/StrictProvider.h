@@ -13,7 +13,7 @@
 
 namespace OtxCtl::Fault {
 
-class StrictProvider final : public HostCtl::Kova::KovaInfo {
+class StrictProvider : public HostCtl::Kova::KovaInfo {
  public:
   explicit StrictProvider(std::unique_ptr<HostCtl::Kova::KovaInfo> target);
 

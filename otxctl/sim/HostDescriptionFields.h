@@ -25,7 +25,7 @@ struct Rule {
 
 constexpr std::int32_t kLargest32 = std::numeric_limits<std::int32_t>::max();
 constexpr std::int32_t kSmallest32 = std::numeric_limits<std::int32_t>::min();
-constexpr std::int64_t kLongestDelayMs = 60 * 60 * 1000;
+constexpr std::int64_t kLongestDelayMs = 10 * 60 * 1000;  // also of all faults of one operation together
 
 constexpr Rule Between(std::int64_t least, std::int64_t most) {
   Rule rule;

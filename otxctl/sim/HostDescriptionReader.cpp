@@ -244,12 +244,30 @@ class ReferenceCheck {
   std::unordered_map<std::string_view, std::string> _members;
 };
 
+// Delays that fit the same call add up, so those of one operation are bounded together: whoever waits for a
+// host must get to the end of it.
+void CheckDelays(const std::vector<Fault::FaultRule>& faults) {
+  std::unordered_map<std::string_view, std::int64_t> totals;
+  for (std::size_t index = 0; index < faults.size(); ++index) {
+    std::int64_t& total = totals[faults[index].operation];
+    total += faults[index].delayMs;
+    if (total > Fields::kLongestDelayMs) {
+      const Place root;
+      const Place list{&root, "faults"};
+      const Place fault{&list, {}, index};
+      Refuse(Place{&fault, "delayMs"}, "the delays of " + faults[index].operation + " are longer than " +
+                                           std::to_string(Fields::kLongestDelayMs) + " together");
+    }
+  }
+}
+
 }  // namespace
 
 HostDescription ReadHostDescription(const json& document) {
   HostDescription host;
   Read(document, Place{}, Rule{}, host);
   ReferenceCheck(host).Run();
+  CheckDelays(host.faults);
   return host;
 }
 

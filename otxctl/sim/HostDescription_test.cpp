@@ -185,6 +185,12 @@ std::string FaultOf(const std::string& keys) {
   return R"({"faults": [{)" + keys + "}]}";
 }
 
+// Two faults of one operation.
+std::string FaultsOf(int oneDelay, int otherDelay) {
+  return R"({"faults": [{"operation": "QueryDisks", "call": 1, "delayMs": )" + std::to_string(oneDelay) +
+         R"(}, {"operation": "QueryDisks", "delayMs": )" + std::to_string(otherDelay) + "}]}";
+}
+
 class BadHostDescription : public testing::TestWithParam<BadRow> {};
 
 TEST_P(BadHostDescription, IsRefusedWithItsPath) {
@@ -263,7 +269,8 @@ const BadRow kBadRows[] = {
      "faults[0].exception"},
     {"NegativeCall", FaultOf(R"("operation": "QueryDisks", "call": -1)"), "faults[0].call"},
     {"NegativeDelay", FaultOf(R"("operation": "QueryDisks", "delayMs": -1)"), "faults[0].delayMs"},
-    {"EndlessDelay", FaultOf(R"("operation": "QueryDisks", "delayMs": 3600001)"), "faults[0].delayMs"},
+    {"EndlessDelay", FaultOf(R"("operation": "QueryDisks", "delayMs": 600001)"), "faults[0].delayMs"},
+    {"EndlessDelays", FaultsOf(300'000, 300'001), "faults[1].delayMs"},
     {"DeepNesting", std::string(100000, '['), "[0][0][0][0][0][0][0][0][0][0][0][0][0][0][0][0]"},
 };
 
@@ -288,7 +295,10 @@ TEST(HostDescription, EveryBoundHasAValidNeighbour) {
                R"("blockSize": 1, "formatVersion": 255, "verdict": {"state": 2147483647, "reason": -1})"),
            DiskWith(R"("blockSize": 2147483647, "partitions": 0, "verdict": null)"),
            std::string(R"({"minimumDiskBytes": 9223372036854775807, "otherLuns": []})"),
-           FaultOf(R"("operation": "QueryDisks", "delayMs": 3600000, "exception": "std::runtime_error")"),
+           FaultOf(R"("operation": "QueryDisks", "delayMs": 600000, "exception": "std::runtime_error")"),
+           FaultsOf(300'000, 300'000),
+           std::string(R"({"faults": [{"operation": "QueryDisks", "delayMs": 600000},
+                                      {"operation": "RemoveDisk", "delayMs": 600000}]})"),
            GroupsOf(R"({"ssd": "c", "capacity": ["b", "a"], "formatVersion": 0})"),
        }) {
     EXPECT_EQ(ErrorOf(text), "accepted") << text;

@@ -19,8 +19,12 @@ namespace {
 
 constexpr mode_t kNewFileMode = 0644;
 
+std::string Told(const std::string& path, const std::string& what, int error) {
+  return path + ": " + what + ": " + std::system_category().message(error);
+}
+
 [[noreturn]] void Fail(const std::string& path, const std::string& what, int error) {
-  throw HostFileError(path + ": " + what + ": " + std::system_category().message(error));
+  throw HostFileError(Told(path, what, error));
 }
 
 // Repeats a system call that a signal interrupted.
@@ -159,7 +163,8 @@ HostDescription LoadHostFile(const std::string& path) {
   }
 }
 
-HostFileWriter::HostFileWriter(const std::string& path) : _path(WithoutLinks(path)) {
+HostFileWriter::HostFileWriter(const std::string& path, FolderSync syncFolder)
+    : _path(WithoutLinks(path)), _syncFolder(syncFolder) {
   // A lock on the file itself would go with the old file at the first save.
   const std::string lockPath = _path + ".lock";
   _lock = Open(lockPath, O_RDWR | O_CREAT | O_NOFOLLOW, kNewFileMode, "cannot be opened");
@@ -172,20 +177,22 @@ HostFileWriter::HostFileWriter(const std::string& path) : _path(WithoutLinks(pat
   Fail(lockPath, "cannot be locked", errno);
 }
 
-void HostFileWriter::Save(const HostDescription& host) const {
+std::optional<std::string> HostFileWriter::Save(const HostDescription& host) const {
   std::string text;
   try {
     text = WriteHostDescription(host);
   } catch (const HostDescriptionError& error) {
     throw HostFileError(_path + ": " + error.what());
   }
+  // Before anything is done: behind the renaming nothing may fail.
+  const FileDescriptor folder = Open(FolderOf(_path), O_RDONLY | O_DIRECTORY, 0, "cannot be opened");
   NewFile file(_path);
   file.Write(text);
   file.Place();
-  const FileDescriptor folder = Open(FolderOf(_path), O_RDONLY | O_DIRECTORY, 0, "cannot be opened");
-  if (fsync(folder.Get()) != 0) {
-    Fail(_path, "was saved, but may not last a power cut", errno);
+  if (Uninterrupted([&] { return _syncFolder(folder.Get()); }) != 0) {
+    return Told(_path, "was saved, but may not last a power cut", errno);
   }
+  return std::nullopt;
 }
 
 }  // namespace OtxCtl::Sim

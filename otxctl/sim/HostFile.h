@@ -3,6 +3,9 @@
 // Threads: one thread at a time. Every error is a HostFileError whose text names the file.
 #pragma once
 
+#include <unistd.h>
+
+#include <optional>
 #include <stdexcept>
 #include <string>
 
@@ -43,16 +46,24 @@ HostDescription LoadHostFile(const std::string& path);
 // made for that file.
 class HostFileWriter {
  public:
+  // Makes the entries of an open folder last, as fsync does and tells it.
+  using FolderSync = int (*)(int folder);
+
   // Locks PATH.lock beside the file, which need not exist yet. A link is followed: what it points to is
   // locked and saved.
-  explicit HostFileWriter(const std::string& path);
+  explicit HostFileWriter(const std::string& path, FolderSync syncFolder = &fsync);
 
   // Replaces the file: written beside it, made durable, then renamed over it. If that fails, the old file
   // stands as it was and nothing is left behind.
-  void Save(const HostDescription& host) const;
+  //
+  // From the renaming on, the new file is the host, for every program that reads it. A folder that then fails
+  // to make the new name last takes nothing of that back, so it is no error: the warning that is returned
+  // says that a power cut may bring the old file back. The next save that has none covers this one as well.
+  [[nodiscard]] std::optional<std::string> Save(const HostDescription& host) const;
 
  private:
   std::string _path;
+  FolderSync _syncFolder;
   FileDescriptor _lock;
 };
 

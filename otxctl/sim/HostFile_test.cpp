@@ -4,11 +4,14 @@
 #include <gtest/gtest.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include <cerrno>
 #include <csignal>
 #include <cstdlib>
 #include <filesystem>
 #include <fstream>
+#include <tuple>
 
 #include "otxctl/sim/HostBuilder.h"
 
@@ -59,15 +62,15 @@ class HostFileTest : public testing::Test {
 
 TEST_F(HostFileTest, LoadsWhatItSaved) {
   const HostDescription host = AHost().WithSsd("naa.1").WithHdd("naa.2").Build();
-  HostFileWriter(_path).Save(host);
+  EXPECT_EQ(HostFileWriter(_path).Save(host), std::nullopt);
   EXPECT_EQ(LoadHostFile(_path), host);
   EXPECT_THAT(FilesInFolder(), UnorderedElementsAre("host.json", "host.json.lock"));
 }
 
 TEST_F(HostFileTest, SavesAgainAndAgain) {
   const HostFileWriter writer(_path);
-  writer.Save(AHost().WithSsd("naa.1").Build());
-  writer.Save(AHost().WithSsd("naa.2").Build());
+  EXPECT_EQ(writer.Save(AHost().WithSsd("naa.1").Build()), std::nullopt);
+  EXPECT_EQ(writer.Save(AHost().WithSsd("naa.2").Build()), std::nullopt);
   EXPECT_EQ(LoadHostFile(_path).disks.at(0).name, "naa.2");
 }
 
@@ -103,7 +106,7 @@ TEST_F(HostFileTest, ASecondWriterIsKeptOutUntilTheFirstIsGone) {
 
 TEST_F(HostFileTest, TheLockOutlivesSaving) {
   const HostFileWriter first(_path);
-  first.Save(AHost().Build());
+  EXPECT_EQ(first.Save(AHost().Build()), std::nullopt);
   EXPECT_THAT(ErrorOf([this] { HostFileWriter second(_path); }), HasSubstr("another program"));
 }
 
@@ -136,14 +139,14 @@ class FileSizeLimit {
 TEST_F(HostFileTest, ReplacesWhatAKilledWriterLeftBehind) {
   std::ofstream(_path + ".new") << "half of a host";
   const HostDescription host = AHost().WithSsd("naa.1").Build();
-  HostFileWriter(_path).Save(host);
+  EXPECT_EQ(HostFileWriter(_path).Save(host), std::nullopt);
   EXPECT_EQ(LoadHostFile(_path), host);
   EXPECT_THAT(FilesInFolder(), UnorderedElementsAre("host.json", "host.json.lock"));
 }
 TEST_F(HostFileTest, AFailedSaveLeavesTheOldFileAndNothingElse) {
   const HostDescription old = AHost().WithSsd("naa.1").Build();
   const HostFileWriter writer(_path);
-  writer.Save(old);
+  EXPECT_EQ(writer.Save(old), std::nullopt);
   HostBuilder large;
   for (int number = 0; number < 100; ++number) {
     large.WithHdd("naa." + std::to_string(number));
@@ -151,26 +154,68 @@ TEST_F(HostFileTest, AFailedSaveLeavesTheOldFileAndNothingElse) {
   std::string error;
   {
     const FileSizeLimit limit(1000);
-    error = ErrorOf([&] { writer.Save(large.Build()); });
+    error = ErrorOf([&] { std::ignore = writer.Save(large.Build()); });
   }
   EXPECT_THAT(error, AllOf(StartsWith(_path + ": cannot be saved"), HasSubstr("large")));
   EXPECT_EQ(LoadHostFile(_path), old);
   EXPECT_THAT(FilesInFolder(), UnorderedElementsAre("host.json", "host.json.lock"));
 }
 
+// A folder whose entries cannot be made to last, at the first `folderFailures` calls.
+int folderFailures = 0;
+int folderError = 0;
+
+int FailingSync(int folder) {
+  if (folderFailures-- > 0) {
+    errno = folderError;
+    return -1;
+  }
+  return fsync(folder);
+}
+
+TEST_F(HostFileTest, AFileInItsPlaceIsSavedThoughAPowerCutMayUndoIt) {
+  const HostFileWriter writer(_path, &FailingSync);
+  EXPECT_EQ(writer.Save(AHost().WithSsd("naa.1").Build()), std::nullopt);
+  folderFailures = 1;
+  folderError = EIO;
+  EXPECT_EQ(writer.Save(AHost().WithSsd("naa.2").Build()),
+            _path + ": was saved, but may not last a power cut: Input/output error");
+  EXPECT_EQ(LoadHostFile(_path).disks.at(0).name, "naa.2");
+  EXPECT_THAT(FilesInFolder(), UnorderedElementsAre("host.json", "host.json.lock"));
+  EXPECT_EQ(writer.Save(AHost().WithSsd("naa.3").Build()), std::nullopt) << "the next save covers both";
+}
+
+TEST_F(HostFileTest, ASignalWhileTheFolderIsMadeToLastIsNoFailure) {
+  const HostFileWriter writer(_path, &FailingSync);
+  folderFailures = 3;
+  folderError = EINTR;
+  EXPECT_EQ(writer.Save(AHost().Build()), std::nullopt);
+  EXPECT_LT(folderFailures, 0) << "it was asked again until it had been done";
+}
+
+// The folder is looked for before the file is put in its place: there is no turning back from that.
+TEST_F(HostFileTest, AFolderThatIsGoneLeavesNothingSaved) {
+  std::filesystem::create_directory(_folder / "inner");
+  const HostFileWriter writer(_folder / "inner" / "host.json");
+  std::filesystem::remove_all(_folder / "inner");
+  EXPECT_THAT(ErrorOf([&] { std::ignore = writer.Save(AHost().Build()); }),
+              HasSubstr("inner: cannot be opened"));
+  EXPECT_THAT(FilesInFolder(), testing::IsEmpty());
+}
+
 TEST_F(HostFileTest, AHostThatCannotBeWrittenLeavesTheOldFile) {
   const HostFileWriter writer(_path);
-  writer.Save(AHost().Build());
+  EXPECT_EQ(writer.Save(AHost().Build()), std::nullopt);
   HostDescription bad;
   bad.name = "\xFF";
-  EXPECT_THAT(ErrorOf([&] { writer.Save(bad); }), StartsWith(_path + ": "));
+  EXPECT_THAT(ErrorOf([&] { std::ignore = writer.Save(bad); }), StartsWith(_path + ": "));
   EXPECT_EQ(LoadHostFile(_path), HostDescription());
 }
 
 TEST_F(HostFileTest, SavingKeepsThePermissionsOfTheFile) {
   Put("{}");
   std::filesystem::permissions(_path, std::filesystem::perms(0640));
-  HostFileWriter(_path).Save(AHost().Build());
+  EXPECT_EQ(HostFileWriter(_path).Save(AHost().Build()), std::nullopt);
   EXPECT_EQ(std::filesystem::status(_path).permissions(), std::filesystem::perms(0640));
 }
 
@@ -179,7 +224,7 @@ TEST_F(HostFileTest, ALinkStaysALink) {
   const std::string target = _folder / "real" / "host.json";
   std::ofstream(target) << "{}";
   std::filesystem::create_symlink(target, _path);
-  HostFileWriter(_path).Save(AHost().WithSsd("naa.1").Build());
+  EXPECT_EQ(HostFileWriter(_path).Save(AHost().WithSsd("naa.1").Build()), std::nullopt);
   EXPECT_TRUE(std::filesystem::is_symlink(_path));
   EXPECT_EQ(LoadHostFile(target).disks.size(), 1U);
 }

@@ -266,7 +266,11 @@ bool SimRules::RemoveDiskMapping(const std::string& ssd) {
 
 // Automatic claiming does not matter here: a disk that has left is not claimed again.
 bool SimRules::RemoveDiskByUuid(const std::string& kovaUuid) {
-  const auto isMeant = [&kovaUuid](const HostDisk& disk) { return disk.absent && disk.kovaUuid == kovaUuid; };
+  // A disk that the kernel neither lists nor has in a group is unknown to it.
+  const auto isMeant = [&](const HostDisk& disk) {
+    const bool isKnown = disk.inKernel || _groupOfDisk[static_cast<Index>(&disk - _host.disks.data())];
+    return disk.absent && isKnown && disk.kovaUuid == kovaUuid;
+  };
   const auto found = std::find_if(_host.disks.begin(), _host.disks.end(), isMeant);
   if (kovaUuid.empty() || found == _host.disks.end()) {
     Refuse<KovaStorageException>(kovaUuid, "is no absent disk");

@@ -260,6 +260,25 @@ TEST(SimRules, AnAbsentDiskInNoGroupIsForgottenByItsIdentity) {
   EXPECT_EQ(RecordAt(rules, 0).kovaUuid, "");
 }
 
+TEST(SimRules, AnAbsentDiskThatTheKernelDoesNotKnowIsNoneOfThatIdentity) {
+  const auto leave = [](HostDisk& disk) {
+    disk.absent = true;
+    disk.inKernel = false;
+    disk.kovaUuid = "uuid-of-naa.3";
+  };
+  SimRules unknown(AHost().WithDisk("naa.1", false, leave).Build());
+  EXPECT_THROW(unknown.RemoveDiskByUuid("uuid-of-naa.3"), HostCtl::Lib::KovaStorageException);
+  SimRules known(AHost()
+                     .WithDisk("naa.1", false, leave)
+                     .WithSsd("naa.2")
+                     .WithDisk("naa.3", false, leave)
+                     .WithHdd("naa.4")
+                     .WithGroup("naa.2", {"naa.3", "naa.4"})
+                     .Build());
+  EXPECT_TRUE(known.RemoveDiskByUuid("uuid-of-naa.3")) << "its group lists it";
+  EXPECT_EQ(GroupsOf(known).at(0).capacityDisks.size(), 1U);
+}
+
 TEST(SimRules, SayWhetherAnythingChanged) {
   SimRules rules(AHost().WithSsd("naa.1").WithHdd("naa.2").WithGroup("naa.1", {"naa.2"}).Build());
   EXPECT_FALSE(rules.MountDiskMapping("naa.1"));

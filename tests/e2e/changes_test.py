@@ -247,8 +247,8 @@ class Changes:
         self.assertEqual(self.done("sim", "show").out, before)
 
     def test_plans_with_the_faults_that_would_come_but_waits_for_none(self):
-        self.use({**HOST, "faults": [{"operation": "RefreshKovaInfo", "delayMs": 3600000},
-                                     {"operation": "FormatDiskMapping", "call": 1, "delayMs": 3600000,
+        self.use({**HOST, "faults": [{"operation": "RefreshKovaInfo", "delayMs": 600000},
+                                     {"operation": "FormatDiskMapping", "call": 1, "delayMs": 600000,
                                       "exception": "KovaExceptionHasPartition", "disk": "naa.h1"}]})
         plan = self.plan("-o", "json", "add", "--all", status=1).json()
         self.assertEqual([group["change"] for group in plan["groups"]], ["made", "failed"])

@@ -3,10 +3,12 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <random>
 #include <string>
 #include <vector>
 
+#include "kova/agentd/query/NameSet.h"
 #include "nox/Host.h"
 #include "tests/support/Builders.h"
 
@@ -107,6 +109,55 @@ TEST(DiskInventory, IsMadeOfAListWithUnnamedDisksWithoutComplaint) {
   EXPECT_NO_THROW(DiskInventory(AnInventory({nullptr, AScsiDisk("x").Unnamed()})));
 }
 
+// ---- an inventory for some names only
+
+class InventoryOfSomeNames : public testing::Test {
+ protected:
+  // The disk that an inventory for `names` finds; the old one where it finds none.
+  Ref<ScsiDisk> Find(const std::string& name, const std::vector<Ref<ScsiDisk>>& disks,
+                     const std::vector<std::string>& names) {
+    NameSet wanted(names);
+    Ref<ScsiDisk> disk = _old;
+    DiskInventory(AnInventory(disks), wanted).Find(name, disk);
+    return disk;
+  }
+
+  const Ref<ScsiDisk> _old = MakeRef<ScsiDisk>();
+  const Ref<ScsiDisk> _first = AScsiDisk("naa.1");
+  const Ref<ScsiDisk> _second = AScsiDisk("naa.2");
+};
+
+TEST_F(InventoryOfSomeNames, FindsTheNamedOnesInAnyOrder) {
+  EXPECT_EQ(Find("naa.1", {_first, _second}, {"naa.2", "naa.1"}), _first);
+  EXPECT_EQ(Find("naa.2", {_first, _second}, {"naa.2", "naa.1"}), _second);
+  EXPECT_EQ(Find("naa.2", {_first, _second}, {"naa.2", "naa.2"}), _second) << "named twice";
+}
+
+TEST_F(InventoryOfSomeNames, TakesTheFirstOfTwoWithOneName) {
+  EXPECT_EQ(Find("naa.1", {_first, AScsiDisk("naa.1")}, {"naa.1"}), _first);
+}
+
+TEST_F(InventoryOfSomeNames, FindsNothingBeyondTheNames) {
+  EXPECT_EQ(Find("naa.1", {_first, _second}, {"naa.2"}), _old);
+  EXPECT_EQ(Find("naa.1", {_first}, {}), _old);
+  EXPECT_EQ(Find("naa.3", {_first, _second}, {"naa.3"}), _old) << "which the inventory lacks";
+}
+
+TEST_F(InventoryOfSomeNames, FindsNothingInNoList) {
+  std::vector<std::string> names = {"naa.1"};
+  NameSet wanted(names);
+  Ref<ScsiDisk> disk = _old;
+  DiskInventory(nullptr, wanted).Find("naa.1", disk);
+  EXPECT_EQ(disk, _old);
+}
+
+TEST_F(InventoryOfSomeNames, StopsAtADiskWithoutANameAsTheWalkDoes) {
+  const std::vector<Ref<ScsiDisk>> disks = {_first, AScsiDisk("x").Unnamed(), _second};
+  EXPECT_EQ(Find("naa.1", disks, {"naa.1", "naa.2"}), _first);
+  EXPECT_THROW(Find("naa.2", disks, {"naa.1", "naa.2"}), NotInitializedException);
+  EXPECT_THROW(Find("naa.1", {nullptr, _first}, {"naa.1"}), NotInitializedException);
+}
+
 // The plain walk, written down once more and apart from the product's.
 enum class Outcome { Found, Nothing, Unnamed };
 struct Answer {
@@ -152,6 +203,15 @@ std::vector<Ref<ScsiDisk>> RandomDisks(std::mt19937& random) {
   return disks;
 }
 
+// Some of the names that are looked up, in any order, perhaps twice.
+std::vector<std::string> RandomNames(std::mt19937& random) {
+  std::vector<std::string> names(random() % 6);
+  for (std::string& name : names) {
+    name = "naa." + std::to_string(random() % 8);
+  }
+  return names;
+}
+
 TEST(DiskInventory, AnswersLikeThePlainWalkForAnyDisksAndNames) {
   const unsigned seed = std::random_device()();
   SCOPED_TRACE("seed " + std::to_string(seed));
@@ -160,11 +220,18 @@ TEST(DiskInventory, AnswersLikeThePlainWalkForAnyDisksAndNames) {
     const std::vector<Ref<ScsiDisk>> disks = RandomDisks(random);
     const auto list = AnInventory(disks);
     const DiskInventory inventory(list);
+    const std::vector<std::string> some = RandomNames(random);
+    NameSet wanted(some);
+    const DiskInventory ofSome(list, wanted);
     for (int index = 0; index < 9; ++index) {
       const std::string name = index == 8 ? "" : "naa." + std::to_string(index);
       const Answer expected = Walk(disks, name);
       ASSERT_EQ(AnswerOf([&](Ref<ScsiDisk>& disk) { inventory.Find(name, disk); }), expected)
           << "round " << round << ", name " << name << ", " << disks.size() << " disks";
+      if (std::find(some.begin(), some.end(), name) != some.end()) {
+        ASSERT_EQ(AnswerOf([&](Ref<ScsiDisk>& disk) { ofSome.Find(name, disk); }), expected)
+            << "round " << round << ", name " << name << " of " << some.size();
+      }
       ASSERT_EQ(AnswerOf([&](Ref<ScsiDisk>& disk) { GetScsiDiskFromArray(name, list, disk); }), expected)
           << "round " << round << ", name " << name << ", " << disks.size() << " disks";
     }

@@ -5,10 +5,13 @@
 
 #include <algorithm>
 #include <random>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
+#include "kova/agentd/include/HostCtlException.h"
 #include "tests/support/Builders.h"
+#include "tests/support/Matchers.h"
 #include "tests/support/RecordingLogger.h"
 
 namespace Kovasvc {
@@ -18,9 +21,11 @@ using HostCtl::Kova::DiskReason;
 using HostCtl::Kova::DiskState;
 using Tessa::MakeRef;
 using Tessa::Ref;
+using Tessa::Service::LogLevel;
 using testing::ElementsAre;
 using testing::IsEmpty;
 using TestSupport::ARecord;
+using TestSupport::LogLineIs;
 using TestSupport::RecordingLogger;
 using Records = std::vector<HostCtl::Kova::DiskResult>;
 using Names = std::vector<std::string>;
@@ -119,6 +124,38 @@ TEST_F(DiskFilter, LeavesTheListAloneWithoutRecords) {
   Records passed = {ARecord("naa.before")};
   LimitQueryDisksForKova(*_logger, {"naa.1"}, {}, {}, passed);
   EXPECT_EQ(passed.size(), 1U);
+}
+
+// Keeps every record until it meets the one that the kernel cannot tell about.
+bool FailsAtTheSecond(const HostCtl::Kova::DiskResult& record) {
+  if (record.name == "naa.1") {
+    throw HostCtl::Lib::HostCtlException("the kernel is away");
+  }
+  return true;
+}
+
+TEST_F(DiskFilter, EndsWithAWarningAtAKernelExceptionAndKeepsWhatPassedBefore) {
+  Records passed;
+  LimitQueryDisksForKova(*_logger, {}, {}, _records, passed, &FailsAtTheSecond);
+  EXPECT_THAT(passed, ElementsAre(HostCtl::Kova::DiskResult(ARecord("naa.3"))));
+  EXPECT_THAT(_logger->Lines(),
+              ElementsAre(LogLineIs(LogLevel::Warning, "%1: Error querying disks for KOVA: %2",
+                                    "LimitQueryDisksForKova",
+                                    HostCtl::Lib::HostCtlException("the kernel is away").Describe())));
+}
+
+bool IsNever(const HostCtl::Kova::DiskResult&) {
+  throw std::logic_error("asked about a record that the limit does not let through");
+}
+
+TEST_F(DiskFilter, AsksTheCallersTestOnlyAboutWhatPassesTheLimit) {
+  Records passed;
+  LimitQueryDisksForKova(*_logger, {"naa.9"}, {}, _records, passed, &IsNever);
+  LimitQueryDisksForKova(*_logger, {"naa.1"}, {.byState = true}, _records, passed, &IsNever);
+  LimitQueryDisksForKova(*_logger, {"naa.4"}, {.byReason = true}, _records, passed, &IsNever);
+  EXPECT_THAT(passed, IsEmpty());
+  EXPECT_THROW(LimitQueryDisksForKova(*_logger, {"naa.3"}, {}, _records, passed, &IsNever), std::logic_error)
+      << "other exceptions are the caller's";
 }
 
 // The filter, written down once more as plain walks and apart from the product's.

@@ -5,7 +5,6 @@
 #pragma once
 
 #include <cstddef>
-#include <cstring>
 #include <string>
 #include <string_view>
 
@@ -31,8 +30,7 @@ class GrowingText {
 
  private:
   void Copy(std::string_view part) {
-    std::memcpy(_end, part.data(), part.size());
-    _end += part.size();
+    _end += part.copy(_end, part.size());
   }
   void Grow(std::size_t wanted);
 

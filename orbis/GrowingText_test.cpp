@@ -11,7 +11,7 @@ TEST(GrowingText, LeavesWhatTheStringHeldAndThePartsInTheirOrder) {
   std::string out = "before ";
   {
     GrowingText text(out, 100);
-    text.Append("a", std::string("bc"), "", std::string_view("d"));
+    text.Append("a", std::string("bc"), "", std::string_view(), std::string_view("d"));
     text.Append("e");
   }
   EXPECT_EQ(out, "before abcde");

@@ -29,9 +29,7 @@ class GrowingText {
   }
 
  private:
-  void Copy(std::string_view part) {
-    _end += part.copy(_end, part.size());
-  }
+  void Copy(std::string_view part) { _end += part.copy(_end, part.size()); }
   void Grow(std::size_t wanted);
 
   std::string& _out;

@@ -33,15 +33,15 @@ DiskInventory::DiskInventory(Ref<DataArray<ScsiDisk>> disks) : _disks(std::move(
   if (_disks) {
     _named.reserve(_disks->Size());
   }
-  Index([](const std::string&) { return true; });
+  Index(_disks ? _disks->Size() : 0, [](const std::string&) { return true; });
 }
 
 DiskInventory::DiskInventory(Ref<DataArray<ScsiDisk>> disks, NameSet& names) : _disks(std::move(disks)) {
-  Index([&names](const std::string& name) { return names.Contains(name); });
+  Index(names.Size(), [&names](const std::string& name) { return names.Contains(name); });
 }
 
 template <class IsWanted>
-void DiskInventory::Index(IsWanted isWanted) {
+void DiskInventory::Index(std::size_t most, IsWanted isWanted) {
   if (!_disks) {
     return;
   }
@@ -53,6 +53,9 @@ void DiskInventory::Index(IsWanted isWanted) {
     const std::string& name = disk->GetCanonicalName();
     if (isWanted(name)) {
       _named.emplace(name, disk);  // of two with one name the first counts
+      if (_named.size() == most) {
+        return;
+      }
     }
   }
 }

@@ -1,6 +1,7 @@
 // Finding disks of the agent's inventory by canonical name.
 #pragma once
 
+#include <cstddef>
 #include <memory_resource>
 #include <string>
 #include <string_view>
@@ -26,15 +27,16 @@ void GetScsiDiskFromArray(const std::string& canonicalName,
 class DiskInventory {
  public:
   explicit DiskInventory(Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> disks);
-  // For look-ups of these names only; cheaper when they are few.
+  // For look-ups of these names only; cheaper when they are few, or stand in front.
   DiskInventory(Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> disks, NameSet& names);
   ~DiskInventory();
 
   void Find(const std::string& canonicalName, Tessa::Ref<Nox::Host::ScsiDisk>& disk) const;
 
  private:
+  // `most`: names that are wanted at most. The walk ends when it has as many, like a search at its match.
   template <class IsWanted>
-  void Index(IsWanted isWanted);
+  void Index(std::size_t most, IsWanted isWanted);
 
   Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> _disks;
   // Entries side by side in memory, and all freed at once.

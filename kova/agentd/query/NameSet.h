@@ -1,6 +1,7 @@
 // Looking up many names in a list of names.
 #pragma once
 
+#include <cstddef>
 #include <memory_resource>
 #include <string>
 #include <string_view>
@@ -22,6 +23,8 @@ class NameSet {
   explicit NameSet(std::vector<std::string_view> names) : _names(std::move(names)) {}
 
   bool IsEmpty() const noexcept { return _names.empty(); }
+  // Of the list: a name that stands in it twice counts twice.
+  std::size_t Size() const noexcept { return _names.size(); }
   bool Contains(std::string_view name);
 
   // Of the names that stand twice in the list the first by bytes; null when there is none.

@@ -4,11 +4,10 @@
 #include <gtest/gtest.h>
 #include <netinet/in.h>
 
-#include <cstdlib>
-#include <filesystem>
 #include <stdexcept>
 
 #include "agentd/http/HttpClient.h"
+#include "agentd/testing/Certificates.h"
 #include "agentd/testing/RawClient.h"
 #include "agentd/testing/RunningServer.h"
 
@@ -159,23 +158,17 @@ TEST(HttpServerTcp, AClientThatWaitsToBeToldLearnsThatItsBodyIsTooLarge) {
 }
 
 TEST(HttpServerTls, AClientThatNeverAgreesOnTheSecretsIsGivenUp) {
-  const std::string folder = testing::TempDir() + "kova-tls-" + std::to_string(getpid());
-  std::filesystem::create_directory(folder);
-  const std::string make =
-      "openssl req -x509 -newkey ec -pkeyopt ec_paramgen_curve:P-256 -nodes -days 1 -subj /CN=a "
-      "-keyout " +
-      folder + "/key -out " + folder + "/cert >/dev/null 2>&1";
-  ASSERT_EQ(std::system(make.c_str()), 0);
+  const Testing::Certificates certificates;
+  certificates.MakeCa("a");
   RunningServer server({.listen = {anyPort},
                         .limits = {.readTime = std::chrono::milliseconds(50)},
-                        .tls = TlsFiles{folder + "/cert", folder + "/key", folder + "/cert"}},
+                        .tls = certificates.ServerFiles("a", "a")},
                        &Testing::Echo);
   RawClient silent(server.Address());
   EXPECT_TRUE(silent.IsClosed());
   RawClient plain(server.Address());
   plain.Send("GET / HTTP/1.1\r\nHost: localhost\r\n\r\n");
   EXPECT_EQ(plain.Receive().status, 0u);
-  std::filesystem::remove_all(folder);
 }
 
 }  // namespace

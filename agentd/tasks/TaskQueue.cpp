@@ -119,7 +119,12 @@ std::vector<Task> TaskQueue::List() const {
 
 TaskQueue::Load TaskQueue::Now() const {
   const std::lock_guard guard(_mutex);
-  return {.waiting = _waiting.size(), .running = _running, .done = _done, .failed = _failed};
+  const auto isRunning = [](const auto& entry) { return entry->task.state == TaskState::Running; };
+  const auto running = std::count_if(_entries.begin(), _entries.end(), isRunning);
+  return {.waiting = _waiting.size(),
+          .running = static_cast<std::size_t>(running),
+          .done = _done,
+          .failed = _failed};
 }
 
 void TaskQueue::Close() {
@@ -146,7 +151,6 @@ void TaskQueue::RunAll() {
   while (const std::shared_ptr<Entry> entry = NextWaiting(lock)) {
     entry->task.state = TaskState::Running;
     entry->task.started = _clock();
-    _running = 1;
     lock.unlock();
     Run(*entry);
     lock.lock();
@@ -192,7 +196,6 @@ void TaskQueue::End(Entry& entry, Host::Answer answer) {
     const std::lock_guard guard(_mutex);
     entry.task.state = answer.fault ? TaskState::Failed : TaskState::Done;
     ++(answer.fault ? _failed : _done);
-    _running -= entry.task.started ? 1 : 0;
     entry.task.ended = _clock();
     entry.task.answer = std::move(answer);
     entry.work = {};  // and what it holds of the request

@@ -94,7 +94,6 @@ class TaskQueue {
   std::size_t _created = 0;
   std::size_t _done = 0;
   std::size_t _failed = 0;
-  std::size_t _running = 0;
   std::size_t _waitingBytes = 0;
   std::size_t _resultBytes = 0;  // of all entries
   bool _closed = false;

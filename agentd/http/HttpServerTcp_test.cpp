@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 #include <netinet/in.h>
 
+#include <filesystem>
 #include <stdexcept>
 
 #include "agentd/http/HttpClient.h"

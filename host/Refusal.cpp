@@ -7,12 +7,16 @@ namespace Host {
 using Orbis::Fault::InvalidArgument;
 using Tessa::MakeRef;
 
+void Explain(Orbis::MethodFault& fault, const char* key, const std::string& text) {
+  const auto message = MakeRef<Orbis::LocalizableMessage>();
+  message->SetKey(key);
+  message->SetMessage(text);
+  fault.GetFaultMessage()->Append(message);
+}
+
 void RefuseWith(const std::string& property, const std::string& text) {
   const auto fault = MakeRef<InvalidArgument>(property);
-  const auto message = MakeRef<Orbis::LocalizableMessage>();
-  message->SetKey("nox.agentd.gate.invalidArgument");
-  message->SetMessage(text);
-  fault->GetFaultMessage()->Append(message);
+  Explain(*fault, invalidArgumentKey, text);
   throw InvalidArgument::Exception(fault);
 }
 

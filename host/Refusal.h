@@ -6,7 +6,17 @@
 
 #include <string>
 
+namespace Orbis {
+class MethodFault;
+}
+
 namespace Host {
+
+// Adds a message to the fault: a key for programs, a text for people.
+void Explain(Orbis::MethodFault& fault, const char* key, const std::string& text);
+
+// For a request that names what it must not.
+inline constexpr const char* invalidArgumentKey = "nox.agentd.gate.invalidArgument";
 
 [[noreturn]] void Refuse(const std::string& property, const std::string& reason);
 

@@ -3,6 +3,7 @@
 #include <string>
 
 #include "agentd/http/Shown.h"
+#include "host/Refusal.h"
 #include "nox/Faults.h"
 #include "tessa/Logger.h"
 
@@ -12,10 +13,7 @@ namespace {
 Host::Answer NotPermitted(HttpRole role, const std::string& reason) {
   const auto fault = Tessa::MakeRef<Nox::Fault::NotPermitted>();
   fault->SetRole(std::string(NameOf(role)));
-  const auto message = Tessa::MakeRef<Orbis::LocalizableMessage>();
-  message->SetKey("nox.agentd.notPermitted");
-  message->SetMessage(reason);
-  fault->GetFaultMessage()->Append(message);
+  Host::Explain(*fault, "nox.agentd.notPermitted", reason);
   return {.result = nullptr, .fault = fault};
 }
 

@@ -3,6 +3,7 @@
 #include <array>
 #include <string>
 
+#include "host/Refusal.h"
 #include "nox/Faults.h"
 #include "nox/Operations.h"
 #include "orbis/Envelope.h"
@@ -125,10 +126,7 @@ HttpAnswer ToSoap(const Orbis::ParseException& refused) {
     return SoapFault(envelope->GetCode(), refused.what());
   }
   const auto fault = MakeRef<Orbis::Fault::InvalidArgument>(refused.GetPath());
-  const auto message = MakeRef<Orbis::LocalizableMessage>();
-  message->SetKey("nox.agentd.gate.invalidArgument");
-  message->SetMessage(refused.what());
-  fault->GetFaultMessage()->Append(message);
+  Host::Explain(*fault, Host::invalidArgumentKey, refused.what());
   return TypedFault(*fault);
 }
 

@@ -1,7 +1,7 @@
 #include "agentd/tasks/Busy.h"
 
+#include "host/Refusal.h"
 #include "nox/Faults.h"
-#include "orbis/Types.h"
 
 namespace Agentd {
 
@@ -10,10 +10,7 @@ constexpr int retryAfterSeconds = 5;
 Tessa::Ref<Nox::Fault::Busy> TooBusy(const char* key, const std::string& reason) {
   const auto fault = Tessa::MakeRef<Nox::Fault::Busy>();
   fault->SetRetryAfterSeconds(retryAfterSeconds);
-  const auto message = Tessa::MakeRef<Orbis::LocalizableMessage>();
-  message->SetKey(key);
-  message->SetMessage(reason);
-  fault->GetFaultMessage()->Append(message);
+  Host::Explain(*fault, key, reason);
   return fault;
 }
 

@@ -141,7 +141,7 @@ void TurnIntoJson(benchmark::State& state) {
 void TurnIntoMessage(benchmark::State& state) {
   const Orbis::TypeDescriptor& list = *Nox::Kova::Host::DiskResult::StaticType().array;
   TurnResults(state, [&list](const std::string& text, std::string& out) {
-    return Orbis::AppendMessageOfSoap("Response", "returnval", list, text, out);
+    return Orbis::AppendMessageOfSoap("Response", "result", list, text, out);
   });
 }
 

@@ -121,7 +121,7 @@ Query JsonQuery(const Listener& listener) {
 std::vector<Query> Queries(const Listener& listener) {
   return {{listener.name + "/bare", listener.bare, Bench::GetRequest("/"), "<item>"},
           JsonQuery(listener),
-          {listener.name + "/soap", listener.agent, SoapQuery(), "<returnval>"}};
+          {listener.name + "/soap", listener.agent, SoapQuery(), "<result>"}};
 }
 
 std::size_t CountOf(const std::string& text, const std::string& part) {

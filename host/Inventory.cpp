@@ -14,7 +14,7 @@ using Nox::Host::DurableName;
 using Nox::Host::ScsiDisk;
 using Nox::Host::ScsiLun;
 using Nox::Host::StorageDeviceInfo;
-using Orbis::ArrayOfString;
+using Orbis::TextList;
 using Orbis::DataArray;
 using OtxCtl::Sim::HostDescription;
 using OtxCtl::Sim::HostDisk;
@@ -38,7 +38,7 @@ void SetUnit(ScsiLun& unit, const std::string& name, const std::string& kind) {
   unit.SetUuid(name);
   unit.SetCanonicalName(name);
   unit.SetLunType(kind);
-  unit.SetOperationalState(MakeRef<ArrayOfString>(std::vector<std::string>{ScsiLun::STATE_OK}));
+  unit.SetOperationalState(MakeRef<TextList>(std::vector<std::string>{ScsiLun::STATE_OK}));
 }
 
 void SetIdentity(ScsiDisk& disk, const HostDisk& described) {

@@ -89,7 +89,7 @@ Ref<ScsiDisk> AbsentDisk(const std::string& kovaUuid, bool ssd) {
   disk->SetCanonicalName(AbsentName(kovaUuid));
   disk->SetDisplayName("Absent disk with KOVA UUID " + kovaUuid);
   disk->SetLunType(ScsiDisk::SCSILUNTYPE_UNKNOWN);
-  disk->SetOperationalState(MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{ScsiDisk::STATE_ERROR}));
+  disk->SetOperationalState(MakeRef<Orbis::TextList>(std::vector<std::string>{ScsiDisk::STATE_ERROR}));
   disk->SetSsd(ssd);
   return disk;
 }

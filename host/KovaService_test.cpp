@@ -87,7 +87,7 @@ TEST_F(KovaServiceTest, CallsNoHookForARequestThatTheGateRefuses) {
   const Answer answer = Query({"naa.1", ""});
   EXPECT_EQ(calls, 0);
   EXPECT_FALSE(answer.result);
-  EXPECT_EQ(dynamic_cast<const InvalidArgument&>(*answer.fault).GetInvalidProperty(), "names[1]");
+  EXPECT_EQ(dynamic_cast<const InvalidArgument&>(*answer.fault).GetArgument(), "names[1]");
 }
 
 TEST_F(KovaServiceTest, AnswersAnExceptionOfAHookByASystemErrorWithItsText) {

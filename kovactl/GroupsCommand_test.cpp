@@ -54,7 +54,7 @@ TEST_F(GroupsCommand, PrintsEachGroupWithItsDisks) {
 
 TEST_F(GroupsCommand, MarksDisksThatHaveLeft) {
   const auto group = AGroup("kova:1", {"naa.2", "kova:3"}, true);
-  const auto left = MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{ScsiDisk::STATE_ERROR});
+  const auto left = MakeRef<Orbis::TextList>(std::vector<std::string>{ScsiDisk::STATE_ERROR});
   group->GetMapping()->GetSsd()->SetOperationalState(left);
   (*group->GetMapping()->GetNonSsd())[1]->SetOperationalState(left);
   _info->SetDiskMapInfo(MakeRef<DataArray<DiskMapInfo>>());

@@ -59,7 +59,7 @@ TEST(Words, ForTheSizeOfADiskNeedASize) {
 Ref<DiskResult> ADisk(const std::string& state, const std::vector<std::string>& operationalStates = {}) {
   const auto result = MakeRef<DiskResult>();
   result->SetState(state);
-  result->GetDisk()->SetOperationalState(MakeRef<Orbis::ArrayOfString>(operationalStates));
+  result->GetDisk()->SetOperationalState(MakeRef<Orbis::TextList>(operationalStates));
   return result;
 }
 

@@ -54,9 +54,9 @@ TEST(FaultTree, IsTheTreeOfTheExceptionsToo) {
   using Orbis::Fault::SystemError;
   std::map<const TypeDescriptor*, const TypeDescriptor*> expected;
   for (const Branch& branch :
-       {MakeBranch<Orbis::RuntimeFault, MethodFault>(), MakeBranch<SystemError, Orbis::RuntimeFault>(),
-        MakeBranch<InvalidArgument, Orbis::RuntimeFault>(), MakeBranch<Busy, Orbis::RuntimeFault>(),
-        MakeBranch<HostChanged, Orbis::RuntimeFault>(), MakeBranch<NotPermitted, Orbis::RuntimeFault>(),
+       {MakeBranch<Orbis::ServiceFault, MethodFault>(), MakeBranch<SystemError, Orbis::ServiceFault>(),
+        MakeBranch<InvalidArgument, Orbis::ServiceFault>(), MakeBranch<Busy, Orbis::ServiceFault>(),
+        MakeBranch<HostChanged, Orbis::ServiceFault>(), MakeBranch<NotPermitted, Orbis::ServiceFault>(),
         MakeBranch<KovaFault, MethodFault>(), MakeBranch<KovaDiskFault, KovaFault>(),
         MakeBranch<DiskHasPartitions, KovaDiskFault>(),
         MakeBranch<DiskIsLastRemainingNonSSD, KovaDiskFault>(),

@@ -57,8 +57,8 @@ const std::map<std::string, Getter>& OptionalGetters() {
       {"KovaHostConfigInfoStorageInfo.autoClaim",
        [](DataObject& o) { As<Kova::Host::ConfigInfo::StorageInfo>(o).GetAutoClaim(); }},
       {"KovaDiskFault.device", [](DataObject& o) { As<Fault::KovaDiskFault>(o).GetDevice(); }},
-      {"InvalidArgument.invalidProperty",
-       [](DataObject& o) { As<Orbis::Fault::InvalidArgument>(o).GetInvalidProperty(); }},
+      {"InvalidArgument.argument",
+       [](DataObject& o) { As<Orbis::Fault::InvalidArgument>(o).GetArgument(); }},
       {"LocalizableMessage.message", [](DataObject& o) { As<Orbis::LocalizableMessage>(o).GetMessage(); }},
   };
   return *getters;
@@ -185,11 +185,11 @@ TEST(Types, AreFoundByNameAndHaveListsOfThemselves) {
   for (const TypeDescriptor* type : AllTypes()) {
     SCOPED_TRACE(type->name);
     EXPECT_EQ(Orbis::FindType(type->name), type);
-    const TypeDescriptor* const list = Orbis::FindType("ArrayOf" + type->name);
+    const TypeDescriptor* const list = Orbis::FindType(type->name + "List");
     ASSERT_NE(list, nullptr);
     EXPECT_EQ(list->element, type);
     EXPECT_EQ(&list->createArray()->GetType(), list);
-    EXPECT_EQ(Orbis::FindType("ArrayOfArrayOf" + type->name), nullptr);
+    EXPECT_EQ(Orbis::FindType(type->name + "ListList"), nullptr);
   }
 }
 

@@ -67,10 +67,10 @@ extern template class Boxed<Bytes>;
 using Binary = Boxed<Bytes>;
 
 // A list of texts.
-class TESSA_API ArrayOfString final : public Any {
+class TESSA_API TextList final : public Any {
  public:
-  ArrayOfString() = default;
-  explicit ArrayOfString(std::vector<std::string> items) : _items(std::move(items)) {}
+  TextList() = default;
+  explicit TextList(std::vector<std::string> items) : _items(std::move(items)) {}
 
   static const TypeDescriptor& StaticType();
   const TypeDescriptor& GetType() const override { return StaticType(); }

@@ -13,7 +13,7 @@ bool IsEmptyList(const Any* value) {
   if (const auto* objects = dynamic_cast<const DataArrayBase*>(value)) {
     return objects->IsEmpty();
   }
-  const auto* texts = dynamic_cast<const ArrayOfString*>(value);
+  const auto* texts = dynamic_cast<const TextList*>(value);
   return texts != nullptr && texts->Items().empty();
 }
 
@@ -119,7 +119,7 @@ Ref<Any> CloneAny(const Any* value) {
       return copy;
     }
     case TypeKind::StringArray:
-      return new ArrayOfString(static_cast<const ArrayOfString&>(*value));
+      return new TextList(static_cast<const TextList&>(*value));
     case TypeKind::Simple:
       break;
   }
@@ -139,8 +139,8 @@ bool Equal(const Any* left, const Any* right) {
     case TypeKind::ObjectArray:
       return EqualArray(static_cast<const DataArrayBase&>(*left), static_cast<const DataArrayBase&>(*right));
     case TypeKind::StringArray:
-      return static_cast<const ArrayOfString&>(*left).Items() ==
-             static_cast<const ArrayOfString&>(*right).Items();
+      return static_cast<const TextList&>(*left).Items() ==
+             static_cast<const TextList&>(*right).Items();
     case TypeKind::Simple:
       break;
   }
@@ -168,7 +168,7 @@ void Print(const Any* value, std::string& out) {
       return;
     case TypeKind::StringArray:
       out += "[";
-      for (const std::string& text : static_cast<const ArrayOfString&>(*value).Items()) {
+      for (const std::string& text : static_cast<const TextList&>(*value).Items()) {
         out.append(separator).append("\"").append(text).append("\"");
         separator = ", ";
       }

@@ -25,7 +25,7 @@ Ref<LocalizableMessage> AMessage() {
   message->SetKey("kova.full");
   message->SetArg(MakeRef<DataArray<KeyAnyValue>>());
   message->GetArg()->Append(APair("count", MakeRef<Boxed<std::int32_t>>(3)));
-  message->GetArg()->Append(APair("names", MakeRef<ArrayOfString>(std::vector<std::string>{"a", "b"})));
+  message->GetArg()->Append(APair("names", MakeRef<TextList>(std::vector<std::string>{"a", "b"})));
   return message;
 }
 
@@ -95,12 +95,12 @@ TEST(Equal, TellsValuesOfDifferentTypes) {
       Equal(MakeRef<DataArray<KeyAnyValue>>().Get(), MakeRef<DataArray<LocalizableMessage>>().Get()));
   EXPECT_FALSE(Equal(MakeRef<Fault::SystemError>().Get(), MakeRef<Fault::InvalidArgument>().Get()));
   const Ref<KeyAnyValue> withNone = APair("k", nullptr);
-  const Ref<KeyAnyValue> withEmptyList = APair("k", MakeRef<ArrayOfString>());
+  const Ref<KeyAnyValue> withEmptyList = APair("k", MakeRef<TextList>());
   EXPECT_FALSE(Equal(withNone.Get(), withEmptyList.Get())) << "a value of any type is no list field";
 }
 
 TEST(Equal, MindsTheOrderAndNumberOfElements) {
-  const auto list = [](std::vector<std::string> items) { return MakeRef<ArrayOfString>(std::move(items)); };
+  const auto list = [](std::vector<std::string> items) { return MakeRef<TextList>(std::move(items)); };
   EXPECT_TRUE(Equal(list({"a", "b"}).Get(), list({"a", "b"}).Get()));
   EXPECT_FALSE(Equal(list({"a", "b"}).Get(), list({"b", "a"}).Get()));
   EXPECT_FALSE(Equal(list({"a"}).Get(), list({"a", "a"}).Get()));

@@ -120,7 +120,7 @@ void ExpectCaughtAs(const Ref<Fault::SystemError>& fault) {
 TEST(FaultException, IsCaughtAsEveryOneOfItsBases) {
   const Ref<Fault::SystemError> fault = ASystemError("broken");
   ExpectCaughtAs<Fault::SystemError::Exception>(fault);
-  ExpectCaughtAs<RuntimeFault::Exception>(fault);
+  ExpectCaughtAs<ServiceFault::Exception>(fault);
   ExpectCaughtAs<MethodFault::Exception>(fault);
   ExpectCaughtAs<Tessa::Throwable>(fault);
   ExpectCaughtAs<std::exception>(fault);

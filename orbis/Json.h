@@ -4,7 +4,7 @@
 // the fields in schema order; unset fields and empty lists are left out; bytes are base64. A simple value
 // where any value may stand is {"@type": "xsd:int", "@value": 3}. "@type" is always written; when reading,
 // it may be missing where the declared type has objects of its own. A list at the top is an array; in a
-// place for any value it is {"@type": "ArrayOfX", "@value": [...]}.
+// place for any value it is {"@type": "XList", "@value": [...]}.
 //
 // Threads: any; the value must not be written meanwhile.
 #pragma once

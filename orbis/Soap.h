@@ -6,7 +6,7 @@
 //   <object xmlns="urn:nox" xmlns:xsd=".." xmlns:xsi=".." xsi:type="HostScsiDisk">..</object>
 //
 // Fields stand in schema order, those of the bases first; unset fields and empty lists are left out; the
-// type is named where it is not the declared one. Lists at the top are <object xsi:type="ArrayOfX"> with
+// type is named where it is not the declared one. Lists at the top are <object xsi:type="XList"> with
 // <item> elements, so that an empty list keeps its type.
 //
 // Threads: any; the value must not be written meanwhile.

@@ -9,7 +9,8 @@
 namespace Orbis {
 namespace {
 
-constexpr std::string_view arrayPrefix = "ArrayOf";
+// What the name of a list adds to that of its elements.
+constexpr std::string_view listSuffix = "List";
 
 // Types register while libraries are loaded; afterwards the registry is only read, but a library may
 // still be loaded then, so it is guarded. Never destroyed, like the descriptors.
@@ -80,12 +81,12 @@ template class Boxed<DateTime>;
 template class Boxed<std::string>;
 template class Boxed<Bytes>;
 
-const TypeDescriptor& ArrayOfString::StaticType() {
+const TypeDescriptor& TextList::StaticType() {
   static const TypeDescriptor& type =
-      *new TypeDescriptor{.name = "ArrayOfString",
-                          .source = "Orbis::ArrayOfString",
+      *new TypeDescriptor{.name = "TextList",
+                          .source = "Orbis::TextList",
                           .kind = TypeKind::StringArray,
-                          .create = []() -> Ref<Any> { return new ArrayOfString; }};
+                          .create = []() -> Ref<Any> { return new TextList; }};
   return type;
 }
 
@@ -118,7 +119,7 @@ const TypeDescriptor& Complete(TypeDescriptor description, Ref<DataArrayBase> (*
   for (const FieldDescriptor& field : type->ownFields) {
     type->fields.push_back(&field);
   }
-  type->array = new TypeDescriptor{.name = std::string(arrayPrefix) + type->name,
+  type->array = new TypeDescriptor{.name = type->name + std::string(listSuffix),
                                    .source = "Orbis::DataArray",
                                    .kind = TypeKind::ObjectArray,
                                    .element = type,
@@ -141,20 +142,20 @@ TypeRegistration::TypeRegistration(std::initializer_list<const TypeDescriptor& (
 }
 
 const TypeDescriptor* FindType(std::string_view name) {
-  if (name == ArrayOfString::StaticType().name) {
-    return &ArrayOfString::StaticType();
+  if (name == TextList::StaticType().name) {
+    return &TextList::StaticType();
   }
-  const bool array = name.substr(0, arrayPrefix.size()) == arrayPrefix;
+  const bool list = name.ends_with(listSuffix);
   Registry& registry = TheRegistry();
   const TypeDescriptor* type = nullptr;
   {
     const std::lock_guard guard(registry.mutex);
-    const auto found = registry.types.find(array ? name.substr(arrayPrefix.size()) : name);
+    const auto found = registry.types.find(list ? name.substr(0, name.size() - listSuffix.size()) : name);
     if (found != registry.types.end()) {
       type = found->second;
     }
   }
-  return type != nullptr && array ? type->array : type;
+  return type != nullptr && list ? type->array : type;
 }
 
 const TypeDescriptor* FindSimpleType(std::string_view name) {

@@ -24,7 +24,7 @@ enum class FieldKind {
   String,    // std::string
   Base64,    // Ref<Binary>
   Object,    // Ref of a data object, or of a list of them
-  Strings,   // Ref<ArrayOfString>
+  Strings,   // Ref<TextList>
   Any,       // Ref<Any>
 };
 
@@ -52,7 +52,7 @@ struct FieldDescriptor {
 enum class TypeKind {
   DataObject,
   ObjectArray,  // DataArray<T>
-  StringArray,  // ArrayOfString
+  StringArray,  // TextList
   Simple,       // Boxed<T>
 };
 
@@ -88,7 +88,7 @@ class TESSA_API TypeRegistration {
   TypeRegistration(std::initializer_list<const TypeDescriptor& (*)()> types);
 };
 
-// The data object, list ("ArrayOfX") or abstract type of that name, or null. Simple types are not found
+// The data object, list ("XList") or abstract type of that name, or null. Simple types are not found
 // here: they have a namespace of their own.
 const TypeDescriptor* FindType(std::string_view name);
 // The simple type of that XML Schema name: boolean, int, long, dateTime, string, base64Binary; or null.

@@ -22,14 +22,14 @@ TEST(FindType, KnowsTypesTheirListsAndAbstractOnes) {
   EXPECT_EQ(FindType("KeyAnyValue"), &KeyAnyValue::StaticType());
   EXPECT_EQ(FindType("MethodFault"), &MethodFault::StaticType());
   EXPECT_TRUE(FindType("MethodFault")->IsAbstract());
-  EXPECT_EQ(FindType("ArrayOfKeyAnyValue"), &DataArray<KeyAnyValue>::StaticType());
-  EXPECT_EQ(FindType("ArrayOfMethodFault"), &DataArray<MethodFault>::StaticType());
-  EXPECT_EQ(FindType("ArrayOfString"), &ArrayOfString::StaticType());
+  EXPECT_EQ(FindType("KeyAnyValueList"), &DataArray<KeyAnyValue>::StaticType());
+  EXPECT_EQ(FindType("MethodFaultList"), &DataArray<MethodFault>::StaticType());
+  EXPECT_EQ(FindType("TextList"), &TextList::StaticType());
 }
 
 TEST(FindType, KnowsNothingElse) {
-  for (const char* name : {"", "ArrayOf", "ArrayOfArrayOfKeyAnyValue", "ArrayOfArrayOfString",
-                           "ArrayOfNothing", "Nothing", "string", "int", "ArrayOfint", "ArrayOfKeyAnyValu",
+  for (const char* name : {"", "List", "ArrayOfKeyAnyValue", "ArrayOfString", "KeyAnyValueListList", "TextListList",
+                           "NothingList", "Nothing", "string", "int", "intList", "KeyAnyValuList",
                            "keyAnyValue", "KeyAnyValue ", "Orbis::KeyAnyValue"}) {
     EXPECT_EQ(FindType(name), nullptr) << name;
   }
@@ -37,7 +37,7 @@ TEST(FindType, KnowsNothingElse) {
 
 TEST(FindSimpleType, KnowsOnlySimpleTypes) {
   EXPECT_EQ(FindSimpleType("string"), &Boxed<std::string>::StaticType());
-  for (const char* name : {"", "String", "anyType", "integer", "KeyAnyValue", "ArrayOfString", "base64"}) {
+  for (const char* name : {"", "String", "anyType", "integer", "KeyAnyValue", "TextList", "base64"}) {
     EXPECT_EQ(FindSimpleType(name), nullptr) << name;
   }
 }
@@ -48,7 +48,7 @@ TEST(AllTypes, GivesEveryTypeOnceInOrderOfNames) {
     names.push_back(type->name);
   }
   EXPECT_THAT(names, IsSupersetOf({"InvalidArgument", "KeyAnyValue", "LocalizableMessage", "MethodFault",
-                                   "RuntimeFault", "SystemError"}));
+                                   "ServiceFault", "SystemError"}));
   EXPECT_TRUE(std::is_sorted(names.begin(), names.end()));
   EXPECT_EQ(std::adjacent_find(names.begin(), names.end()), names.end());
 }
@@ -58,17 +58,17 @@ TEST(TypeDescriptor, HasTheFieldsOfItsBasesFirst) {
   for (const FieldDescriptor* field : Fault::SystemError::StaticType().fields) {
     names.push_back(field->name);
   }
-  EXPECT_THAT(names, ElementsAre("faultCause", "faultMessage", "reason"));
+  EXPECT_THAT(names, ElementsAre("cause", "faultMessage", "reason"));
 }
 
 TEST(TypeDescriptor, KnowsItsAncestors) {
   const TypeDescriptor& type = Fault::SystemError::StaticType();
   EXPECT_TRUE(type.IsA(type));
-  EXPECT_TRUE(type.IsA(RuntimeFault::StaticType()));
+  EXPECT_TRUE(type.IsA(ServiceFault::StaticType()));
   EXPECT_TRUE(type.IsA(MethodFault::StaticType()));
   EXPECT_TRUE(type.IsA(DataObject::StaticType()));
   EXPECT_FALSE(type.IsA(Fault::InvalidArgument::StaticType()));
-  EXPECT_FALSE(RuntimeFault::StaticType().IsA(type));
+  EXPECT_FALSE(ServiceFault::StaticType().IsA(type));
   EXPECT_FALSE(DataArray<Fault::SystemError>::StaticType().IsA(type));
 }
 
@@ -105,7 +105,7 @@ TEST(DataArray, HoldsItsElementsInOrderAndMayHoldNull) {
 }
 
 TEST(DataArray, TakesObjectsOfItsElementTypeOnly) {
-  const Ref<DataArray<RuntimeFault>> list = MakeRef<DataArray<RuntimeFault>>();
+  const Ref<DataArray<ServiceFault>> list = MakeRef<DataArray<ServiceFault>>();
   list->AppendAny(MakeRef<Fault::SystemError>());
   list->AppendAny(nullptr);
   EXPECT_THAT([&] { list->AppendAny(MakeRef<KeyAnyValue>()); },

@@ -75,7 +75,7 @@ AgentClient::AgentClient(const std::string& url, TlsClientFiles files)
     : _address(ParseAgentAddress(url)), _files(std::move(files)) {}
 
 Answer AgentClient::QueryDisksForKova(const std::vector<std::string>& names) const {
-  const std::string body = Body().Add("names", Orbis::ArrayOfString(names)).Done();
+  const std::string body = Body().Add("names", Orbis::TextList(names)).Done();
   return Ask("QueryDisksForKova", body, &DataArray<DiskResult>::StaticType(), queryPatience);
 }
 

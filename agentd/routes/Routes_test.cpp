@@ -64,7 +64,7 @@ TEST_F(Routes, DisksAreAnsweredTheSameWhoeverWroteTheirText) {
   const std::string json = Get("/api/v1/disks").body;
   const std::string soap = Post("/soap", soapQuery, "text/xml").body;
   EXPECT_THAT(json, HasSubstr("naa.1 & <2>"));
-  EXPECT_THAT(soap, AllOf(HasSubstr("<returnval><disk>"), HasSubstr("naa.1 &amp; &lt;2&gt;")));
+  EXPECT_THAT(soap, AllOf(HasSubstr("<result><disk>"), HasSubstr("naa.1 &amp; &lt;2&gt;")));
   FakeHooks::resultText.insert(FakeHooks::resultText.find("<item>"), "<!-- by hand -->\n");
   EXPECT_EQ(Get("/api/v1/disks").body, json);
   EXPECT_EQ(Query("{}").body, json);
@@ -141,7 +141,7 @@ TEST_F(Routes, ARefusedRequestIs400WithTheFault) {
   EXPECT_EQ(answer.status, 400u);
   EXPECT_EQ(answer.contentType, "application/json");
   EXPECT_THAT(answer.body, AllOf(HasSubstr(R"("result":null)"), HasSubstr(R"("@type":"InvalidArgument")"),
-                                 HasSubstr(R"("invalidProperty":"names[0]")")));
+                                 HasSubstr(R"("argument":"names[0]")")));
   EXPECT_EQ(FakeHooks::calls, 0);
 }
 

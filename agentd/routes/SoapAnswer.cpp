@@ -115,7 +115,7 @@ HttpAnswer ToSoap(std::string_view operation, const Host::WrittenAnswer& answer)
   const Orbis::TypeDescriptor& list = *Nox::Kova::Host::DiskResult::StaticType().array;
   HttpAnswer http = Xml(200);
   if (answer.fault ||
-      !Orbis::AppendMessageOfSoap(Response::StaticType().name, "returnval", list, answer.result, http.body)) {
+      !Orbis::AppendMessageOfSoap(Response::StaticType().name, "result", list, answer.result, http.body)) {
     return ToSoap(operation, Host::Read(answer));
   }
   return http;

@@ -116,7 +116,7 @@ TEST_F(SoapEndpoint, AnswersWithTheResult) {
   EXPECT_EQ(answer.status, 200u);
   EXPECT_EQ(answer.contentType, "text/xml; charset=utf-8");
   EXPECT_THAT(answer.body, AllOf(HasSubstr("<soapenv:Body><QueryDisksForKovaResponse xmlns=\"urn:nox\">"
-                                           "<returnval><disk>"),
+                                           "<result><disk>"),
                                  Not(HasSubstr("<fault"))));
 }
 
@@ -127,7 +127,7 @@ TEST_F(SoapEndpoint, AnswersWithResultAndFault) {
   const HttpAnswer answer = Ask("AddAllEligibleDisks");
   EXPECT_EQ(answer.status, 200u);
   EXPECT_THAT(answer.body,
-              AllOf(HasSubstr("<AddAllEligibleDisksResponse xmlns=\"urn:nox\"><returnval>"),
+              AllOf(HasSubstr("<AddAllEligibleDisksResponse xmlns=\"urn:nox\"><result>"),
                     HasSubstr("<fault xsi:type=\"DiskHasPartitions\"><device>naa.1</device></fault>"
                               "</AddAllEligibleDisksResponse>")));
 }

@@ -73,7 +73,7 @@ TEST_F(TaskRoutes, AChangeIsAnsweredWhenItIsDoneWithTheIdOfItsTask) {
 }
 
 TEST_F(TaskRoutes, AChangeCarriesResultAndFaultOfTheHost) {
-  _api.answer.result = Tessa::MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{"a"});
+  _api.answer.result = Tessa::MakeRef<Orbis::TextList>(std::vector<std::string>{"a"});
   _api.answer.fault = Tessa::MakeRef<Orbis::Fault::SystemError>("half of it failed");
   const HttpAnswer answer = Post("AddAllEligibleDisks", "{}");
   EXPECT_EQ(answer.status, 200u);
@@ -161,7 +161,7 @@ TEST_F(TaskRoutes, AChangeThatWaitsWhenTheAgentStopsIsBusy) {
 
 TEST_F(TaskRoutes, TasksAreListedWithoutTheirResults) {
   EXPECT_EQ(Get("/api/v1/tasks").body, "{\"tasks\":[]}\n");
-  _api.answer.result = Tessa::MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{"long"});
+  _api.answer.result = Tessa::MakeRef<Orbis::TextList>(std::vector<std::string>{"long"});
   Post("AddAllEligibleDisks", R"({"label": "one"})");
   Post("ClaimUnmountedDiskgroup", R"({"label": "two"})");
   const HttpAnswer list = Get("/api/v1/tasks");

@@ -239,7 +239,7 @@ TEST(TaskQueue, TakesTasksOfManyThreadsAtOnce) {
 
 // A list of texts that comes to `bytes` of JSON.
 Answer AnswerOf(std::size_t bytes) {
-  const auto texts = Tessa::MakeRef<Orbis::ArrayOfString>();
+  const auto texts = Tessa::MakeRef<Orbis::TextList>();
   texts->Items().emplace_back(bytes - 4, 't');
   return {.result = texts, .fault = nullptr};
 }

@@ -46,7 +46,7 @@ TEST(Task, ThatHasEndedCarriesItsAnswer) {
   task.state = TaskState::Failed;
   task.started = task.ended = task.created;
   task.answer.fault = Tessa::MakeRef<Orbis::Fault::SystemError>("no");
-  task.answer.result = Tessa::MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{"a"});
+  task.answer.result = Tessa::MakeRef<Orbis::TextList>(std::vector<std::string>{"a"});
   const std::string fault = R"("fault":{"@type":"SystemError","reason":"no"}})";
   const std::string rest =
       R"({"id":"task-1","label":"","operation":"AddDisks","state":"failed","created":"2023-11-14T22:13:20Z",)"

@@ -70,10 +70,10 @@ inline std::string Told(const Orbis::MethodFault* fault) {
   }
   const auto* const invalid = dynamic_cast<const Orbis::Fault::InvalidArgument*>(fault);
   const auto messages = fault->GetFaultMessage();
-  if (invalid == nullptr || !invalid->HasInvalidProperty() || messages->IsEmpty()) {
+  if (invalid == nullptr || !invalid->HasArgument() || messages->IsEmpty()) {
     return std::string(fault->GetType().name);
   }
-  return invalid->GetInvalidProperty() + " | " + (*messages)[0]->GetMessage();
+  return invalid->GetArgument() + " | " + (*messages)[0]->GetMessage();
 }
 
 }  // namespace Host::Testing

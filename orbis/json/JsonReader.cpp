@@ -145,7 +145,7 @@ class JsonReader {
     Demand(Kind::Array, "an array", value, place);
     Place itemPlace{&place, {}, 0};
     if (type.kind == TypeKind::StringArray) {
-      const Ref<ArrayOfString> texts = MakeRef<ArrayOfString>();
+      const Ref<TextList> texts = MakeRef<TextList>();
       for (const Value& item : value.items) {
         ReadScalar(item, FieldKind::String, &texts->Items().emplace_back(), itemPlace);
         ++itemPlace.index;
@@ -170,7 +170,7 @@ class JsonReader {
         return;
       }
       case FieldKind::Strings:
-        field.assign(object, ReadList(value, ArrayOfString::StaticType(), place));
+        field.assign(object, ReadList(value, TextList::StaticType(), place));
         return;
       case FieldKind::Any:
         field.assign(object, Read(value, nullptr, place));

@@ -81,7 +81,7 @@ class JsonWriter {
 
   static bool IsEmpty(const Any& list) {
     return list.GetType().kind == TypeKind::StringArray
-               ? static_cast<const ArrayOfString&>(list).Items().empty()
+               ? static_cast<const TextList&>(list).Items().empty()
                : static_cast<const DataArrayBase&>(list).IsEmpty();
   }
 
@@ -89,7 +89,7 @@ class JsonWriter {
     const char* separator = "";
     _out += '[';
     if (list.GetType().kind == TypeKind::StringArray) {
-      for (const std::string& text : static_cast<const ArrayOfString&>(list).Items()) {
+      for (const std::string& text : static_cast<const TextList&>(list).Items()) {
         _out += separator;
         Json::AppendString(text, _out);
         separator = ",";

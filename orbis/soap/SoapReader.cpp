@@ -138,7 +138,7 @@ class SoapReader {
 
   const Element* ReadListField(const Element* child, const FieldDescriptor& field, DataObject& object) const {
     if (field.kind == FieldKind::Strings) {
-      const Ref<ArrayOfString> texts = MakeRef<ArrayOfString>();
+      const Ref<TextList> texts = MakeRef<TextList>();
       for (; IsNamed(child, field.name); child = child->nextSibling) {
         ReadText(*child, *texts);
       }
@@ -166,7 +166,7 @@ class SoapReader {
 
   Ref<Any> ReadTextList(const Element& element) const {
     CheckNoText(element);
-    const Ref<ArrayOfString> list = MakeRef<ArrayOfString>();
+    const Ref<TextList> list = MakeRef<TextList>();
     for (const Element* item = element.firstChild; item != nullptr; item = item->nextSibling) {
       CheckItem(*item);
       ReadText(*item, *list);
@@ -174,7 +174,7 @@ class SoapReader {
     return list;
   }
 
-  void ReadText(const Element& element, ArrayOfString& list) const {
+  void ReadText(const Element& element, TextList& list) const {
     CheckDeclaredSimple(element, FieldKind::String);
     ReadScalar(element, FieldKind::String, &list.Items().emplace_back());
   }

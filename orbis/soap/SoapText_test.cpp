@@ -38,9 +38,9 @@ TEST(SerializeObjectToSoap, WritesWholeTexts) {
   EXPECT_EQ(Written(*MakeRef<Fault::SystemError>("a < b")),
             std::string(head) + "xsi:type=\"SystemError\"><reason>a &lt; b</reason></object>");
   EXPECT_EQ(Written(*MakeRef<DataArray<KeyAnyValue>>()),
-            std::string(head) + "xsi:type=\"ArrayOfKeyAnyValue\"></object>");
-  EXPECT_EQ(Written(*MakeRef<ArrayOfString>(std::vector<std::string>{"a", ""})),
-            std::string(head) + "xsi:type=\"ArrayOfString\"><item>a</item><item></item></object>");
+            std::string(head) + "xsi:type=\"KeyAnyValueList\"></object>");
+  EXPECT_EQ(Written(*MakeRef<TextList>(std::vector<std::string>{"a", ""})),
+            std::string(head) + "xsi:type=\"TextList\"><item>a</item><item></item></object>");
   EXPECT_EQ(Written(*MakeRef<Boxed<std::int32_t>>(3)), std::string(head) + "xsi:type=\"xsd:int\">3</object>");
 }
 
@@ -48,8 +48,8 @@ TEST(SerializeObjectToSoap, NamesTheTypeOfValuesOfAnyType) {
   EXPECT_EQ(Written(*APair("k", MakeRef<Boxed<std::string>>("v"))),
             std::string(head) +
                 "xsi:type=\"KeyAnyValue\"><key>k</key><value xsi:type=\"xsd:string\">v</value></object>");
-  EXPECT_THAT(Written(*APair("k", MakeRef<ArrayOfString>(std::vector<std::string>{"v"}))),
-              HasSubstr("<value xsi:type=\"ArrayOfString\"><item>v</item></value>"));
+  EXPECT_THAT(Written(*APair("k", MakeRef<TextList>(std::vector<std::string>{"v"}))),
+              HasSubstr("<value xsi:type=\"TextList\"><item>v</item></value>"));
   EXPECT_THAT(
       Written(*APair("k", APair("l", MakeRef<Boxed<bool>>(true)))),
       HasSubstr("<value xsi:type=\"KeyAnyValue\"><key>l</key><value xsi:type=\"xsd:boolean\">true</value>"));
@@ -69,7 +69,7 @@ TEST(SerializeObjectToSoap, CutsItsTextBackWhenAListHoldsANull) {
   list->Append(nullptr);
   std::string text = "before";
   EXPECT_THAT([&] { SerializeObjectToSoap(*list, nullptr, text); },
-              ThrowsMessage<Tessa::NotInitializedException>(HasSubstr("ArrayOfSystemError")));
+              ThrowsMessage<Tessa::NotInitializedException>(HasSubstr("SystemErrorList")));
   EXPECT_EQ(text, "before");
 }
 
@@ -91,7 +91,7 @@ TEST(DeserializeSoapToObject, ReplacesTheValueOnSuccessOnly) {
 
 TEST(DeserializeSoapToObject, AcceptsTheExpectedTypeAndItsKinds) {
   const std::string text = Written(*MakeRef<Fault::SystemError>("r"));
-  for (const TypeDescriptor* type : {&Fault::SystemError::StaticType(), &RuntimeFault::StaticType(),
+  for (const TypeDescriptor* type : {&Fault::SystemError::StaticType(), &ServiceFault::StaticType(),
                                      &MethodFault::StaticType(), &DataObject::StaticType()}) {
     Ref<Any> value;
     DeserializeSoapToObject(text, value, nullptr, type);
@@ -103,7 +103,7 @@ TEST(DeserializeSoapToObject, RefusesAnotherThanTheExpectedType) {
   const std::string text = Written(*MakeRef<Fault::SystemError>("r"));
   for (const TypeDescriptor* type :
        {&Fault::InvalidArgument::StaticType(), &DataArray<Fault::SystemError>::StaticType(),
-        &Boxed<std::string>::StaticType(), &ArrayOfString::StaticType()}) {
+        &Boxed<std::string>::StaticType(), &TextList::StaticType()}) {
     Ref<Any> value;
     EXPECT_THAT([&] { DeserializeSoapToObject(text, value, nullptr, type); },
                 ThrowsMessage<ParseException>(

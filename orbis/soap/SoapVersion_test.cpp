@@ -160,9 +160,9 @@ TEST(WritingForAVersion, WritesAnyValuesTheSameWay) {
 TEST(WritingForAVersion, WritesAListOfANewerTypeAsOneOfItsNearestKnownAncestor) {
   const Ref<DataArray<CleverLamp>> list = MakeRef<DataArray<CleverLamp>>();
   list->Append(ACleverLamp());
-  EXPECT_EQ(Written(*list, &versionOne), " xsi:type=\"ArrayOfLamp\"><item><name>desk</name></item></object>");
+  EXPECT_EQ(Written(*list, &versionOne), " xsi:type=\"LampList\"><item><name>desk</name></item></object>");
   EXPECT_EQ(Written(*list, &versionThree),
-            " xsi:type=\"ArrayOfCleverLamp\"><item><name>desk</name><watts>7</watts>"
+            " xsi:type=\"CleverLampList\"><item><name>desk</name><watts>7</watts>"
             "<address>10.0.0.1</address></item></object>");
 }
 
@@ -184,7 +184,7 @@ TEST(ReadingForAVersion, RefusesNewerTypes) {
               ThrowsMessage<ParseException>(AllOf(HasSubstr("/object, line 2"), HasSubstr("'CleverLamp'"))));
   const Ref<DataArray<CleverLamp>> list = MakeRef<DataArray<CleverLamp>>();
   EXPECT_THAT([&] { DeserializeSoapToObject(Text(*list), read, &versionTwo); },
-              ThrowsMessage<ParseException>(HasSubstr("'ArrayOfCleverLamp'")));
+              ThrowsMessage<ParseException>(HasSubstr("'CleverLampList'")));
   EXPECT_FALSE(read);
 }
 

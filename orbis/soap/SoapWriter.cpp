@@ -70,7 +70,7 @@ class SoapWriter {
         WriteElements("item", static_cast<const DataArrayBase&>(value), *type.element);
         return;
       case TypeKind::StringArray:
-        WriteTexts("item", static_cast<const ArrayOfString&>(value));
+        WriteTexts("item", static_cast<const TextList&>(value));
         return;
       case TypeKind::Simple:
         WriteScalarText(type.simple, BoxedValue(value));
@@ -93,7 +93,7 @@ class SoapWriter {
       return;
     }
     if (field.kind == FieldKind::Strings) {
-      WriteTexts(field.name, static_cast<const ArrayOfString&>(*value));
+      WriteTexts(field.name, static_cast<const TextList&>(*value));
     } else if (field.kind == FieldKind::Base64) {
       WriteScalar(field.name, FieldKind::Base64, BoxedValue(*value));
     } else if (field.presence == Presence::List) {
@@ -117,7 +117,7 @@ class SoapWriter {
     }
   }
 
-  void WriteTexts(std::string_view name, const ArrayOfString& list) {
+  void WriteTexts(std::string_view name, const TextList& list) {
     for (const std::string& text : list.Items()) {
       WriteScalar(name, FieldKind::String, &text);
     }

@@ -32,14 +32,14 @@ Ref<KeyAnyValue> APair(const char* key, Ref<Any> value) {
 // A list whose elements hold what could be taken for its own tags.
 Ref<Pairs> TrickyPairs() {
   const Ref<Pairs> pairs = MakeRef<Pairs>();
-  pairs->Append(APair("a & b", MakeRef<ArrayOfString>(std::vector<std::string>{"<item>", "</item>", ""})));
-  pairs->Append(APair("", APair("inner", MakeRef<ArrayOfString>(std::vector<std::string>{"x"}))));
+  pairs->Append(APair("a & b", MakeRef<TextList>(std::vector<std::string>{"<item>", "</item>", ""})));
+  pairs->Append(APair("", APair("inner", MakeRef<TextList>(std::vector<std::string>{"x"}))));
   return pairs;
 }
 
 std::string MessageOf(const std::string& text, const TypeDescriptor& list) {
   std::string out = "kept ";
-  const bool done = AppendMessageOfSoap("Response", "returnval", list, text, out);
+  const bool done = AppendMessageOfSoap("Response", "result", list, text, out);
   return done ? out : "refused: " + out;
 }
 
@@ -54,10 +54,10 @@ TEST(AppendMessageOfSoap, RenamesTheItemsOfTheListAndNothingInThem) {
             "xmlns:xsd=\"http://www.w3.org/2001/XMLSchema\" "
             "xmlns:xsi=\"http://www.w3.org/2001/XMLSchema-instance\"><soapenv:Body>"
             "<Response xmlns=\"urn:nox\">"
-            "<returnval><key>a &amp; b</key><value xsi:type=\"ArrayOfString\"><item>&lt;item&gt;</item>"
-            "<item>&lt;/item&gt;</item><item></item></value></returnval>"
-            "<returnval><key></key><value xsi:type=\"KeyAnyValue\"><key>inner</key>"
-            "<value xsi:type=\"ArrayOfString\"><item>x</item></value></value></returnval>"
+            "<result><key>a &amp; b</key><value xsi:type=\"TextList\"><item>&lt;item&gt;</item>"
+            "<item>&lt;/item&gt;</item><item></item></value></result>"
+            "<result><key></key><value xsi:type=\"KeyAnyValue\"><key>inner</key>"
+            "<value xsi:type=\"TextList\"><item>x</item></value></value></result>"
             "</Response></soapenv:Body></soapenv:Envelope>\n");
 }
 
@@ -65,7 +65,7 @@ TEST(AppendMessageOfSoap, KeepsTheTypesOfItemsThatDerive) {
   const Ref<DataArray<MethodFault>> faults = MakeRef<DataArray<MethodFault>>();
   faults->Append(MakeRef<Fault::SystemError>("r"));
   EXPECT_NE(MessageOf(Written(*faults), *MethodFault::StaticType().array)
-                .find("<returnval xsi:type=\"SystemError\"><reason>r</reason></returnval>"),
+                .find("<result xsi:type=\"SystemError\"><reason>r</reason></result>"),
             std::string::npos);
 }
 
@@ -82,11 +82,11 @@ TEST(AppendJsonOfSoap, WritesEveryKindOfValue) {
   EXPECT_TRUE(AppendJsonOfSoap(Written(*pairs), json));
   EXPECT_EQ(json,
             R"(kept [{"@type":"KeyAnyValue","key":"a & b","value":)"
-            R"({"@type":"ArrayOfString","@value":["<item>","</item>",""]}},)"
+            R"({"@type":"TextList","@value":["<item>","</item>",""]}},)"
             R"({"@type":"KeyAnyValue","key":"","value":{"@type":"KeyAnyValue","key":"inner","value":)"
-            R"({"@type":"ArrayOfString","@value":["x"]}}},)"
+            R"({"@type":"TextList","@value":["x"]}}},)"
             R"({"@type":"KeyAnyValue","key":"\r\n\"\\\t","value":{"@type":"xsd:int","@value":-3}},)"
-            R"({"@type":"KeyAnyValue","key":"none","value":{"@type":"ArrayOfKeyAnyValue","@value":[]}}])");
+            R"({"@type":"KeyAnyValue","key":"none","value":{"@type":"KeyAnyValueList","@value":[]}}])");
 }
 
 TEST(AppendJsonOfSoap, TakesTextsThatGrowInJson) {
@@ -114,7 +114,7 @@ TEST(WrittenSoap, LeavesToTheReaderWhatTheWriterDoesNotWrite) {
         Replaced(text, "&amp;", "&quot;"), Replaced(text, "<item><key>", "<item> <key>"),
         Replaced(text, "<item><key>", "<item><!-- --><key>"), Replaced(text, "<item></item>", "<item/>"),
         Replaced(text, "</object>", "<item></item></object>"), Replaced(text, "</key>", "</kez>"),
-        Replaced(text, "ArrayOfString", "NoType"), Replaced(text, "ArrayOfKeyAnyValue", "MethodFault")}) {
+        Replaced(text, "TextList", "NoType"), Replaced(text, "KeyAnyValueList", "MethodFault")}) {
     std::string json = "kept ";
     EXPECT_FALSE(AppendJsonOfSoap(other, json)) << other;
     EXPECT_EQ(json, "kept ");

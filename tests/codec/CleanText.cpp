@@ -88,7 +88,7 @@ void CleanTexts(Any& value, Form form) {
       }
       return;
     case TypeKind::StringArray:
-      for (std::string& text : static_cast<Orbis::ArrayOfString&>(value).Items()) {
+      for (std::string& text : static_cast<Orbis::TextList&>(value).Items()) {
         text = CleanText(text, form);
       }
       return;

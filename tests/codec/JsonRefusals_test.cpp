@@ -175,13 +175,13 @@ INSTANTIATE_TEST_SUITE_P(
                 "unknown type 'xsd:float'"},
         Refusal{"SimpleTypeWithoutPrefix", AnyValue("{\"@type\": \"int\", \"@value\": 1}"), "value.@type", 2,
                 "unknown type 'int'"},
-        Refusal{"ListOfLists", AnyValue("{\"@type\": \"ArrayOfArrayOfString\", \"@value\": []}"),
+        Refusal{"ListOfLists", AnyValue("{\"@type\": \"TextListList\", \"@value\": []}"),
                 "value.@type", 2, "unknown type"},
         Refusal{"TypeWithBlanks", "{\"@type\": \"KovaHostIpConfig \"}", "@type", 1, "unknown type"},
         Refusal{"TypeThatIsNoText", "{\"@type\": 5}", "@type", 1, "wanted the name of a type"},
-        Refusal{"AbstractType", Fault("\"faultCause\": {\"@type\": \"RuntimeFault\"}"), "faultCause", 2,
-                "RuntimeFault has no objects"},
-        Refusal{"AbstractByDeclaration", Fault("\"faultCause\": {}"), "faultCause", 2,
+        Refusal{"AbstractType", Fault("\"cause\": {\"@type\": \"ServiceFault\"}"), "cause", 2,
+                "ServiceFault has no objects"},
+        Refusal{"AbstractByDeclaration", Fault("\"cause\": {}"), "cause", 2,
                 "MethodFault has no objects"},
         Refusal{"UnrelatedType", Mapping(Disk("\"@type\": \"KovaHostIpConfig\",")), "ssd.@type", 2,
                 "KovaHostIpConfig is not a HostScsiDisk"},
@@ -197,7 +197,7 @@ INSTANTIATE_TEST_SUITE_P(
                 2, "exactly \"@type\" and \"@value\""},
         Refusal{"AnyOfAnotherKind", AnyValue("{\"@type\": \"xsd:int\", \"@value\": \"5\"}"), "value.@value",
                 2, "integer of 32 bits"},
-        Refusal{"AnyListOfAnotherKind", AnyValue("{\"@type\": \"ArrayOfString\", \"@value\": [\"a\", 1]}"),
+        Refusal{"AnyListOfAnotherKind", AnyValue("{\"@type\": \"TextList\", \"@value\": [\"a\", 1]}"),
                 "value.@value[1]", 2, "wanted a text"}),
     nameOfRow);
 
@@ -220,10 +220,10 @@ INSTANTIATE_TEST_SUITE_P(
         Acceptance{"EscapedSurrogates",
                    Groups(",\"masterGroup\": \"\\ud834\\udd1e\", \"agentGroup\": \"\\u0000\"")},
         Acceptance{"SimpleAtTheTop", "{\"@type\": \"xsd:int\", \"@value\": 3}"},
-        Acceptance{"ListAtTheTopByName", "{\"@type\": \"ArrayOfHostScsiDisk\", \"@value\": []}"},
+        Acceptance{"ListAtTheTopByName", "{\"@type\": \"HostScsiDiskList\", \"@value\": []}"},
         Acceptance{"AbstractListByName",
-                   "{\"@type\": \"ArrayOfMethodFault\", \"@value\": [" + Fault("\"device\": \"d\"") + "]}"},
-        Acceptance{"ConcreteCause", Fault("\"faultCause\": {\"@type\": \"DiskIsUSB\"}")}),
+                   "{\"@type\": \"MethodFaultList\", \"@value\": [" + Fault("\"device\": \"d\"") + "]}"},
+        Acceptance{"ConcreteCause", Fault("\"cause\": {\"@type\": \"DiskIsUSB\"}")}),
     nameOfRow);
 
 TEST(DeclaredJson, NeedsNoTypeAtTheTop) {
@@ -233,8 +233,8 @@ TEST(DeclaredJson, NeedsNoTypeAtTheTop) {
   const TypeDescriptor& groups = Nox::Kova::Host::IpConfig::StaticType();
   EXPECT_EQ(&read("{\"masterGroup\": \"m\", \"agentGroup\": \"a\"}", groups)->GetType(), &groups);
   EXPECT_EQ(&read("[]", *groups.array)->GetType(), groups.array);
-  EXPECT_EQ(&read("[\"a\"]", Orbis::ArrayOfString::StaticType())->GetType(),
-            &Orbis::ArrayOfString::StaticType());
+  EXPECT_EQ(&read("[\"a\"]", Orbis::TextList::StaticType())->GetType(),
+            &Orbis::TextList::StaticType());
   EXPECT_EQ(
       &read("{\"@type\": \"xsd:int\", \"@value\": 3}", Orbis::Boxed<std::int32_t>::StaticType())->GetType(),
       &Orbis::Boxed<std::int32_t>::StaticType());
@@ -283,13 +283,13 @@ INSTANTIATE_TEST_SUITE_P(Types, CutJson, ::testing::ValuesIn(TypeNames()),
                          [](const auto& row) { return row.param; });
 
 std::string ChainOfCauses(std::size_t faults) {
-  return Repeated("{\"@type\":\"DiskIsUSB\",\"faultCause\":", faults - 1) + "{\"@type\":\"DiskIsUSB\"}" +
+  return Repeated("{\"@type\":\"DiskIsUSB\",\"cause\":", faults - 1) + "{\"@type\":\"DiskIsUSB\"}" +
          Repeated("}", faults - 1);
 }
 
 TEST(JsonBounds, OfDepthHoldOnBothSides) {
   const std::size_t deepest = untrusted.depth;
-  const std::string path = "faultCause" + Repeated(".faultCause", deepest - 1);
+  const std::string path = "cause" + Repeated(".cause", deepest - 1);
   EXPECT_TRUE(ReadNamed(ChainOfCauses(deepest)));
   ExpectRefused({"one deeper", ChainOfCauses(deepest + 1), path, 1, "deeper than 64"}, &ReadNamed);
   ExpectRefused({"far deeper", ChainOfCauses(200'000), path, 1, "deeper than 64"}, &ReadNamed);
@@ -318,7 +318,7 @@ TEST(JsonBounds, OfValuesHoldOnBothSides) {
     return text;
   };
   const auto read = [](const std::string& text) {
-    return Orbis::ReadJson(text, untrusted, &Orbis::ArrayOfString::StaticType());
+    return Orbis::ReadJson(text, untrusted, &Orbis::TextList::StaticType());
   };
   EXPECT_TRUE(read(list(untrusted.elements - 1)));
   EXPECT_THAT([&] { read(list(untrusted.elements)); }, ::testing::ThrowsMessage<Orbis::ParseException>(
@@ -343,7 +343,7 @@ TEST(WriteJson, AppendsAndCutsItsTextBackWhenItThrows) {
   list->Append(nullptr);
   EXPECT_THAT(
       [&] { Orbis::WriteJson(*list, text); },
-      ::testing::ThrowsMessage<Tessa::NotInitializedException>(::testing::HasSubstr("ArrayOfHostScsiDisk")));
+      ::testing::ThrowsMessage<Tessa::NotInitializedException>(::testing::HasSubstr("HostScsiDiskList")));
   EXPECT_EQ(text, "before[]");
   EXPECT_THAT(
       [&] { Orbis::WriteJson(*Orbis::MakeRef<Orbis::KeyAnyValue>(), text); },

@@ -128,7 +128,7 @@ Ref<Any> AChainOfFaults(std::size_t length) {
   Ref<Orbis::MethodFault> fault;
   for (std::size_t i = 0; i < length; ++i) {
     const Ref<Nox::Fault::DiskIsUSB> outer = MakeRef<Nox::Fault::DiskIsUSB>("naa." + std::to_string(i));
-    outer->SetFaultCause(fault);
+    outer->SetCause(fault);
     fault = outer;
   }
   return fault;

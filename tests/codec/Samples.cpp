@@ -8,7 +8,7 @@
 namespace Codec {
 namespace {
 
-using Orbis::ArrayOfString;
+using Orbis::TextList;
 using Orbis::Binary;
 using Orbis::Bytes;
 using Orbis::DataArrayBase;
@@ -129,7 +129,7 @@ Ref<Any> MakeSampleValue(const FieldDescriptor& field) {
     case FieldKind::Base64:
       return MakeRef<Binary>(Bytes{0, 1, 2, 0xff});
     case FieldKind::Strings:
-      return MakeRef<ArrayOfString>(std::vector<std::string>{"first", "second"});
+      return MakeRef<TextList>(std::vector<std::string>{"first", "second"});
     case FieldKind::Any:
       return MakeRef<Orbis::Boxed<std::int32_t>>(3);
     default:
@@ -282,7 +282,7 @@ Ref<Any> RandomObjects::MakeList(const TypeDescriptor& type) {
 }
 
 Ref<Any> RandomObjects::MakeTextList() {
-  const Ref<ArrayOfString> list = MakeRef<ArrayOfString>();
+  const Ref<TextList> list = MakeRef<TextList>();
   for (std::size_t count = Below(4); count > 0; --count) {
     list->Items().push_back(MakeText());
   }

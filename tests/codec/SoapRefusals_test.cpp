@@ -70,7 +70,7 @@ std::string Mapping(const std::string& ssd) {
   return Of("KovaHostDiskMapping", "\n" + ssd);
 }
 std::string Cause(const std::string& attributes) {
-  return Of("DiskIsUSB", "\n<faultCause" + attributes + "></faultCause>");
+  return Of("DiskIsUSB", "\n<cause" + attributes + "></cause>");
 }
 
 Ref<Any> ReadUntrusted(const std::string& text) {
@@ -128,19 +128,19 @@ INSTANTIATE_TEST_SUITE_P(
                 "KovaHostIpConfig is not a HostScsiDisk"},
         Refusal{"BaseWhereDerivedIsDeclared", Mapping(Lun("ssd", "HostScsiLun")), "/object/ssd", 2,
                 "HostScsiLun is not a HostScsiDisk"},
-        Refusal{"ListWhereAnObjectIsDeclared", Mapping(Disk("ssd", "ArrayOfHostScsiDisk")), "/object/ssd", 2,
-                "ArrayOfHostScsiDisk is not a HostScsiDisk"},
+        Refusal{"ListWhereAnObjectIsDeclared", Mapping(Disk("ssd", "HostScsiDiskList")), "/object/ssd", 2,
+                "HostScsiDiskList is not a HostScsiDisk"},
         Refusal{"SimpleWhereAnObjectIsDeclared", Mapping("<ssd xsi:type=\"xsd:string\">x</ssd>"),
                 "/object/ssd", 2, "string is not a HostScsiDisk"},
         Refusal{"AbstractRoot", Of("MethodFault", ""), "/object", 1, "MethodFault has no objects"},
-        Refusal{"AbstractByName", Cause(" xsi:type=\"RuntimeFault\""), "/object/faultCause", 2,
-                "RuntimeFault has no objects"},
-        Refusal{"AbstractByDeclaration", Cause(""), "/object/faultCause", 2, "MethodFault has no objects"},
-        Refusal{"AbstractItem", Of("ArrayOfMethodFault", "\n<item/>"), "/object/item", 2,
+        Refusal{"AbstractByName", Cause(" xsi:type=\"ServiceFault\""), "/object/cause", 2,
+                "ServiceFault has no objects"},
+        Refusal{"AbstractByDeclaration", Cause(""), "/object/cause", 2, "MethodFault has no objects"},
+        Refusal{"AbstractItem", Of("MethodFaultList", "\n<item/>"), "/object/item", 2,
                 "MethodFault has no objects"},
-        Refusal{"ListOfLists", Of("ArrayOfArrayOfString", ""), "/object", 1, "'ArrayOfArrayOfString'"},
-        Refusal{"ListOfNothing", Of("ArrayOf", ""), "/object", 1, "unknown type 'ArrayOf'"},
-        Refusal{"ListOfASimpleType", Of("ArrayOfint", ""), "/object", 1, "unknown type 'ArrayOfint'"},
+        Refusal{"ListOfLists", Of("TextListList", ""), "/object", 1, "'TextListList'"},
+        Refusal{"ListOfNothing", Of("List", ""), "/object", 1, "unknown type 'List'"},
+        Refusal{"ListOfASimpleType", Of("intList", ""), "/object", 1, "unknown type 'intList'"},
         Refusal{"BlankBeforeType", Of(" KovaHostIpConfig", goodGroups), "/object", 1, "blank"},
         Refusal{"BlankBehindType", Of("KovaHostIpConfig ", goodGroups), "/object", 1, "blank"},
         Refusal{"BlankInsideType", Of("KovaHost IpConfig", goodGroups), "/object", 1, "blank"},
@@ -209,8 +209,8 @@ INSTANTIATE_TEST_SUITE_P(
                 Of("KovaHostConfigInfoClusterInfo", "\n<nodeUuid>n</nodeUuid>\n<clusterUuid>c</clusterUuid>"),
                 "/object/clusterUuid", 3, "'clusterUuid' is repeated or out of order"},
         Refusal{"DerivedBeforeBase",
-                Of("DiskIsUSB", "\n<device>d</device>\n<faultCause xsi:type=\"DiskIsUSB\"/>"),
-                "/object/faultCause", 3, "out of order"},
+                Of("DiskIsUSB", "\n<device>d</device>\n<cause xsi:type=\"DiskIsUSB\"/>"),
+                "/object/cause", 3, "out of order"},
         Refusal{"ListTornApart",
                 Of("KovaHostDiskMapResult",
                    "\n<mapping>" + Disk("ssd") + "</mapping>\n<diskResult>" + Disk("disk") +
@@ -230,17 +230,17 @@ INSTANTIATE_TEST_SUITE_P(
         Refusal{"TextBehindElements", Groups("\n<masterGroup/>\n<agentGroup/>hello"), "/object", 3, "text"},
         Refusal{"TextInsteadOfElements", Of("KovaHostConfigInfo", "hello"), "/object", 1,
                 "unexpected text 'hello'"},
-        Refusal{"TextInAList", Of("ArrayOfHostScsiDisk", "hello"), "/object", 1, "unexpected text 'hello'"},
-        Refusal{"TextInATextList", Of("ArrayOfString", "hello"), "/object", 1, "unexpected text 'hello'"},
-        Refusal{"ListOfAnotherElement", Of("ArrayOfString", "\n<item/>\n<items/>"), "/object/items", 3,
+        Refusal{"TextInAList", Of("HostScsiDiskList", "hello"), "/object", 1, "unexpected text 'hello'"},
+        Refusal{"TextInATextList", Of("TextList", "hello"), "/object", 1, "unexpected text 'hello'"},
+        Refusal{"ListOfAnotherElement", Of("TextList", "\n<item/>\n<items/>"), "/object/items", 3,
                 "unexpected element 'items'"},
-        Refusal{"ItemOfAnotherNamespace", Of("ArrayOfString", "\n<item xmlns=\"urn:other\"/>"),
+        Refusal{"ItemOfAnotherNamespace", Of("TextList", "\n<item xmlns=\"urn:other\"/>"),
                 "/object/item", 2, "in a list"},
         Refusal{"NilOnRequired", Groups("\n<masterGroup xsi:nil=\"true\"/>\n<agentGroup/>"),
                 "/object/masterGroup", 2, "xsi:nil"},
         Refusal{"NilOnOptional", Enabled("<enabled xsi:nil=\"1\"/>"), "/object/enabled", 2, "xsi:nil"},
         Refusal{"NilOnRoot", Of("KovaHostConfigInfo", "", " xsi:nil=\"true\""), "/object", 1, "xsi:nil"},
-        Refusal{"NilOnAnItem", Of("ArrayOfString", "\n<item xsi:nil=\"true\"/>"), "/object/item", 2,
+        Refusal{"NilOnAnItem", Of("TextList", "\n<item xsi:nil=\"true\"/>"), "/object/item", 2,
                 "xsi:nil"},
         Refusal{"NilOnAnyValue", AnyValue("<value xsi:type=\"xsd:int\" xsi:nil=\"true\"/>"), "/object/value",
                 2, "xsi:nil"},
@@ -345,7 +345,7 @@ INSTANTIATE_TEST_SUITE_P(
         Acceptance{"TextSaidToBeText",
                    Groups("<masterGroup xsi:type=\"xsd:string\">m</masterGroup><agentGroup/>")},
         Acceptance{"ConcreteCause", Cause(" xsi:type=\"DiskIsUSB\"")},
-        Acceptance{"ListOfAnAbstractType", Of("ArrayOfMethodFault", "")},
+        Acceptance{"ListOfAnAbstractType", Of("MethodFaultList", "")},
         Acceptance{"OptionalLeftOut", Of("KovaHostConfigInfo", "")},
         Acceptance{"ListOfOne", Mapping(Disk("ssd") + Disk("nonSsd"))},
         Acceptance{"NilSaidToBeFalse", Enabled("<enabled xsi:nil=\"false\">true</enabled>")},
@@ -380,11 +380,11 @@ INSTANTIATE_TEST_SUITE_P(Types, CutSoap, ::testing::ValuesIn(TypeNames()),
 // A fault with so many causes behind it.
 std::string ChainOfCauses(std::size_t causes) {
   return Of("DiskIsUSB",
-            Repeated("<faultCause xsi:type=\"DiskIsUSB\">", causes) + Repeated("</faultCause>", causes));
+            Repeated("<cause xsi:type=\"DiskIsUSB\">", causes) + Repeated("</cause>", causes));
 }
 
 std::string PathOfCauses(std::size_t causes) {
-  return "/object" + Repeated("/faultCause", causes);
+  return "/object" + Repeated("/cause", causes);
 }
 
 TEST(SoapBounds, OfDepthHoldOnBothSides) {
@@ -395,7 +395,7 @@ TEST(SoapBounds, OfDepthHoldOnBothSides) {
   ExpectRefused({"far deeper", ChainOfCauses(5'000), PathOfCauses(deepest), 1, "deeper than 64"},
                 &ReadUntrusted);
   const std::string open = "<object " + namespaces + " xsi:type=\"DiskIsUSB\">" +
-                           Repeated("<faultCause xsi:type=\"DiskIsUSB\">", 200'000);
+                           Repeated("<cause xsi:type=\"DiskIsUSB\">", 200'000);
   ExpectRefused({"never closed", open, PathOfCauses(deepest), 1, "deeper than 64"}, &ReadUntrusted);
   ExpectRefused({"own output", open, PathOfCauses(Limits::OwnOutput().depth - 1), 1, "deeper than 512"},
                 &ReadOwn);
@@ -421,7 +421,7 @@ TEST(SoapBounds, OfTextsHoldOnBothSides) {
 
 TEST(SoapBounds, OfElementsHoldOnBothSides) {
   const std::size_t most = Limits::Untrusted().elements;
-  const auto list = [](std::size_t items) { return Of("ArrayOfString", Repeated("<item/>", items)); };
+  const auto list = [](std::size_t items) { return Of("TextList", Repeated("<item/>", items)); };
   EXPECT_TRUE(ReadUntrusted(list(most - 1)));
   EXPECT_THAT([&] { ReadUntrusted(list(most)); },
               ::testing::ThrowsMessage<Orbis::ParseException>(::testing::HasSubstr("500000 elements")));

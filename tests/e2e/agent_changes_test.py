@@ -140,7 +140,7 @@ class RefusedChanges(ChangesTest):
                 ("host", {"set": {"colour": 1}}, "colour")):
             with self.subTest(operation=operation, parameters=parameters):
                 fault = self.refused(400, "InvalidArgument", operation, **parameters)
-                self.assertEqual(fault["invalidProperty"], place)
+                self.assertEqual(fault["argument"], place)
                 self.assertTrue(fault["faultMessage"][0]["message"].startswith(place + ": "))
         self.assertIsNone(process.poll(), "the agent is the same process as before")
         self.assertEqual(self.host(), BROKEN_GROUP)

@@ -121,7 +121,7 @@ class AgentAnswersCurl(ProgramTest):
         answer = json.loads(body)
         self.assertIsNone(answer["result"])
         self.assertEqual(answer["fault"]["@type"], "InvalidArgument")
-        self.assertEqual(answer["fault"]["invalidProperty"], "names[0]")
+        self.assertEqual(answer["fault"]["argument"], "names[0]")
 
     def test_with_a_status_that_says_what_is_wrong_with_the_request(self):
         self.assertEqual(self.curl("/nowhere")[0], 404)

@@ -89,7 +89,7 @@ class Checker:
         is_list = operation in ("QueryDisksForKova", *MAPPING_RESULTS)
         self.check_pair(operation, fault, is_list or len(message) > 0)  # an empty list shows as nothing
         groups = [[name.text or "" for name in group.findall(f"{API}mapping/*/{API}canonicalName")]
-                  for group in message.findall(API + "returnval")
+                  for group in message.findall(API + "result")
                   if operation in MAPPING_RESULTS and group.find(API + "error") is None]
         return Answer(None if fault is None else self.type_of(fault), groups)
 

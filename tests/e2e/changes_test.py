@@ -76,7 +76,7 @@ class Changes:
         self.assertEqual([names(result["mapping"]) for result in results], [["naa.s2", "naa.h1"]])
         self.done("add", "naa.h3", "--yes")
         self.assertEqual(self.groups(), [["naa.s2", "naa.h1", "naa.h3"]])
-        self.assertIn('xsi:type="ArrayOfKovaHostDiskMapResult"',
+        self.assertIn('xsi:type="KovaHostDiskMapResultList"',
                       self.done("-o", "soap", "add", "naa.h2", "--yes").out)
 
     def test_makes_exactly_one_group(self):

@@ -19,7 +19,7 @@ class OneProcess(ProgramTest):
         found = self.kovactl("--host", host, "-o", "json", "disks").json()
         self.assertEqual([result["disk"]["canonicalName"] for result in found], ["naa.1", "naa.2"])
         soap = self.kovactl("--host", host, "-o", "soap", "disks").out
-        self.assertIn('xsi:type="ArrayOfKovaHostDiskResult"', soap)
+        self.assertIn('xsi:type="KovaHostDiskResultList"', soap)
 
     def test_takes_options_on_either_side_of_the_command(self):
         host = self.write("host.json", TWO_DISKS)

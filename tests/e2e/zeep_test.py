@@ -79,7 +79,7 @@ class ZeepTest(ProgramTest):
 
     def groups(self):
         """Cache disk: capacity disks, of the mounted groups."""
-        info = self.client.service.GetStorageInfo()["returnval"]
+        info = self.client.service.GetStorageInfo()["result"]
         return {mapping.ssd.canonicalName: [disk.canonicalName for disk in mapping.nonSsd]
                 for mapping in info.diskMapping}
 
@@ -88,23 +88,23 @@ class Story(ZeepTest):
     def test_from_the_first_query_to_the_last_removal(self):
         service = self.connect(HOST)
 
-        disks = service.QueryDisksForKova()["returnval"]
+        disks = service.QueryDisksForKova()["result"]
         self.assertEqual([result.disk.canonicalName for result in disks], [d["name"] for d in HOST["disks"]])
         self.assertEqual(self.find(disks, FLASH).state, "eligible")
         self.assertTrue(self.find(disks, FLASH).disk.ssd)
         self.assertEqual(self.type_of(self.find(disks, USB).error), "DiskIsUSB")
         self.assertEqual(self.find(disks, PARTED).error.device, PARTED)
-        self.assertEqual([r.disk.canonicalName for r in service.QueryDisksForKova(names=[USB])["returnval"]], [USB])
+        self.assertEqual([r.disk.canonicalName for r in service.QueryDisksForKova(names=[USB])["result"]], [USB])
 
         made = service.AddAllEligibleDisks(label="the first")
         self.assertIsNone(made["fault"])
-        self.assertEqual([len(result.mapping.nonSsd) for result in made["returnval"]], [2, 2])
+        self.assertEqual([len(result.mapping.nonSsd) for result in made["result"]], [2, 2])
         self.assertEqual(self.groups(), {FLASH: ["naa.c1", "naa.c3"], FLASH2: ["naa.c2", "naa.c4"]})
 
-        config = service.GetConfigInfo()["returnval"]
+        config = service.GetConfigInfo()["result"]
         self.assertEqual((config.clusterInfo.clusterUuid, config.faultDomainInfo.name), ("c-1", "rack-1"))
 
-        mapping = made["returnval"][0].mapping
+        mapping = made["result"][0].mapping
         unmounted = service.UnmountDiskMapping(mappings=[mapping])
         self.assertIsNone(unmounted["fault"])
         self.assertEqual(list(self.groups()), [FLASH2])
@@ -121,11 +121,11 @@ class Story(ZeepTest):
 
     def test_a_typed_fault(self):
         service = self.connect(HOST)
-        disks = service.QueryDisksForKova()["returnval"]
+        disks = service.QueryDisksForKova()["result"]
         parted = {"ssd": self.find(disks, FLASH).disk, "nonSsd": [self.find(disks, PARTED).disk]}
         answer = service.InitializeDisks(mappings=[parted])
         self.assertEqual(self.type_of(answer["fault"]), "DiskHasPartitions")
-        self.assertEqual(answer["returnval"][0].error.device, PARTED)
+        self.assertEqual(answer["result"][0].error.device, PARTED)
         with self.subTest("without a result"):
             fault = self.fault_of(service.InitializeDisks, mappings=[])
             self.assertEqual(self.type_of(fault), "InsufficientDisks")
@@ -137,14 +137,14 @@ class Story(ZeepTest):
         answer = service.AddAllEligibleDisks()
         self.assertEqual(self.type_of(answer["fault"]), "SystemError")
         self.assertEqual(answer["fault"].reason, "it does not answer")
-        self.assertEqual([result.error is None for result in answer["returnval"]], [True, False])
+        self.assertEqual([result.error is None for result in answer["result"]], [True, False])
         self.assertEqual(list(self.groups()), [FLASH])
 
     def test_a_disk_that_has_left(self):
         service = self.connect(HOST)
         service.AddAllEligibleDisks()
         self.assert_ended(self.ask_agent("sim", "set", "naa.c1", "--absent"), 0)
-        disks = service.QueryDisksForKova()["returnval"]
+        disks = service.QueryDisksForKova()["result"]
         gone = next(result for result in disks if result.disk.canonicalName.startswith("kova:"))
         self.assertEqual((gone.state, gone.disk.operationalState), ("inUse", ["error"]))
         self.assertEqual(self.groups()[FLASH], [gone.disk.canonicalName, "naa.c3"])
@@ -154,7 +154,7 @@ class Story(ZeepTest):
     def test_a_request_that_the_gate_refuses(self):
         service = self.connect(HOST)
         fault = self.fault_of(service.QueryDisksForKova, names=["naa.1\n"])
-        self.assertEqual((self.type_of(fault), fault.invalidProperty), ("InvalidArgument", "names[0]"))
+        self.assertEqual((self.type_of(fault), fault.argument), ("InvalidArgument", "names[0]"))
         self.assertEqual(self.type_of(self.fault_of(service.RemoveDisk, disk="naa.nothing")), "SystemError")
 
 

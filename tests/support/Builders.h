@@ -29,7 +29,7 @@ class AScsiDisk {
     _disk->SetDisplayName("Disk " + name);
     _disk->SetLunType(Nox::Host::ScsiLun::SCSILUNTYPE_DISK);
     _disk->SetOperationalState(
-        Tessa::MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{Nox::Host::ScsiLun::STATE_OK}));
+        Tessa::MakeRef<Orbis::TextList>(std::vector<std::string>{Nox::Host::ScsiLun::STATE_OK}));
     const auto capacity = Tessa::MakeRef<Nox::Host::DiskDimensions::Lba>();
     capacity->SetBlockSize(512);
     capacity->SetBlock(std::int64_t{1} << 31);

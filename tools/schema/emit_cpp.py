@@ -37,7 +37,7 @@ def referred(schema, f):
     if f.type == "base64":
         return "::Orbis::Binary"
     if f.type == "string":
-        return "::Orbis::ArrayOfString"
+        return "::Orbis::TextList"
     cpp = "::" + schema.types[f.type].cpp
     return f"::Orbis::DataArray<{cpp}>" if f.list else cpp
 
@@ -288,7 +288,7 @@ def messages(schema, origin):
         request.fields = o.parameters
         answer = Type(f"{o.name}Response", f"{request.cpp}Response", "DataObject", False, False, "Operations", origin)
         if o.returns:
-            answer.fields.append(Field("returnval", o.returns, not o.returns_list, o.returns_list))
+            answer.fields.append(Field("result", o.returns, not o.returns_list, o.returns_list))
         answer.fields.append(Field("fault", "MethodFault", True, False))
         types += [request, answer]
     return types

@@ -36,7 +36,7 @@ def complex_type(type_):
 
 def array_type(name, item):
     return [
-        f'  <xsd:complexType name="ArrayOf{name}"><xsd:sequence>',
+        f'  <xsd:complexType name="{name}List"><xsd:sequence>',
         f'    <xsd:element name="item" type="{item}" minOccurs="0" maxOccurs="unbounded"/>',
         "  </xsd:sequence></xsd:complexType>",
     ]
@@ -51,7 +51,7 @@ def operation_elements(operation):
     answer = []
     if operation.returns:
         many = ' maxOccurs="unbounded"' if operation.returns_list else ""
-        answer += [f'    <xsd:element name="returnval" type="nox:{operation.returns}" minOccurs="0"{many}/>']
+        answer += [f'    <xsd:element name="result" type="nox:{operation.returns}" minOccurs="0"{many}/>']
     answer += ['    <xsd:element name="fault" type="nox:MethodFault" minOccurs="0"/>']
     return wrapper(operation.name, request) + wrapper(f"{operation.name}Response", answer)
 
@@ -65,7 +65,7 @@ def xsd(schema):
         '  <xsd:element name="fault" type="nox:MethodFault"/>',
         '  <xsd:complexType name="DataObject" abstract="true"/>',
     ]
-    lines += array_type("String", "xsd:string")
+    lines += array_type("Text", "xsd:string")
     for type_ in schema.types.values():
         lines += complex_type(type_) + array_type(type_.name, f"nox:{type_.name}")
     for operation in schema.operations:

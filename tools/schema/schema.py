@@ -173,7 +173,7 @@ def _check_required(schema, type_):
 
 def _check(schema):
     for type_ in schema.types.values():
-        if type_.name in ("DataObject", "String") or type_.name.startswith("ArrayOf"):
+        if type_.name in ("DataObject", "Text") or type_.name.endswith("List"):
             raise SchemaError(f"{type_.name}: the name belongs to the binding itself")
         _check_base(schema, type_)
     for type_ in schema.types.values():

@@ -33,7 +33,7 @@ void GeneratePDLScsiDisk(const std::string& kovaUuid, bool ssd, Tessa::Ref<Nox::
   absent->SetDeviceType("unknown");
   absent->SetLunType(ScsiDisk::SCSILUNTYPE_UNKNOWN);
   absent->SetOperationalState(
-      Tessa::MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{ScsiDisk::STATE_ERROR}));
+      Tessa::MakeRef<Orbis::TextList>(std::vector<std::string>{ScsiDisk::STATE_ERROR}));
   absent->SetCapacity(Tessa::MakeRef<Nox::Host::DiskDimensions::Lba>());
   absent->SetSsd(ssd);
   absent->SetCanonicalName(Prefix() + kovaUuid);

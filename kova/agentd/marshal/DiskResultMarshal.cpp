@@ -66,7 +66,7 @@ Ref<ScsiDisk> CopyForResult(const Ref<ScsiDisk>& disk, const HostCtl::Kova::Disk
     copy->SetSsd(false);
   }
   if (record.reason == DiskReason::GroupNotMounted) {
-    copy->SetOperationalState(MakeRef<Orbis::ArrayOfString>(std::vector<std::string>{ScsiDisk::STATE_OFF}));
+    copy->SetOperationalState(MakeRef<Orbis::TextList>(std::vector<std::string>{ScsiDisk::STATE_OFF}));
   }
   return copy;
 }

@@ -148,9 +148,9 @@ TEST(FoldedFault, IsANewOneEachTimeAndReleasesTheOneBefore) {
 
 TEST(FoldedFault, DropsTypeFieldsAndCauseOfTheFirst) {
   Ref<MethodFault> first = AFault({"a"});
-  first->SetFaultCause(MakeRef<SystemError>("cause"));
+  first->SetCause(MakeRef<SystemError>("cause"));
   PrepareKovaDiskFault(AFault({"b"}), first);
-  EXPECT_FALSE(first->GetFaultCause());
+  EXPECT_FALSE(first->GetCause());
 }
 
 TEST(FoldedFault, TakesTheListOfTheFirstOverAsItIs) {

@@ -319,7 +319,7 @@ TEST_P(MissingGroups, AreNotFoundAndNothingIsRemoved) {
   EXPECT_THAT(_logger->Lines(LogLevel::Warning),
               ElementsAre(LogLineIs(LogLevel::Warning, notFound, GetParam().text)));
   EXPECT_THAT(Calls("RemoveDiskMapping"), IsEmpty());
-  EXPECT_FALSE(dynamic_cast<const InvalidArgument&>(*Fault()).HasInvalidProperty());
+  EXPECT_FALSE(dynamic_cast<const InvalidArgument&>(*Fault()).HasArgument());
   EXPECT_FALSE(IsCacheValid());
 }
 

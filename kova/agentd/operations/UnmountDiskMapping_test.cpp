@@ -170,7 +170,7 @@ TEST_F(Unmount, GoesOnAfterAGroupThatTheKernelDoesNotHave) {
   Run({_unknown, _second});
   EXPECT_THAT(ResultTexts(), ElementsAre("x: a !InvalidArgument", "s2: b"));
   ASSERT_THAT(Fault(), IsExactly<InvalidArgument>());
-  EXPECT_FALSE(dynamic_cast<const InvalidArgument&>(*Fault()).HasInvalidProperty());
+  EXPECT_FALSE(dynamic_cast<const InvalidArgument&>(*Fault()).HasArgument());
   EXPECT_THAT(TestSupport::MessageKeys(*Fault()), IsEmpty());
   EXPECT_THAT(Unmounts(), ElementsAre("UnmountDiskMapping(s2)"));
   EXPECT_THAT(_logger->Lines(),

@@ -249,7 +249,7 @@ TEST_F(GroupCheck, RefusesAGroupWithoutCapacityDisks) {
 TEST_F(GroupCheck, RefusesAnSsdThatIsNone) {
   const auto fault = Check(AMapping(Hdd("s"), {Hdd("a")}));
   ASSERT_THAT(fault, IsExactly<Orbis::Fault::InvalidArgument>());
-  EXPECT_FALSE(dynamic_cast<Orbis::Fault::InvalidArgument&>(*fault).HasInvalidProperty());
+  EXPECT_FALSE(dynamic_cast<Orbis::Fault::InvalidArgument&>(*fault).HasArgument());
   EXPECT_THAT(_logger->Lines(),
               ElementsAre(LogLineIs(LogLevel::Verbose, checking, "2"),
                           LogLineIs(LogLevel::Verbose, checkedUnique, "OK"),

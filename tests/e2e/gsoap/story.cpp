@@ -53,7 +53,7 @@ class Client {
   std::vector<ns1__KovaHostDiskResult*> Disks() {
     _ns1__QueryDisksForKova request;
     CHECK(_proxy.QueryDisksForKova(&request, _disks) == SOAP_OK);
-    return _disks.returnval;
+    return _disks.result;
   }
   ns1__KovaHostDiskResult* Disk(const std::string& name) {
     for (ns1__KovaHostDiskResult* result : Disks()) {
@@ -69,7 +69,7 @@ class Client {
     _ns1__GetStorageInfo request;
     CHECK(_proxy.GetStorageInfo(&request, _storage) == SOAP_OK);
     std::map<std::string, std::size_t> groups;
-    for (ns1__KovaHostDiskMapping* mapping : _storage.returnval->diskMapping) {
+    for (ns1__KovaHostDiskMapping* mapping : _storage.result->diskMapping) {
       groups[*mapping->ssd->canonicalName] = mapping->nonSsd.size();
     }
     return groups;
@@ -106,20 +106,20 @@ void TellTheStory(Client& client) {
   CHECK(parted != nullptr && parted->device != nullptr && *parted->device == "naa.p1");
 
   const auto& added = client.AddAll();
-  CHECK(added.fault == nullptr && added.returnval.size() == 2);
+  CHECK(added.fault == nullptr && added.result.size() == 2);
   CHECK((client.Groups() == Groups{{"naa.f1", 2}, {"naa.f2", 2}}));
 
   _ns1__GetConfigInfo configRequest;
   _ns1__GetConfigInfoResponse config;
   CHECK(client.Proxy().GetConfigInfo(&configRequest, config) == SOAP_OK);
-  CHECK(config.returnval->faultDomainInfo->name == "rack-1");
+  CHECK(config.result->faultDomainInfo->name == "rack-1");
 
-  ns1__KovaHostDiskMapping mapping = *added.returnval[0]->mapping;
+  ns1__KovaHostDiskMapping mapping = *added.result[0]->mapping;
   _ns1__UnmountDiskMapping unmount;
   unmount.mappings.push_back(&mapping);
   _ns1__UnmountDiskMappingResponse unmounted;
   CHECK(client.Proxy().UnmountDiskMapping(&unmount, unmounted) == SOAP_OK);
-  CHECK(unmounted.returnval.size() == 1 && unmounted.fault == nullptr);
+  CHECK(unmounted.result.size() == 1 && unmounted.fault == nullptr);
   CHECK((client.Groups() == Groups{{"naa.f2", 2}}));
 
   _ns1__ClaimUnmountedDiskgroup claim;
@@ -153,7 +153,7 @@ void MeetAPartitionedDisk(Client& client) {
   request.mappings.push_back(&mapping);
   _ns1__InitializeDisksResponse response;
   CHECK(client.Proxy().InitializeDisks(&request, response) == SOAP_OK);
-  CHECK(response.returnval.size() == 1);
+  CHECK(response.result.size() == 1);
   CHECK(dynamic_cast<ns1__DiskHasPartitions*>(response.fault) != nullptr);
 
   request.mappings.clear();
@@ -163,8 +163,8 @@ void MeetAPartitionedDisk(Client& client) {
 
 void FailInPart(Client& client) {
   const auto& added = client.AddAll();
-  CHECK(added.returnval.size() == 2);
-  CHECK(added.returnval[0]->error == nullptr && added.returnval[1]->error != nullptr);
+  CHECK(added.result.size() == 2);
+  CHECK(added.result[0]->error == nullptr && added.result[1]->error != nullptr);
   const auto* const fault = dynamic_cast<ns1__SystemError*>(added.fault);
   CHECK(fault != nullptr && fault->reason == "it does not answer");
 }

@@ -30,7 +30,7 @@ HttpAnswer Xml(unsigned status) {
 template <class Response, class Result>
 Ref<Orbis::DataObject> Respond(const Host::Answer& answer) {
   const auto response = MakeRef<Response>();
-  response->SetReturnval(Tessa::NarrowToType<Result>(answer.result));
+  response->SetResult(Tessa::NarrowToType<Result>(answer.result));
   response->SetFault(answer.fault);
   return response;
 }

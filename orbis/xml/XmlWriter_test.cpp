@@ -14,6 +14,7 @@
 #include <string_view>
 
 #include "orbis/xml/XmlReader.h"
+#include "tests/support/Seed.h"
 
 namespace Orbis::Xml {
 namespace {
@@ -219,9 +220,8 @@ std::string AnyText(std::mt19937& random) {
 }
 
 TEST(XmlWriter, WhateverIsWrittenIsReadBackCleaned) {
-  const std::uint32_t seed = std::random_device{}();
-  SCOPED_TRACE("seed " + std::to_string(seed));
-  std::mt19937 random(seed);
+  const TestSupport::Seed seed;
+  std::mt19937 random(seed.Value());
   for (int round = 0; round < 20'000 && !HasFailure(); ++round) {
     ExpectReadBack(AnyText(random));
   }

@@ -7,6 +7,7 @@
 
 #include "otxctl/sim/CleanText.h"
 #include "otxctl/sim/HostBuilder.h"
+#include "tests/support/Seed.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -129,8 +130,8 @@ TEST(HostDescription, NothingIsWrittenThatIsNoUtf8) {
 
 // Random hosts, so that no key is forgotten by one of the two directions.
 TEST(HostDescription, RandomHostsSurviveTheRoundTrip) {
-  const unsigned seed = 20240117;
-  std::mt19937 random(seed);
+  const TestSupport::Seed seed;
+  std::mt19937 random(seed.Value());
   const auto pick = [&random](int limit) { return std::uniform_int_distribution<int>(0, limit)(random); };
   for (int round = 0; round < 100; ++round) {
     HostBuilder builder;
@@ -155,8 +156,7 @@ TEST(HostDescription, RandomHostsSurviveTheRoundTrip) {
       builder.WithGroup("naa.0", {"naa.2", "naa.1"}, [&](HostGroup& group) { group.mounted = pick(1) == 1; });
     }
     const HostDescription host = builder.Build();
-    ASSERT_EQ(ParseHostDescription(WriteHostDescription(host)), host)
-        << "seed " << seed << " round " << round;
+    ASSERT_EQ(ParseHostDescription(WriteHostDescription(host)), host) << "round " << round;
   }
 }
 

@@ -1,7 +1,7 @@
 // Random objects of every type through both texts and back.
 //
 // Each object is made from a seed of its own; a failure prints the seed of the shortest text that went
-// wrong. KOVA_TEST_SEED=<n> in the environment starts elsewhere.
+// wrong. KOVA_SEED=<n> in the environment starts elsewhere.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -31,7 +31,7 @@ using ::testing::IsEmpty;
 constexpr std::uint64_t objectCount = 4'000;
 
 std::uint64_t FirstSeed() {
-  const char* const given = std::getenv("KOVA_TEST_SEED");
+  const char* const given = std::getenv("KOVA_SEED");
   return given == nullptr ? 1 : std::strtoull(given, nullptr, 10);
 }
 

@@ -14,6 +14,7 @@
 
 #include "otxctl/sim/HostBuilder.h"
 #include "tests/integration/HostedPlugin.h"
+#include "tests/support/Seed.h"
 
 namespace Integration {
 namespace {
@@ -104,12 +105,13 @@ HostDescription ABusyHost() {
 TEST(Concurrency, EightThreadsOfMixedRequestsLeaveASoundHostAndSoundLocks) {
   constexpr int threadCount = 8;
   constexpr int rounds = 60;
+  const TestSupport::Seed seed;
   HostedPlugin plugin(ABusyHost());
   std::atomic<int> answered{0};
   std::vector<std::thread> threads;
   for (int number = 0; number < threadCount; ++number) {
-    threads.emplace_back([&plugin, &answered, number] {
-      RequestDraw draw(static_cast<unsigned>(number));
+    threads.emplace_back([&plugin, &answered, number, first = seed.Value()] {
+      RequestDraw draw(first + static_cast<unsigned>(number));
       for (int round = 0; round < rounds; ++round) {
         const Request request = draw.Next(plugin.Host().Snapshot());
         const Answer answer = plugin.Run(request);
@@ -123,6 +125,7 @@ TEST(Concurrency, EightThreadsOfMixedRequestsLeaveASoundHostAndSoundLocks) {
   for (std::thread& thread : threads) {
     thread.join();
   }
+  EXPECT_FALSE(testing::Test::HasFailure()) << "in one of the threads";
   EXPECT_EQ(answered, threadCount * rounds);
   EXPECT_THAT(plugin.Locks().Mistakes(), IsEmpty());
   int formats = 0;

@@ -4,7 +4,7 @@
 // model's, and what no host may ever look like is looked for. A sequence that fails is cut down as long as it
 // fails, and printed with the seed that brings it back:
 //
-//   KOVA_MODEL_SEED=4711 KOVA_MODEL_REQUESTS=100000 model_check_test
+//   KOVA_SEED=4711 KOVA_MODEL_REQUESTS=100000 model_check_test
 
 #include <gtest/gtest.h>
 
@@ -269,7 +269,7 @@ void Report(const Sequence& sequence, unsigned seed) {
     text << index + 1 << ". " << shortest.steps[index] << "\n";
   }
   Tally dropped;
-  ADD_FAILURE() << "KOVA_MODEL_SEED=" << seed << " brings this back\n"
+  ADD_FAILURE() << "KOVA_SEED=" << seed << " brings this back\n"
                 << HostText(shortest.host) << text.str() << RunSequence(shortest, dropped);
 }
 
@@ -290,8 +290,8 @@ void ExpectWorthwhile(const Tally& tally) {
 
 TEST(ModelCheck, EveryRequestLeavesTheHostThatTheModelForetells) {
   const unsigned long requests = FromEnvironment("KOVA_MODEL_REQUESTS", 10000);
-  const auto firstSeed = static_cast<unsigned>(FromEnvironment("KOVA_MODEL_SEED", std::random_device()()));
-  std::cout << "KOVA_MODEL_SEED=" << firstSeed << std::endl;
+  const auto firstSeed = static_cast<unsigned>(FromEnvironment("KOVA_SEED", std::random_device()()));
+  std::cout << "KOVA_SEED=" << firstSeed << std::endl;
   Tally tally;
   unsigned seed = firstSeed;
   while (static_cast<unsigned long>(tally.requests) < requests) {

@@ -18,6 +18,7 @@
 #include "tests/support/PlainRules.h"
 #include "tests/support/PluginFixture.h"
 #include "tests/support/RandomHosts.h"
+#include "tests/support/Seed.h"
 
 namespace Kovasvc {
 namespace {
@@ -99,8 +100,8 @@ class Planning : public TestSupport::PluginFixture {
   // something hold the mark; too few of them, and the hosts are not worth the test.
   template <class Compare>
   void CheckOnRandomHosts(const std::string& mark, Compare compare) {
-    const unsigned seed = std::random_device()();
-    TestSupport::HostDraw draw(seed);
+    const TestSupport::Seed seed;
+    TestSupport::HostDraw draw(seed.Value());
     int throwing = 0;
     int telling = 0;
     for (int round = 0; round < 3000; ++round) {
@@ -114,14 +115,14 @@ class Planning : public TestSupport::PluginFixture {
           return smallerComparison.actual != smallerComparison.expected;
         });
         comparison = compare(host);
-        FAIL() << "seed " << seed << ", round " << round << "\n"
+        FAIL() << "round " << round << "\n"
                << host << "\nactual   " << comparison.actual << "\nexpected " << comparison.expected;
       }
       _timeline.Take();
       _kernel.ForgetCalls();
     }
-    EXPECT_GT(throwing, 20) << "seed " << seed;
-    EXPECT_GT(telling, 150) << "seed " << seed;
+    EXPECT_GT(throwing, 20);
+    EXPECT_GT(telling, 150);
   }
 
   Ref<KovaManagerImpl> _manager;
@@ -258,10 +259,10 @@ TEST_F(Planning, ChecksRequestsByThePlainRules) {
 
 // New groups and extensions of a host whose disks are all different.
 TEST_F(Planning, UsesNoDiskTwiceKeepsTheLimitsAndStaysLevel) {
-  const unsigned seed = std::random_device()();
-  std::mt19937 random(seed);
+  const TestSupport::Seed seed;
+  std::mt19937 random(seed.Value());
   for (int round = 0; round < 2000; ++round) {
-    SCOPED_TRACE("seed " + std::to_string(seed) + ", round " + std::to_string(round));
+    SCOPED_TRACE("round " + std::to_string(round));
     Disks candidates = TestSupport::operator+(TestSupport::Ssds("s", static_cast<int>(random() % 8)),
                                               TestSupport::Hdds("c", static_cast<int>(random() % 50)));
     std::shuffle(candidates.begin(), candidates.end(), random);

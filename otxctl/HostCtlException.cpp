@@ -19,8 +19,10 @@ const char* HostCtlException::what() const noexcept {
   return _message.c_str();
 }
 
-KovaStorageException::KovaStorageException(std::string message, std::string diskName)
-    : HostCtlException(std::move(message)), _diskName(std::move(diskName)) {}
+KovaStorageException::KovaStorageException(std::string message, std::string diskName, std::string detail,
+                                           EvtMessage event)
+    : HostCtlException(std::move(message), std::move(detail), std::move(event)),
+      _diskName(std::move(diskName)) {}
 
 KovaStorageException::KovaStorageException(const KovaStorageException&) = default;
 KovaStorageException& KovaStorageException::operator=(const KovaStorageException&) = default;

@@ -18,7 +18,7 @@ TEST(HostCtlException, SaysItsMessageInEveryWay) {
 }
 
 TEST(HostCtlException, KeepsEverythingWhenCopiedAndAssigned) {
-  const KovaStorageException original("busy", "naa.1");
+  const KovaStorageException original("busy", "naa.1", "detail", EvtMessage{"evt.1", {"a", "b"}});
   const KovaStorageException copy(original);
   KovaStorageException assigned("other", "naa.2");
   assigned = original;
@@ -26,6 +26,9 @@ TEST(HostCtlException, KeepsEverythingWhenCopiedAndAssigned) {
   for (const KovaStorageException* const one : copies) {
     EXPECT_STREQ(one->what(), "busy");
     EXPECT_EQ(one->GetDiskName(), "naa.1");
+    EXPECT_EQ(one->GetDetail(), "detail");
+    EXPECT_EQ(one->GetEvent().id, "evt.1");
+    EXPECT_EQ(one->GetEvent().arguments, original.GetEvent().arguments);
   }
 }
 
@@ -45,6 +48,21 @@ TYPED_TEST(DiskException, IsCaughtAsAStorageExceptionWithItsDisk) {
     EXPECT_STREQ(caught.what(), "no");
     EXPECT_EQ(caught.GetDiskName(), "naa.7");
   }
+}
+
+TYPED_TEST(DiskException, CarriesTheDetailAndTheEventOfItsFailure) {
+  const TypeParam exception("no", "naa.7", "the second text", EvtMessage{"evt.2", {"c"}});
+  EXPECT_EQ(exception.GetDiskName(), "naa.7");
+  EXPECT_EQ(exception.GetDetail(), "the second text");
+  EXPECT_EQ(exception.GetEvent().id, "evt.2");
+  EXPECT_EQ(exception.GetEvent().arguments, std::vector<std::string>{"c"});
+}
+
+TYPED_TEST(DiskException, HasNoDetailAndNoEventUnlessItIsGivenThem) {
+  const TypeParam exception("no", "naa.7");
+  EXPECT_EQ(exception.GetDetail(), "");
+  EXPECT_EQ(exception.GetEvent().id, "");
+  EXPECT_TRUE(exception.GetEvent().arguments.empty());
 }
 
 TEST(IncompatibleDiskMapping, IsNoStorageExceptionOnPurpose) {

@@ -41,7 +41,8 @@ class HOSTCTL_API HostCtlException : public std::exception {
 // A failure that concerns one disk.
 class HOSTCTL_API KovaStorageException : public HostCtlException {
  public:
-  KovaStorageException(std::string message, std::string diskName);
+  KovaStorageException(std::string message, std::string diskName, std::string detail = {},
+                       EvtMessage event = {});
   KovaStorageException(const KovaStorageException&);
   KovaStorageException& operator=(const KovaStorageException&);
   ~KovaStorageException() override;

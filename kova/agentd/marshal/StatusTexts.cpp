@@ -4,6 +4,7 @@
 #include <iterator>
 
 // Row n is the text of status 0x0BAD0000 + n. Blanks at the end of a text are part of it.
+// Nobody has said what 233, 295, 304 and 305 mean, so their texts name no cause.
 const char* const returnStatusStrs[342] = {
     /*   0 */ "Success",
     /*   1 */ "Failure",
@@ -238,7 +239,7 @@ const char* const returnStatusStrs[342] = {
     /* 230 */ "Cached metadata is stale",
     /* 231 */ "No fcntl lock slot left",
     /* 232 */ "No fcntl lock holder slot left",
-    /* 233 */ "No free lock table entry",
+    /* 233 */ "Status 233",
     /* 234 */ "Ostrax module necessary for this qsi call not loaded",
     /* 235 */ "Transient LVM device condition, suggest retry",
     /* 236 */ "Snapshot LV incomplete",
@@ -300,7 +301,7 @@ const char* const returnStatusStrs[342] = {
     /* 292 */ "Atomic test and set of disk block returned false for equality",
     /* 293 */ "No buffer space available",
     /* 294 */ "FT vm is not enabled",
-    /* 295 */ "Virtual machine state is not consistent",
+    /* 295 */ "Status 295",
     /* 296 */ "ELF file contains invalid relocation types",
     /* 297 */ "Message too long",
     /* 298 */ "Invalid or missing namespace",
@@ -309,8 +310,8 @@ const char* const returnStatusStrs[342] = {
     /* 301 */ "IO was aborted by Tafs via a virt-reset on the device",
     /* 302 */ "Write not allowed on tardisks",
     /* 303 */ "Re-issue IO at a later time",
-    /* 304 */ "Device is temporarily unavailable",
-    /* 305 */ "Path to the device is lost",
+    /* 304 */ "Status 304",
+    /* 305 */ "Status 305",
     /* 306 */ "Device is permanently unavailable",
     /* 307 */ "Reissue IO at a later time for SE disks",
     /* 308 */ "Address space type is not supported for operation",
@@ -355,7 +356,7 @@ const char* OTX_ReturnStatusToString(OTX_ReturnStatus status) {
   if (status > lastKernelStatus) {
     return "Opaque service console status";
   }
-  // The base itself is not reduced, so it is unknown; small numbers count as rows. Both are wanted.
+  // The base itself is not reduced, so it is unknown; small numbers count as rows.
   const std::uint32_t row =
       static_cast<std::uint32_t>(status >= firstFailure ? status - (firstFailure - 1) : status);
   return row < std::size(returnStatusStrs) ? returnStatusStrs[row] : "Unknown status";

@@ -48,8 +48,8 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
 
   // The order of these operations is that of the operation table and must not change. A text of a request
   // that is not of the wanted type ends the process; one that cannot be read throws Orbis::ParseException. A
-  // disk without a name throws Tessa::NotInitializedException. `requestTag` goes down to the kernel unread
-  // where groups are made, and nowhere else.
+  // null group or a disk without a name throws Tessa::NotInitializedException. `requestTag` goes down to the
+  // kernel unread where groups are made, and nowhere else.
 
   // Plans disk groups from the disks and makes them, and mounts the groups that the disks already form. The
   // result is a list of KovaHostDiskMapResult, one per group; the fault tells what failed of it, or why

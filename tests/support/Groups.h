@@ -62,10 +62,14 @@ inline std::string GroupText(const Nox::Kova::Host::DiskMapping& mapping) {
   }
   return text;
 }
+// The same, or "null".
+inline std::string GroupText(const Nox::Kova::Host::DiskMapping* mapping) {
+  return mapping != nullptr ? GroupText(*mapping) : "null";
+}
 inline std::vector<std::string> GroupTexts(const Orbis::DataArray<Nox::Kova::Host::DiskMapping>& mappings) {
   std::vector<std::string> texts;
   for (const Nox::Kova::Host::DiskMapping* mapping : mappings) {
-    texts.push_back(GroupText(*mapping));
+    texts.push_back(GroupText(mapping));
   }
   return texts;
 }

@@ -36,7 +36,7 @@ class SpyManager final : public Kovasvc::KovaManagerImpl {
 
   void InitializeDisksInt(Orbis::DataArray<Mapping>* mappings, const std::string& requestTag,
                           Tessa::Ref<Orbis::Any>& result, Fault& fault) override {
-    calls.push_back("InitializeDisksInt(" + List(GroupTexts(*mappings)) + ", " + requestTag + ")");
+    calls.push_back("InitializeDisksInt(" + List(mappings) + ", " + requestTag + ")");
     if (initializeDisksInt) {
       initializeDisksInt(result, fault);
     } else {
@@ -44,7 +44,7 @@ class SpyManager final : public Kovasvc::KovaManagerImpl {
     }
   }
   void ValidateDiskMapping(MappingRef mapping, MapResultRef& result) override {
-    calls.push_back("ValidateDiskMapping(" + GroupText(*mapping) + ")");
+    calls.push_back("ValidateDiskMapping(" + GroupText(mapping.Get()) + ")");
     if (validateDiskMapping) {
       validateDiskMapping(mapping, result);
     } else {
@@ -52,7 +52,7 @@ class SpyManager final : public Kovasvc::KovaManagerImpl {
     }
   }
   void ValidateDiskMappings(Orbis::DataArray<Mapping>* mappings) override {
-    calls.push_back("ValidateDiskMappings(" + List(GroupTexts(*mappings)) + ")");
+    calls.push_back("ValidateDiskMappings(" + List(mappings) + ")");
     if (validateDiskMappings) {
       validateDiskMappings();
     } else {
@@ -60,7 +60,7 @@ class SpyManager final : public Kovasvc::KovaManagerImpl {
     }
   }
   bool DiskMappingExists(MappingRef mapping) override {
-    calls.push_back("DiskMappingExists(" + GroupText(*mapping) + ")");
+    calls.push_back("DiskMappingExists(" + GroupText(mapping.Get()) + ")");
     return diskMappingExists ? diskMappingExists() : KovaManagerImpl::DiskMappingExists(mapping);
   }
   void FormatDiskMapping(const std::string& ssdName, Texts& nonSsdNames, const std::string& requestTag,
@@ -83,7 +83,7 @@ class SpyManager final : public Kovasvc::KovaManagerImpl {
   }
   void InitializeMapping(MappingRef mapping, const std::string& requestTag, int mappingCount,
                          int mappingIndex, MapResultRef& result) override {
-    calls.push_back("InitializeMapping(" + GroupText(*mapping) + ", " + requestTag + ", " +
+    calls.push_back("InitializeMapping(" + GroupText(mapping.Get()) + ", " + requestTag + ", " +
                     std::to_string(mappingCount) + ", " + std::to_string(mappingIndex) + ")");
     if (initializeMapping) {
       initializeMapping(mapping, result);
@@ -92,7 +92,7 @@ class SpyManager final : public Kovasvc::KovaManagerImpl {
     }
   }
   void UnmountDiskMappingInt(MappingRef& mapping, const std::string& requestTag, Fault& fault) override {
-    calls.push_back("UnmountDiskMappingInt(" + GroupText(*mapping) + ", " + requestTag + ")");
+    calls.push_back("UnmountDiskMappingInt(" + GroupText(mapping.Get()) + ", " + requestTag + ")");
     if (unmountDiskMappingInt) {
       unmountDiskMappingInt(mapping, fault);
     } else {
@@ -101,6 +101,9 @@ class SpyManager final : public Kovasvc::KovaManagerImpl {
   }
 
  private:
+  static std::string List(const Orbis::DataArray<Mapping>* mappings) {
+    return mappings != nullptr ? List(GroupTexts(*mappings)) : "null";
+  }
   static std::string List(const std::vector<std::string>& parts) {
     std::string text;
     for (const std::string& part : parts) {

@@ -71,6 +71,9 @@ void MarshalNetworkInfo(Logger& logger, KovaInfo& provider, Ref<ConfigInfo>& con
     if (!nics.Records().empty()) {
       const auto ports = MakeRef<DataArray<PortConfig>>();
       for (const KovaOtxNicConfig* nic : nics.Records()) {
+        if (nic == nullptr) {
+          continue;
+        }
         try {
           ports->Append(ToPort(*nic));
         } catch (const HostCtlException& exception) {

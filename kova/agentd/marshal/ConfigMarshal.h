@@ -16,7 +16,7 @@ namespace Kovasvc {
 void MarshalClusterInfo(Tessa::Service::Logger& logger, HostCtl::Kova::KovaInfo& provider,
                         Tessa::Ref<Nox::Kova::Host::ConfigInfo>& config);
 
-// An interface that fails is left out with a warning; the others stay.
+// An interface that fails is left out with a warning, a null one without a word; the others stay.
 void MarshalNetworkInfo(Tessa::Service::Logger& logger, HostCtl::Kova::KovaInfo& provider,
                         Tessa::Ref<Nox::Kova::Host::ConfigInfo>& config);
 

@@ -50,10 +50,17 @@ class FakeNic final : public KovaOtxNicConfig {
     KovaIpAddress agent;
     Getter failing = Getter::None;
     std::function<void()> raise = nullptr;
+    std::function<void(Getter)> onRead = nullptr;
+    std::function<void()> onEnd = nullptr;
   };
 
   FakeNic(Setup setup, std::vector<std::string>& journal) : _setup(std::move(setup)), _journal(journal) {}
-  ~FakeNic() override { _journal.push_back("delete " + _setup.name); }
+  ~FakeNic() override {
+    _journal.push_back("delete " + _setup.name);
+    if (_setup.onEnd) {
+      _setup.onEnd();
+    }
+  }
 
   std::string GetOtxnicName() const override {
     Begin(Getter::Name);
@@ -70,6 +77,9 @@ class FakeNic final : public KovaOtxNicConfig {
 
  private:
   void Begin(Getter getter) const {
+    if (_setup.onRead) {
+      _setup.onRead(getter);
+    }
     if (getter == _setup.failing) {
       _setup.raise();
     }
@@ -183,6 +193,25 @@ TEST_F(NetworkMarshalling, TakesTheFamilyOfEachGroupByItself) {
   EXPECT_THAT(Ports(), ElementsAre("otx0 ff19::1 224.2.3.4", "otx1 224.1.2.3 ff19::2"));
 }
 
+TEST_F(NetworkMarshalling, ReadsTheMasterGroupThenTheAgentGroupThenTheName) {
+  std::vector<FakeNic::Getter> read;
+  FakeNic::Setup nic = {"otx0", Ipv4("224.1.2.3"), Ipv4("224.2.3.4")};
+  nic.onRead = [&read](FakeNic::Getter getter) { read.push_back(getter); };
+  SetNics({nic});
+  Marshal();
+  EXPECT_THAT(read, ElementsAre(FakeNic::Getter::Master, FakeNic::Getter::Agent, FakeNic::Getter::Name));
+}
+
+TEST_F(NetworkMarshalling, FreesTheInterfacesBeforeItTellsThem) {
+  bool wasTold = true;
+  FakeNic::Setup nic = {"otx0", Ipv4("224.1.2.3"), Ipv4("224.2.3.4")};
+  nic.onEnd = [&] { wasTold = static_cast<bool>(_config->GetNetworkInfo()); };
+  SetNics({nic});
+  Marshal();
+  EXPECT_FALSE(wasTold);
+  EXPECT_TRUE(_config->GetNetworkInfo());
+}
+
 TEST_F(NetworkMarshalling, HasNetworkInfoWithoutPortsWhenThereAreNoInterfaces) {
   SetNics({});
   Marshal();
@@ -210,6 +239,18 @@ TEST_F(NetworkMarshalling, HasAnEmptyListWhenEveryInterfaceFails) {
   Marshal();
   ASSERT_TRUE(_config->GetNetworkInfo()->GetPort());
   EXPECT_THAT(Ports(), IsEmpty());
+}
+
+TEST_F(NetworkMarshalling, PassesOverANullInterfaceWithoutAWord) {
+  SetNics({{"otx0", Ipv4("1"), Ipv4("2")}, {"otx1", Ipv4("3"), Ipv4("4")}});
+  _kernel.makeNics = [make = _kernel.makeNics] {
+    std::vector<KovaOtxNicConfig*> nics = make();
+    nics.insert(nics.begin() + 1, nullptr);
+    return nics;
+  };
+  Marshal();
+  EXPECT_THAT(Ports(), ElementsAre("otx0 1 2", "otx1 3 4"));
+  EXPECT_THAT(_logger->Lines(), IsEmpty());
 }
 
 TEST_F(NetworkMarshalling, FreesTheInterfacesBeforeItLetsAnotherExceptionOut) {

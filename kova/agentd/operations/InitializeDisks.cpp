@@ -52,7 +52,7 @@ void KovaManagerImpl::InitializeDisksInt(DataArray<DiskMapping>* mappings, const
   Ref<MethodFault> combined;
   try {
     ValidateDiskMappings(mappings);
-    const int count = static_cast<int>(mappings->Size());
+    const int count = mappings != nullptr ? static_cast<int>(mappings->Size()) : 0;
     for (int index = 0; index < count; ++index) {
       auto mapResult = MakeRef<DiskMapResult>();
       InitializeMapping(Ref<DiskMapping>((*mappings)[index]), requestTag, count, index, mapResult);
@@ -79,8 +79,8 @@ void KovaManagerImpl::InitializeMapping(Ref<DiskMapping> mapping, const std::str
   Ref<MethodFault> refused;
   // A group that is off-line, or whose cache disk has left, is restamped.
   AskKernel(*_logger, "Error formatting KOVA disks: %1", refused, [&] {
-    const std::string ssdName = NameOf(mapping->GetSsd().Get());
-    Texts capacityNames = NamesOf(mapping->GetNonSsd().Get());
+    const std::string ssdName = SsdNameOf(mapping.Get());
+    Texts capacityNames = CapacityNamesOf(mapping.Get());
     if (IsOffline(ssdName) || IsPDLDiskInput(ssdName)) {
       RestampDiskMapping(ssdName, capacityNames);
     } else {

@@ -65,14 +65,14 @@ void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::s
   {
     const LockGuard guard(*_operationLock);
     RefreshKovaDiskCache();
-    const std::string ssdName = NameOf(group->GetSsd().Get());
+    const std::string ssdName = SsdNameOf(group.Get());
     LogOneDiskMapping(*_logger, group);
     if (IsPDLDiskInput(ssdName)) {
       // A group whose cache disk has left is not looked for.
       AskKernel(*_logger, "Error removing PDL'd KOVA disk mapping: %1", fault,
                 [&] { _provider->RemoveDiskByUuid(UuidOfAbsentDisk(ssdName), passThrough); });
     } else if (!DiskMappingExists(group)) {
-      const std::string text = "SSD: " + ssdName + ", Disks: " + JoinNames(NamesOf(group->GetNonSsd().Get()));
+      const std::string text = "SSD: " + ssdName + ", Disks: " + JoinNames(CapacityNamesOf(group.Get()));
       LogInternal(_logger, LogLevel::Warning, "Failed to validate existing disk mapping: %1", text);
       fault = MappingNotFound(text);
     } else {

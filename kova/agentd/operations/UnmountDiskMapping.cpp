@@ -60,7 +60,7 @@ void KovaManagerImpl::UnmountDiskMapping(const Texts& mappings, const std::strin
 void KovaManagerImpl::UnmountDiskMappingInt(Ref<DiskMapping>& mapping, const std::string&,
                                             Ref<MethodFault>& fault) {
   const LockGuard guard(*_operationLock);
-  const std::string ssdName = NameOf(mapping->GetSsd().Get());
+  const std::string ssdName = SsdNameOf(mapping.Get());
   if (!DiskMappingExists(mapping)) {
     LogInternal(_logger, LogLevel::Verbose, "Failed to validate existing disk mapping:");
     fault = MakeRef<Orbis::Fault::InvalidArgument>();

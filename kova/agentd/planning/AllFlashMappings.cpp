@@ -74,7 +74,7 @@ void KovaManagerImpl::ComputeAllFlashDiskMappings(DataArray<ScsiDisk>* candidate
                 flash->Size());
     LogDiskMappings(*_logger, planned.Get());
     for (const DiskMapping* mapping : *planned) {
-      takenNames.push_back(NameOf(mapping->GetSsd().Get()));
+      takenNames.push_back(SsdNameOf(mapping));
     }
   } catch (const MethodFault::Exception& exception) {
     LogInternal(_logger, LogLevel::Verbose, "Got fault %1", exception.what());

@@ -28,6 +28,21 @@ bool IsSsd(const ScsiDisk* disk) {
   return disk->GetSsd();
 }
 
+const DiskMapping& Existing(const DiskMapping* mapping) {
+  if (mapping == nullptr) {
+    NotInitializedException::ThrowNotInitialized();
+  }
+  return *mapping;
+}
+
+const std::string& SsdNameOf(const DiskMapping* mapping) {
+  return NameOf(Existing(mapping).GetSsd().Get());
+}
+
+std::vector<std::string> CapacityNamesOf(const DiskMapping* mapping) {
+  return NamesOf(Existing(mapping).GetNonSsd().Get());
+}
+
 std::string NameForLog(const ScsiDisk* disk) {
   return disk != nullptr && disk->HasCanonicalName() ? disk->GetCanonicalName() : "<unset>";
 }
@@ -51,16 +66,17 @@ std::string JoinNames(const std::vector<std::string>& names) {
   return joined;
 }
 
-void AppendDeviceNames(const DiskMapping& mapping, std::vector<std::string_view>& names) {
+void AppendDeviceNames(const DiskMapping* mapping, std::vector<std::string_view>& names) {
   const auto appendNameOf = [&names](const ScsiDisk* disk) {
     const std::string& name = NameOf(disk);
     if (!name.empty()) {
       names.push_back(name);
     }
   };
-  appendNameOf(mapping.GetSsd().Get());
-  if (mapping.GetNonSsd()) {
-    for (const ScsiDisk* disk : *mapping.GetNonSsd()) {
+  const DiskMapping& group = Existing(mapping);
+  appendNameOf(group.GetSsd().Get());
+  if (group.GetNonSsd()) {
+    for (const ScsiDisk* disk : *group.GetNonSsd()) {
       appendNameOf(disk);
     }
   }
@@ -68,7 +84,7 @@ void AppendDeviceNames(const DiskMapping& mapping, std::vector<std::string_view>
 
 void DiskMappingToDeviceNames(const Tessa::Ref<DiskMapping>& mapping, std::vector<std::string>& names) {
   std::vector<std::string_view> own;
-  AppendDeviceNames(*mapping, own);
+  AppendDeviceNames(mapping.Get(), own);
   names.insert(names.end(), own.begin(), own.end());
   std::sort(names.begin(), names.end());
 }
@@ -79,8 +95,8 @@ void LogDiskMappings(Tessa::Service::Logger& logger, const DataArray<DiskMapping
   }
   std::size_t index = 0;
   for (const DiskMapping* mapping : *mappings) {
-    const std::string& ssd = NameOf(mapping->GetSsd().Get());
-    const std::string disks = JoinNames(NamesOf(mapping->GetNonSsd().Get()));
+    const std::string& ssd = SsdNameOf(mapping);
+    const std::string disks = JoinNames(CapacityNamesOf(mapping));
     LogInternal(logger, LogLevel::Verbose, "%1: Mapping[%2]: { SSD: %3, MDs: %4 }", "LogDiskMappings", index,
                 ssd, disks);
     ++index;

@@ -1,6 +1,6 @@
 // What several operations do with disk groups of the management API.
 //
-// Threads: any. Reading a disk without a canonical name, or a null disk, throws
+// Threads: any. Reading a disk without a canonical name, a null disk or a null group throws
 // Tessa::NotInitializedException.
 #pragma once
 
@@ -19,6 +19,12 @@ namespace Kovasvc {
 const std::string& NameOf(const Nox::Host::ScsiDisk* disk);
 // Whether it is a flash disk.
 bool IsSsd(const Nox::Host::ScsiDisk* disk);
+// The group itself, for reading; a null one ends here.
+const Nox::Kova::Host::DiskMapping& Existing(const Nox::Kova::Host::DiskMapping* mapping);
+// The canonical name of the group's cache disk.
+const std::string& SsdNameOf(const Nox::Kova::Host::DiskMapping* mapping);
+// The canonical names of the group's capacity disks, in order.
+std::vector<std::string> CapacityNamesOf(const Nox::Kova::Host::DiskMapping* mapping);
 // The canonical name, or "<unset>", for messages.
 std::string NameForLog(const Nox::Host::ScsiDisk* disk);
 // The canonical names of the disks, in order. A null array has none.
@@ -28,7 +34,7 @@ std::string JoinNames(const std::vector<std::string>& names);
 
 // Appends the canonical names of the group's disks, the cache disk's first; empty ones are left out. The
 // names stay the disks'.
-void AppendDeviceNames(const Nox::Kova::Host::DiskMapping& mapping, std::vector<std::string_view>& names);
+void AppendDeviceNames(const Nox::Kova::Host::DiskMapping* mapping, std::vector<std::string_view>& names);
 
 // Appends the same names, copied, and sorts the whole list by bytes. Duplicates are kept.
 void DiskMappingToDeviceNames(const Tessa::Ref<Nox::Kova::Host::DiskMapping>& mapping,

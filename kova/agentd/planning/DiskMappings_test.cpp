@@ -115,7 +115,7 @@ TEST(DiskMappingToDeviceNames, NeedsANameOfEveryDisk) {
 TEST(AppendDeviceNames, KeepsTheOrderOfTheGroup) {
   std::vector<std::string_view> names = {"n"};
   const auto mapping = AMapping(AScsiDisk("m"), {AScsiDisk("z"), AScsiDisk(""), AScsiDisk("a")});
-  AppendDeviceNames(*mapping, names);
+  AppendDeviceNames(mapping.Get(), names);
   EXPECT_THAT(names, ElementsAre("n", "m", "z", "a"));
 }
 

@@ -66,8 +66,8 @@ Ref<DiskMapping> FromInventory(const HostCtl::Kova::DiskMapping& group, const Di
 }  // namespace
 
 bool KovaManagerImpl::DiskMappingExists(Ref<DiskMapping> mapping) {
-  const std::string ssd = NameOf(mapping->GetSsd().Get());
-  const Texts names = NamesOf(mapping->GetNonSsd().Get());
+  const std::string ssd = SsdNameOf(mapping.Get());
+  const Texts names = CapacityNamesOf(mapping.Get());
   if (names.empty()) {
     return false;
   }

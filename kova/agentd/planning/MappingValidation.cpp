@@ -86,7 +86,7 @@ void KovaManagerImpl::ValidateDiskMappings(DataArray<DiskMapping>* mappings) {
   std::vector<std::string_view> names;
   if (mappings != nullptr) {
     for (const DiskMapping* mapping : *mappings) {
-      AppendDeviceNames(*mapping, names);
+      AppendDeviceNames(mapping, names);
     }
   }
   if (names.size() < fewestDisks) {

@@ -2,7 +2,7 @@
 
 #include <utility>
 
-#include "kova/agentd/query/NameSet.h"
+#include "kova/agentd/query/NameList.h"
 #include "nox/Host.h"
 #include "tessa/Throwable.h"
 
@@ -13,22 +13,6 @@ using Orbis::DataArray;
 using Tessa::NotInitializedException;
 using Tessa::Ref;
 
-void GetScsiDiskFromArray(const std::string& canonicalName, const Ref<DataArray<ScsiDisk>>& disks,
-                          Ref<ScsiDisk>& disk) {
-  if (!disks) {
-    return;
-  }
-  for (ScsiDisk* candidate : *disks) {
-    if (candidate == nullptr) {
-      NotInitializedException::ThrowNotInitialized();
-    }
-    if (candidate->GetCanonicalName() == canonicalName) {
-      disk = Ref<ScsiDisk>(candidate);
-      return;
-    }
-  }
-}
-
 DiskInventory::DiskInventory(Ref<DataArray<ScsiDisk>> disks) : _disks(std::move(disks)) {
   if (_disks) {
     _named.reserve(_disks->Size());
@@ -36,7 +20,7 @@ DiskInventory::DiskInventory(Ref<DataArray<ScsiDisk>> disks) : _disks(std::move(
   Index(_disks ? _disks->Size() : 0, [](const std::string&) { return true; });
 }
 
-DiskInventory::DiskInventory(Ref<DataArray<ScsiDisk>> disks, NameSet& names) : _disks(std::move(disks)) {
+DiskInventory::DiskInventory(Ref<DataArray<ScsiDisk>> disks, NameList& names) : _disks(std::move(disks)) {
   Index(names.Size(), [&names](const std::string& name) { return names.Contains(name); });
 }
 
@@ -62,11 +46,11 @@ void DiskInventory::Index(std::size_t most, IsWanted isWanted) {
 
 DiskInventory::~DiskInventory() = default;
 
-void DiskInventory::Find(const std::string& canonicalName, Ref<ScsiDisk>& disk) const {
-  const auto found = _named.find(canonicalName);
-  if (found != _named.end()) {
+void GetScsiDiskFromArray(const std::string& canonicalName, const DiskInventory& disks, Ref<ScsiDisk>& disk) {
+  const auto found = disks._named.find(canonicalName);
+  if (found != disks._named.end()) {
     disk = Ref<ScsiDisk>(found->second);
-  } else if (_endsUnnamed) {
+  } else if (disks._endsUnnamed) {
     NotInitializedException::ThrowNotInitialized();
   }
 }

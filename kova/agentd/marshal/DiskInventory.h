@@ -13,27 +13,21 @@
 
 namespace Kovasvc {
 
-class NameSet;
+class NameList;
 
-// Walks the disks from the first: stores a reference to the disk of that name in `disk`, or leaves it as
-// it was. A disk without a canonical name (or a null) met before the match throws
-// Tessa::NotInitializedException. A null array counts as empty.
-void GetScsiDiskFromArray(const std::string& canonicalName,
-                          const Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>>& disks,
-                          Tessa::Ref<Nox::Host::ScsiDisk>& disk);
-
-// The same answers and the same exceptions for many look-ups in one array, which must stay as it is
-// meanwhile: one walk in all instead of one for each name.
+// An array of disks for many look-ups by name: one walk in all instead of one for each name. The array must
+// stay as it is meanwhile; a null one counts as empty.
 class DiskInventory {
  public:
   explicit DiskInventory(Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> disks);
   // For look-ups of these names only; cheaper when they are few, or stand in front.
-  DiskInventory(Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> disks, NameSet& names);
+  DiskInventory(Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> disks, NameList& names);
   ~DiskInventory();
 
-  void Find(const std::string& canonicalName, Tessa::Ref<Nox::Host::ScsiDisk>& disk) const;
-
  private:
+  friend void GetScsiDiskFromArray(const std::string& canonicalName, const DiskInventory& disks,
+                                   Tessa::Ref<Nox::Host::ScsiDisk>& disk);
+
   // `most`: names that are wanted at most. The walk ends when it has as many, like a search at its match.
   template <class IsWanted>
   void Index(std::size_t most, IsWanted isWanted);
@@ -45,5 +39,11 @@ class DiskInventory {
   std::pmr::unordered_map<std::string_view, Nox::Host::ScsiDisk*> _named{&_memory};
   bool _endsUnnamed = false;  // a walk that finds nothing meets a disk without a name
 };
+
+// Stores a reference to the disk of that name in `disk`, or leaves it as it was. Answers as a walk from the
+// first disk to the match would: a disk without a canonical name (or a null) that stands before it throws
+// Tessa::NotInitializedException.
+void GetScsiDiskFromArray(const std::string& canonicalName, const DiskInventory& disks,
+                          Tessa::Ref<Nox::Host::ScsiDisk>& disk);
 
 }  // namespace Kovasvc

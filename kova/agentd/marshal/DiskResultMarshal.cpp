@@ -6,7 +6,7 @@
 #include "kova/agentd/marshal/DiskInventory.h"
 #include "kova/agentd/marshal/ExceptionMarshal.h"
 #include "kova/agentd/query/DiskQuery.h"
-#include "kova/agentd/query/NameSet.h"
+#include "kova/agentd/query/NameList.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
@@ -50,7 +50,7 @@ constexpr std::array<ReasonFault, 5> reasonFaults = {{
 Ref<ScsiDisk> DiskOf(const HostCtl::Kova::DiskResult& record, const DiskInventory& inventory) {
   Ref<ScsiDisk> disk;
   if (!record.isPdl) {
-    inventory.Find(record.name, disk);
+    GetScsiDiskFromArray(record.name, inventory, disk);
   } else if (!record.kovaUuid.empty()) {
     GeneratePDLScsiDisk(record.kovaUuid, record.isSsd, disk);
   }
@@ -135,7 +135,7 @@ void MarshalHostCtlDiskResults(Logger& logger, const std::vector<HostCtl::Kova::
     LogInternal(logger, LogLevel::Warning, "GetDisksFromAgentd %1", ReasonOf(exception));
     throw;
   }
-  NameSet names(NamesOfRecords(records));
+  NameList names(NamesOfRecords(records));
   const DiskInventory inventory(disks, names);
   for (const HostCtl::Kova::DiskResult& record : records) {
     Ref<DiskResult> result;

@@ -9,7 +9,7 @@
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/planning/pure/AllFlashPlan.h"
 #include "kova/agentd/query/DiskQuery.h"
-#include "kova/agentd/query/NameSet.h"
+#include "kova/agentd/query/NameList.h"
 #include "nox/Kova.h"
 #include "orbis/Types.h"
 
@@ -96,7 +96,7 @@ void KovaManagerImpl::AllFlashDiskMappingSwitch(DataArray<ScsiDisk>* candidates,
     mappings = nullptr;
     return;
   }
-  NameSet taken(takenNames);
+  NameList taken(takenNames);
   if (candidates != nullptr) {
     for (ScsiDisk* disk : *candidates) {
       if (!taken.Contains(NameOf(disk))) {

@@ -10,7 +10,7 @@
 #include "kova/agentd/marshal/DiskInventory.h"
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/query/DiskQuery.h"
-#include "kova/agentd/query/NameSet.h"
+#include "kova/agentd/query/NameList.h"
 #include "nox/Kova.h"
 
 namespace Kovasvc {
@@ -51,12 +51,12 @@ bool IsOfflineSsd(const DiskResult& record) {
 Ref<DiskMapping> FromInventory(const HostCtl::Kova::DiskMapping& group, const DiskInventory& inventory) {
   const auto mapping = MakeRef<DiskMapping>();
   Ref<ScsiDisk> ssd;
-  inventory.Find(group.ssd.deviceName, ssd);
+  GetScsiDiskFromArray(group.ssd.deviceName, inventory, ssd);
   mapping->SetSsd(ssd);
   const auto disks = MakeRef<DataArray<ScsiDisk>>();
   for (const DiskName& name : group.capacityDisks) {
     Ref<ScsiDisk> disk;
-    inventory.Find(name.deviceName, disk);
+    GetScsiDiskFromArray(name.deviceName, inventory, disk);
     disks->Append(disk);
   }
   mapping->SetNonSsd(disks);
@@ -102,7 +102,7 @@ void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candida
     const LockGuard guard(*_diskCacheLock);
     LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), _diskCache, records, &IsOfflineSsd);
   }
-  NameSet notMounted(NamesOfRecords(records));
+  NameList notMounted(NamesOfRecords(records));
   if (notMounted.IsEmpty()) {
     return;
   }

@@ -11,7 +11,7 @@
 #include "kova/agentd/marshal/ExceptionMarshal.h"
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/planning/pure/HybridPlan.h"
-#include "kova/agentd/query/NameSet.h"
+#include "kova/agentd/query/NameList.h"
 #include "nox/Kova.h"
 
 namespace Kovasvc {
@@ -64,13 +64,13 @@ Tally ExtendableGroups(const std::vector<HostCtl::Kova::DiskMapping>& groups, bo
     existing.push_back({.allFlash = group.allFlash, .heldBack = group.thirdFlag});
     ssdNames.push_back(group.ssd.deviceName);
   }
-  NameSet wanted(std::move(ssdNames));
+  NameList wanted(std::move(ssdNames));
   const DiskInventory inventory(disks, wanted);
   Tally tally;
   for (const std::size_t position : Planning::ExtendableGroups(existing, allFlash)) {
     const HostCtl::Kova::DiskMapping& group = groups[position];
     Ref<ScsiDisk> ssd;
-    inventory.Find(group.ssd.deviceName, ssd);
+    GetScsiDiskFromArray(group.ssd.deviceName, inventory, ssd);
     if (ssd) {
       tally.ssds.push_back(ssd);
       tally.counts.push_back(group.capacityDisks.size());

@@ -1,12 +1,12 @@
 // Requested disk groups are checked before anything is formatted: the request as a whole, then each group.
 
-#include <utility>
+#include <algorithm>
 
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/query/DiskQuery.h"
-#include "kova/agentd/query/NameSet.h"
+#include "kova/agentd/query/NameList.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 
@@ -33,7 +33,7 @@ void LogDone(Logger& logger, std::string_view format, const Ref<MethodFault>& fa
   LogInternal(logger, LogLevel::Verbose, format, fault ? "FAIL" : "OK");
 }
 
-// The checks that need no kernel: null when the group passes.
+// The checks that need no kernel: null when the group passes. The names are sorted.
 Ref<MethodFault> CheckShape(Logger& logger, const DiskMapping& mapping,
                             const std::vector<std::string>& names) {
   if (names.empty()) {
@@ -42,10 +42,10 @@ Ref<MethodFault> CheckShape(Logger& logger, const DiskMapping& mapping,
   }
   LogInternal(logger, LogLevel::Verbose, "Checking %1 disks for uniqueness", names.size());
   Ref<MethodFault> fault;
-  NameSet named(names);
-  if (const std::string_view* duplicate = named.FindRepeated()) {
+  const auto duplicate = std::adjacent_find(names.begin(), names.end());
+  if (duplicate != names.end()) {
     LogInternal(logger, LogLevel::Warning, "Duplicate disks found in mapping: %1", *duplicate);
-    fault = MakeRef<DuplicateDisks>(std::string(*duplicate));
+    fault = MakeRef<DuplicateDisks>(*duplicate);
   }
   LogDone(logger, "Done checking disk uniqueness: %1", fault);
   if (fault) {
@@ -94,8 +94,7 @@ void KovaManagerImpl::ValidateDiskMappings(DataArray<DiskMapping>* mappings) {
                 "Error checking disks (only found %1): insufficient disks in given mappings", names.size());
     throw InsufficientDisks::Exception(MakeRef<InsufficientDisks>(std::nullopt));
   }
-  NameSet named(std::move(names));
-  if (const std::string_view* duplicate = named.FindRepeated()) {
+  if (const std::string_view* const duplicate = FindRepeated(names)) {
     LogInternal(_logger, LogLevel::Warning,
                 "Error checking disk uniqueness, duplicate disks found in mappings: %1", *duplicate);
     throw DuplicateDisks::Exception(MakeRef<DuplicateDisks>(std::string(*duplicate)));

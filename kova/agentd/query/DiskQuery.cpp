@@ -1,7 +1,7 @@
 #include "kova/agentd/query/DiskQuery.h"
 
 #include "kova/agentd/include/HostCtlException.h"
-#include "kova/agentd/query/NameSet.h"
+#include "kova/agentd/query/NameList.h"
 
 namespace Kovasvc {
 
@@ -15,7 +15,7 @@ void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<st
   if (records.empty()) {
     return;
   }
-  NameSet wanted(names);
+  NameList wanted(names);
   const auto passes = [&](const HostCtl::Kova::DiskResult& record) {
     return (wanted.IsEmpty() || wanted.Contains(record.name)) &&
            (!limit.byState || record.state == limit.state) &&

@@ -36,7 +36,7 @@ Ref<ScsiDisk> DescribeDisk(const DiskName& name, bool ssd, const DiskInventory& 
   if (name.deviceName.empty()) {
     GeneratePDLScsiDisk(name.kovaUuid, ssd, disk);
   } else {
-    inventory.Find(name.deviceName, disk);
+    GetScsiDiskFromArray(name.deviceName, inventory, disk);
   }
   if (!disk) {
     return nullptr;

@@ -1,10 +1,10 @@
-#include "kova/agentd/query/NameSet.h"
+#include "kova/agentd/query/NameList.h"
 
 #include <algorithm>
 
 namespace Kovasvc {
 
-bool NameSet::Contains(std::string_view name) {
+bool NameList::Contains(std::string_view name) {
   if (_next < _names.size() && _names[_next] == name) {
     ++_next;
     return true;
@@ -16,15 +16,16 @@ bool NameSet::Contains(std::string_view name) {
   return _index.contains(name);
 }
 
-const std::string_view* NameSet::FindRepeated() {
+const std::string_view* FindRepeated(const std::vector<std::string_view>& names) {
   const auto isNotBefore = [](std::string_view left, std::string_view right) { return left >= right; };
-  if (std::adjacent_find(_names.begin(), _names.end(), isNotBefore) == _names.end()) {
+  if (std::adjacent_find(names.begin(), names.end(), isNotBefore) == names.end()) {
     return nullptr;  // each is greater than the one before
   }
   const std::string_view* repeated = nullptr;
-  std::pmr::unordered_set<std::string_view> seen(&_memory);
-  seen.reserve(_names.size());
-  for (const std::string_view& name : _names) {
+  std::pmr::monotonic_buffer_resource memory;
+  std::pmr::unordered_set<std::string_view> seen(&memory);
+  seen.reserve(names.size());
+  for (const std::string_view& name : names) {
     if (!seen.insert(name).second && (repeated == nullptr || name < *repeated)) {
       repeated = &name;
     }

@@ -11,24 +11,22 @@
 
 namespace Kovasvc {
 
-// The names of a list, by reference: the list must outlive the set.
+// The names of a list, repeats included, by reference: what they refer to must outlive it.
 //
 // Made for names that are asked for in the order of the list, as they mostly are, since requests, records and
 // inventory come from one host: such a name is found without a search. The first other one makes an index.
 // For one thread.
-class NameSet {
+class NameList {
  public:
-  explicit NameSet(const std::vector<std::string>& names) : _names(names.begin(), names.end()) {}
-  explicit NameSet(std::vector<std::string>&& names) = delete;  // would be gone at once
-  explicit NameSet(std::vector<std::string_view> names) : _names(std::move(names)) {}
+  explicit NameList(const std::vector<std::string>& names) : _names(names.begin(), names.end()) {}
+  explicit NameList(std::vector<std::string>&& names) = delete;  // would be gone at once
+  explicit NameList(std::vector<std::string_view> names) : _names(std::move(names)) {}
 
   bool IsEmpty() const noexcept { return _names.empty(); }
-  // Of the list: a name that stands in it twice counts twice.
+  // A name that stands in the list twice counts twice.
   std::size_t Size() const noexcept { return _names.size(); }
+  // Not const: it remembers how far the questions have come. The answers do not depend on that.
   bool Contains(std::string_view name);
-
-  // Of the names that stand twice in the list the first by bytes; null when there is none.
-  const std::string_view* FindRepeated();
 
  private:
   std::vector<std::string_view> _names;
@@ -37,5 +35,8 @@ class NameSet {
   std::pmr::monotonic_buffer_resource _memory;
   std::pmr::unordered_set<std::string_view> _index{&_memory};
 };
+
+// Of the names that stand twice in the list, in whatever places, the first by bytes; null when there is none.
+const std::string_view* FindRepeated(const std::vector<std::string_view>& names);
 
 }  // namespace Kovasvc

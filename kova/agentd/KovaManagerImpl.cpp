@@ -69,9 +69,9 @@ void KovaManagerImpl::InvalidateKovaDiskCache() {
 }
 
 void KovaManagerImpl::QueryDiskCacheLocked(const Texts& names, const DiskQueryLimit& limit,
-                                           Ref<DiskResults>& results, RecordTest alsoWanted) {
+                                           Ref<DiskResults>& results) {
   std::vector<HostCtl::Kova::DiskResult> records;
-  LimitQueryDisksForKova(*_logger, names, limit, _diskCache, records, alsoWanted);
+  LimitQueryDisksForKova(*_logger, names, limit, _diskCache, records);
   MarshalHostCtlDiskResults(*_logger, records, results, false);
 }
 

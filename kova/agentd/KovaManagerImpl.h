@@ -168,8 +168,8 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   // The cached records of these disks, or of all without names, that pass the limit, as disk results for
   // planning. Replaces `results`. The caller holds the disk-cache lock. Throws
   // Orbis::Fault::SystemError::Exception without an inventory.
-  void QueryDiskCacheLocked(const Texts& names, const DiskQueryLimit& limit, Tessa::Ref<DiskResults>& results,
-                            bool (*alsoWanted)(const HostCtl::Kova::DiskResult& record) = nullptr);
+  void QueryDiskCacheLocked(const Texts& names, const DiskQueryLimit& limit,
+                            Tessa::Ref<DiskResults>& results);
   // The groups that an addition of these disks makes: hybrid ones, those that are there but not mounted, and
   // all-flash ones. The flags say which planner could plan nothing because of a limit. Throws
   // Nox::Fault::DuplicateDisks::Exception.

@@ -36,14 +36,17 @@ bool IsFlash(const DiskResult& record) {
 
 Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryEligibleFlash(const DataArray<ScsiDisk>* candidates) {
   const auto flash = MakeRef<DataArray<ScsiDisk>>();
-  Ref<DataArray<Nox::Kova::Host::DiskResult>> results;
+  Ref<DiskResults> results;
   {
     const LockGuard guard(*_diskCacheLock);
     const Texts names = NamesOf(candidates);
     if (names.empty()) {
       return flash;  // a query without names would answer for every disk of the host
     }
-    QueryDiskCacheLocked(names, eligibleDisks, results, &IsFlash);
+    std::vector<DiskResult> records;
+    LimitQueryDisksForKova(*_logger, names, eligibleDisks, _diskCache, records);
+    std::erase_if(records, [](const DiskResult& record) { return !IsFlash(record); });
+    MarshalHostCtlDiskResults(*_logger, records, results, false);
   }
   AppendDisks(*results, *flash);
   return flash;
@@ -61,12 +64,10 @@ void KovaManagerImpl::ComputeAllFlashDiskMappings(DataArray<ScsiDisk>* candidate
     }
     LogInternal(_logger, LogLevel::Verbose, "Queried %1 All-Flash eligible disks to be added to KOVA",
                 flash->Size());
-    std::vector<bool> flashIsCache;
     for (const ScsiDisk* disk : *flash) {
-      flashIsCache.push_back(IsSsd(disk));
-    }
-    for (const std::size_t position : Planning::TakenForCapacity(flashIsCache)) {
-      takenNames.push_back(NameOf((*flash)[position]));
+      if (!IsSsd(disk)) {
+        takenNames.push_back(NameOf(disk));
+      }
     }
     ComputeDiskMappings(flash.Get(), true, planned, limitReached);
     LogInternal(_logger, LogLevel::Verbose,

@@ -328,6 +328,14 @@ TEST_F(AllFlash, NeedsTheSsdFlagOfEveryResult) {
   EXPECT_THAT(_kernel.Calls(), IsEmpty());
 }
 
+TEST_F(AllFlash, HasTakenTheDisksBeforeOneWithoutItsFlag) {
+  Know({Ssd("c1"), Ssd("c2"), AScsiDisk("s1").Ssd(std::nullopt), Ssd("c3")},
+       CapacityFlash({"c1", "c2"}) + CacheFlash({"s1"}) + CapacityFlash({"c3"}));
+  _taken = {"before"};
+  EXPECT_THROW(Compute(), NotInitializedException);
+  EXPECT_THAT(_taken, ElementsAre("before", "c1", "c2"));
+}
+
 TEST_F(AllFlash, MeetsAnUnnamedDiskOfTheInventoryBeforeAMatch) {
   Know({Ssd("s1"), Ssd("c1")}, CacheFlash({"s1"}) + CapacityFlash({"c1"}));
   _storage->SetDisks({AScsiDisk("x").Unnamed(), Ssd("s1"), Ssd("c1")});
@@ -375,6 +383,13 @@ TEST_F(AllFlash, KeepsThePlanWhenAFaultComesBehindIt) {
   EXPECT_THAT(_taken, ElementsAre("c1")) << "the cache disk would have come later";
   EXPECT_FALSE(_limitReached);
   EXPECT_THAT(_logger->Lines(), Contains(LogLineIs(LogLevel::Verbose, gotFault, AFault().what())));
+}
+
+TEST_F(AllFlash, HasNotTakenACacheDiskBeforeItsGroupIsLogged) {
+  Know({Ssd("s1"), Ssd("c1")}, CacheFlash({"s1"}) + CapacityFlash({"c1"}));
+  FailLine(groupLine);
+  EXPECT_THAT(Plan(), ElementsAre("s1: c1"));
+  EXPECT_THAT(_taken, ElementsAre("c1"));
 }
 
 TEST_F(AllFlash, LetsWhatIsNoFaultThrough) {

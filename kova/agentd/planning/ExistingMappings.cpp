@@ -100,8 +100,9 @@ void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candida
   std::vector<DiskResult> records;
   {
     const LockGuard guard(*_diskCacheLock);
-    LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), _diskCache, records, &IsOfflineSsd);
+    LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), _diskCache, records);
   }
+  std::erase_if(records, [](const DiskResult& record) { return !IsOfflineSsd(record); });
   NameList notMounted(NamesOfRecords(records));
   if (notMounted.IsEmpty()) {
     return;

@@ -11,7 +11,7 @@ using Tessa::Service::LogLevel;
 void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<std::string>& names,
                             const DiskQueryLimit& limit,
                             const std::vector<HostCtl::Kova::DiskResult>& records,
-                            std::vector<HostCtl::Kova::DiskResult>& passed, RecordTest alsoWanted) {
+                            std::vector<HostCtl::Kova::DiskResult>& passed) {
   if (records.empty()) {
     return;
   }
@@ -19,8 +19,7 @@ void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<st
   const auto passes = [&](const HostCtl::Kova::DiskResult& record) {
     return (wanted.IsEmpty() || wanted.Contains(record.name)) &&
            (!limit.byState || record.state == limit.state) &&
-           (!limit.byReason || record.reason == limit.reason) &&
-           (alsoWanted == nullptr || alsoWanted(record));
+           (!limit.byReason || record.reason == limit.reason);
   };
   try {
     for (const HostCtl::Kova::DiskResult& record : records) {

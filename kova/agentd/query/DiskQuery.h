@@ -26,16 +26,13 @@ inline constexpr DiskQueryLimit eligibleDisks = {.byState = true,
                                                  .reason = HostCtl::Kova::DiskReason::None,
                                                  .fifthFlag = false};
 
-// A caller's own test beside the limit.
-using RecordTest = bool (*)(const HostCtl::Kova::DiskResult& record);
-
 // Appends copies of the records that pass, in the order of the records. No names: every name passes; a
-// name that matches nothing is passed over. A kernel exception out of the caller's test ends the walk with a
-// warning.
+// name that matches nothing is passed over. A kernel exception while a record is appended ends the walk with
+// a warning.
 void LimitQueryDisksForKova(Tessa::Service::Logger& logger, const std::vector<std::string>& names,
                             const DiskQueryLimit& limit,
                             const std::vector<HostCtl::Kova::DiskResult>& records,
-                            std::vector<HostCtl::Kova::DiskResult>& passed, RecordTest alsoWanted = nullptr);
+                            std::vector<HostCtl::Kova::DiskResult>& passed);
 
 // The records' names, by reference, in order.
 std::vector<std::string_view> NamesOfRecords(const std::vector<HostCtl::Kova::DiskResult>& records);

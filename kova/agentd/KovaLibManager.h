@@ -9,7 +9,8 @@ namespace Kovasvc {
 
 class KovaManagerImpl;
 
-// What panics name as their source. The name and the lines are fixed: tools that read panics know them.
+// What panics name as their source. A label, like the lines that they name: neither follows today's files, so
+// that panics of any build can be told apart alike.
 inline constexpr const char* sourcePath = "kova/agentd/KovaLibManager";
 
 // The manager behind all hooks; null until InitKovaPlugin has made it. Not guarded: it is written before

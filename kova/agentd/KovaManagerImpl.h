@@ -186,8 +186,10 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   bool IsOffline(const std::string& ssdName);
   // The results of the group's disks, as the kernel knows them now.
   Tessa::Ref<DiskResults> QueryGroupAfresh(const Tessa::Ref<Mapping>& mapping);
-  // The UUID in the name of a disk that has left, also told to the log.
-  std::string UuidOfAbsentDisk(const std::string& disk);
+  // Takes a disk that has left out of the service. Provider exceptions pass.
+  void RemoveAbsentDisk(const std::string& disk, const std::string& passThrough);
+  // Tells the log which disk that has left a request is about. Its UUID.
+  std::string ReadAbsentDisk(const std::string& disk);
   // How an operation ends that answers with a fault or nothing.
   void FinishWithoutResult(std::string& faultText, Tessa::Ref<Orbis::MethodFault>& fault);
   // The kernel's mounted groups, and whether it claims disks on its own; a failing kernel is a warning and no

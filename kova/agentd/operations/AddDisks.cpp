@@ -23,10 +23,8 @@ using Tessa::System::LockGuard;
 
 namespace {
 
-constexpr int wrongTypeLine = 1908;
-
-// Only neighbours count. The name told is names[k], k being the count of names without repeats; it need not
-// be a repeated one. Both are wanted.
+// Only neighbours count: a disk that is named twice with another between them passes. The name told is
+// names[k], k being the count of names without repeats; it need not be a repeated one.
 void DemandNoRepeat(Tessa::Service::Logger& logger, const std::vector<std::string>& names) {
   std::size_t withoutRepeats = 0;
   for (std::size_t i = 0; i < names.size(); ++i) {
@@ -86,7 +84,7 @@ Ref<DataArray<DiskMapping>> KovaManagerImpl::PlanGroups(DataArray<ScsiDisk>& dis
 
 void KovaManagerImpl::AddDisks(const Texts& disks, const std::string& requestTag, std::string& faultText,
                                std::string& resultText) {
-  const Ref<DataArray<ScsiDisk>> given = ReadObjects<ScsiDisk>(disks, wrongTypeLine);
+  const Ref<DataArray<ScsiDisk>> given = ReadObjects<ScsiDisk>(disks, WrongTypeLine::AddDisks);
   {
     const LockGuard guard(*_operationLock);
     RefreshKovaDiskCache();

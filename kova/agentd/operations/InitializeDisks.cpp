@@ -24,15 +24,10 @@ using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
 using Tessa::System::LockGuard;
 
-namespace {
-
-constexpr int wrongTypeLine = 2070;
-
-}  // namespace
-
 void KovaManagerImpl::InitializeDisks(const Texts& mappings, const std::string& requestTag,
                                       std::string& faultText, std::string& resultText) {
-  const Ref<DataArray<DiskMapping>> requested = ReadObjects<DiskMapping>(mappings, wrongTypeLine);
+  const Ref<DataArray<DiskMapping>> requested =
+      ReadObjects<DiskMapping>(mappings, WrongTypeLine::InitializeDisks);
   Ref<Orbis::Any> result;
   Ref<MethodFault> fault;
   RunIntoFault(*_logger, fault, [&] {

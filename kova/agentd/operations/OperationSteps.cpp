@@ -5,8 +5,8 @@
 
 namespace Kovasvc {
 
-void PanicOverWrongType(int line) {
-  Tessa::Panic("NOT_REACHED %s:%d\n", sourcePath, line);
+void PanicOverWrongType(WrongTypeLine line) {
+  Tessa::Panic("NOT_REACHED %s:%d\n", sourcePath, static_cast<int>(line));
 }
 
 }  // namespace Kovasvc

@@ -17,13 +17,22 @@
 
 namespace Kovasvc {
 
-// A host program never hands over a text of another type, so one ends the process. `line` is what the panic
-// names, and fixed for each operation.
-[[noreturn]] void PanicOverWrongType(int line);
+// What the panic over a text of another type names as its line, for each operation that reads objects.
+// Labels, not lines of today's files: they stay as they are, so that panics of any build can be told apart
+// alike.
+enum class WrongTypeLine {
+  AddDisks = 1908,
+  InitializeDisks = 2070,
+  RemoveDiskMapping = 2280,
+  UnmountDiskMapping = 2549,
+};
+
+// A host program never hands over a text of another type, so one ends the process.
+[[noreturn]] void PanicOverWrongType(WrongTypeLine line);
 
 // The object of the text. A text that cannot be read throws Orbis::ParseException.
 template <class T>
-Tessa::Ref<T> ReadObject(const std::string& text, int line) {
+Tessa::Ref<T> ReadObject(const std::string& text, WrongTypeLine line) {
   Tessa::Ref<Orbis::Any> object;
   Orbis::DeserializeSoapToObject(text, object);
   try {
@@ -35,7 +44,7 @@ Tessa::Ref<T> ReadObject(const std::string& text, int line) {
 
 // The objects of the texts, in order.
 template <class T>
-Tessa::Ref<Orbis::DataArray<T>> ReadObjects(const std::vector<std::string>& texts, int line) {
+Tessa::Ref<Orbis::DataArray<T>> ReadObjects(const std::vector<std::string>& texts, WrongTypeLine line) {
   const auto objects = Tessa::MakeRef<Orbis::DataArray<T>>();
   for (const std::string& text : texts) {
     objects->Append(ReadObject<T>(text, line));

@@ -38,6 +38,8 @@ using TestSupport::NamesDevice;
 using TestSupport::panicStatus;
 using TestSupport::SoapText;
 
+constexpr WrongTypeLine anyLine = WrongTypeLine::AddDisks;
+
 class OperationSteps : public TestSupport::HostFixture {
  protected:
   Ref<MethodFault> _fault = MakeRef<DiskIsUSB>("before");
@@ -48,27 +50,27 @@ using OperationStepsDeathTest = OperationSteps;
 
 TEST_F(OperationSteps, ReadObjectsInOrder) {
   const auto disks =
-      ReadObjects<ScsiDisk>({SoapText(*Hdd("b")), SoapText(*Hdd("a")), SoapText(*Hdd("b"))}, 1);
+      ReadObjects<ScsiDisk>({SoapText(*Hdd("b")), SoapText(*Hdd("a")), SoapText(*Hdd("b"))}, anyLine);
   EXPECT_THAT(TestSupport::DiskTexts(*disks), ElementsAre("b", "a", "b"));
-  EXPECT_TRUE(ReadObjects<ScsiDisk>({}, 1)->IsEmpty());
+  EXPECT_TRUE(ReadObjects<ScsiDisk>({}, anyLine)->IsEmpty());
 }
 
 TEST_F(OperationSteps, ReadAnObjectOfADerivedType) {
-  EXPECT_EQ(ReadObject<ScsiLun>(SoapText(*Hdd("a")), 1)->GetCanonicalName(), "a");
+  EXPECT_EQ(ReadObject<ScsiLun>(SoapText(*Hdd("a")), anyLine)->GetCanonicalName(), "a");
 }
 
 TEST_F(OperationSteps, LetOutWhatTheDecoderSays) {
-  EXPECT_THROW(ReadObject<ScsiDisk>("", 1), Orbis::ParseException);
-  EXPECT_THROW(ReadObjects<ScsiDisk>({SoapText(*Hdd("a")), "<a/>"}, 1), Orbis::ParseException);
+  EXPECT_THROW(ReadObject<ScsiDisk>("", anyLine), Orbis::ParseException);
+  EXPECT_THROW(ReadObjects<ScsiDisk>({SoapText(*Hdd("a")), "<a/>"}, anyLine), Orbis::ParseException);
 }
 
 TEST_F(OperationStepsDeathTest, EndTheProcessOverAnotherTypeAndNameTheLine) {
-  EXPECT_EXIT(ReadObject<ScsiDisk>(SoapText(*MakeRef<ScsiLun>()), 4711), ExitedWithCode(panicStatus),
-              "^panic: NOT_REACHED kova/agentd/KovaLibManager:4711\n$");
-  EXPECT_EXIT(ReadObjects<DiskMapping>({SoapText(*Hdd("a"))}, 12), ExitedWithCode(panicStatus),
-              "^panic: NOT_REACHED kova/agentd/KovaLibManager:12\n$");
-  EXPECT_EXIT(PanicOverWrongType(7), ExitedWithCode(panicStatus),
-              "^panic: NOT_REACHED kova/agentd/KovaLibManager:7\n$");
+  EXPECT_EXIT(ReadObject<ScsiDisk>(SoapText(*MakeRef<ScsiLun>()), static_cast<WrongTypeLine>(4711)),
+              ExitedWithCode(panicStatus), "^panic: NOT_REACHED kova/agentd/KovaLibManager:4711\n$");
+  EXPECT_EXIT(ReadObjects<DiskMapping>({SoapText(*Hdd("a"))}, WrongTypeLine::InitializeDisks),
+              ExitedWithCode(panicStatus), "^panic: NOT_REACHED kova/agentd/KovaLibManager:2070\n$");
+  EXPECT_EXIT(PanicOverWrongType(WrongTypeLine::UnmountDiskMapping), ExitedWithCode(panicStatus),
+              "^panic: NOT_REACHED kova/agentd/KovaLibManager:2549\n$");
 }
 
 // ---- faults that are thrown

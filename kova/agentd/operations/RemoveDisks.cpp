@@ -21,8 +21,6 @@ using Tessa::System::LockGuard;
 
 namespace {
 
-constexpr int wrongTypeLine = 2280;
-
 Ref<MethodFault> MappingNotFound(const std::string& mappingText) {
   const auto argument = MakeRef<Orbis::KeyAnyValue>();
   argument->SetKey("diskMap");
@@ -48,7 +46,7 @@ void KovaManagerImpl::RemoveDisk(const std::string& disk, const std::string& pas
     RefreshKovaDiskCache();
     AskKernel(*_logger, "Error removing KOVA disks: %1", fault, [&] {
       if (IsPDLDiskInput(disk)) {
-        _provider->RemoveDiskByUuid(UuidOfAbsentDisk(disk), passThrough);
+        RemoveAbsentDisk(disk, passThrough);
       } else {
         _provider->RemoveDisk(disk, passThrough, RemovalOptions{optionText, optionFirst, optionSecond});
       }
@@ -60,7 +58,7 @@ void KovaManagerImpl::RemoveDisk(const std::string& disk, const std::string& pas
 void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::string& passThrough,
                                         const std::string& optionText, int optionFirst, int optionSecond,
                                         std::string& faultText) {
-  const Ref<DiskMapping> group = ReadObject<DiskMapping>(mapping, wrongTypeLine);
+  const Ref<DiskMapping> group = ReadObject<DiskMapping>(mapping, WrongTypeLine::RemoveDiskMapping);
   Ref<MethodFault> fault;
   {
     const LockGuard guard(*_operationLock);
@@ -70,7 +68,7 @@ void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::s
     if (IsPDLDiskInput(ssdName)) {
       // A group whose cache disk has left is not looked for.
       AskKernel(*_logger, "Error removing PDL'd KOVA disk mapping: %1", fault,
-                [&] { _provider->RemoveDiskByUuid(UuidOfAbsentDisk(ssdName), passThrough); });
+                [&] { RemoveAbsentDisk(ssdName, passThrough); });
     } else if (!DiskMappingExists(group)) {
       const std::string text = "SSD: " + ssdName + ", Disks: " + JoinNames(CapacityNamesOf(group.Get()));
       LogInternal(_logger, LogLevel::Warning, "Failed to validate existing disk mapping: %1", text);
@@ -85,7 +83,12 @@ void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::s
   FinishWithoutResult(faultText, fault);
 }
 
-std::string KovaManagerImpl::UuidOfAbsentDisk(const std::string& disk) {
+void KovaManagerImpl::RemoveAbsentDisk(const std::string& disk, const std::string& passThrough) {
+  const std::string uuid = ReadAbsentDisk(disk);
+  _provider->RemoveDiskByUuid(uuid, passThrough);
+}
+
+std::string KovaManagerImpl::ReadAbsentDisk(const std::string& disk) {
   std::string uuid;
   PDLDiskToKovaUuid(disk, uuid);
   LogInternal(_logger, LogLevel::Verbose, "Given PDL'd disk input (KOVA UUID: '%1')", uuid);

@@ -18,7 +18,8 @@ void KovaManagerImpl::RestampDiskMapping(const std::string& ssdName, Texts& capa
     if (IsPDLDiskInput(ssdName)) {
       LogInternal(_logger, LogLevel::Verbose, "UUID input %1", ssdName);
       try {
-        _provider->RestampDiskMappingByUuid(UuidOfAbsentDisk(ssdName));
+        const std::string uuid = ReadAbsentDisk(ssdName);
+        _provider->RestampDiskMappingByUuid(uuid);
       } catch (const HostCtl::Lib::HostCtlException& exception) {
         LogInternal(_logger, LogLevel::Warning, "Error restamping PDL'd KOVA disk mapping: %1",
                     exception.Describe());

@@ -19,15 +19,10 @@ using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
 using Tessa::System::LockGuard;
 
-namespace {
-
-constexpr int wrongTypeLine = 2549;
-
-}  // namespace
-
 void KovaManagerImpl::UnmountDiskMapping(const Texts& mappings, const std::string& requestTag,
                                          std::string& faultText, std::string& resultText) {
-  const Ref<DataArray<DiskMapping>> requested = ReadObjects<DiskMapping>(mappings, wrongTypeLine);
+  const Ref<DataArray<DiskMapping>> requested =
+      ReadObjects<DiskMapping>(mappings, WrongTypeLine::UnmountDiskMapping);
   {
     const LockGuard guard(*_operationLock);
     RefreshKovaDiskCache();

@@ -2,8 +2,7 @@
 //
 // Every hook forwards its arguments unchanged to the manager's operation. An exception that the operation
 // lets out is not an answer: it is logged where it carries a fault, and ends the process. The first two
-// hooks do so for the runtime's own exceptions only; others go on to the caller. That difference is
-// wanted.
+// hooks do so for the runtime's own exceptions only; others go on to the caller.
 
 #include "kova/agentd/KovaLibManager.h"
 

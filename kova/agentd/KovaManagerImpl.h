@@ -6,9 +6,13 @@
 // records and their valid flag. Where both are held, the operation lock was taken first. Neither is
 // recursive: an operation releases the operation lock before it calls one that takes it.
 //
-// Answers: `faultText` and `resultText` are appended to, never assigned. An operation turns the kernel's
-// exceptions, and faults thrown on its way, into its fault, or logs them where it says so; any other
-// exception leaves it, with all locks released.
+// Answers: `faultText` and `resultText` are appended to, never assigned.
+//
+// Exceptions: an operation turns the kernel's exceptions into its fault, or logs them where it says so. A
+// fault thrown on the way becomes the operation's fault in InitializeDisks and AddAllEligibleDisks, and in
+// AddDisks and UnmountDiskMapping once the disk cache is refreshed; the others let it out, but for that of a
+// missing inventory where they say so. Any other exception is let out, and whatever is leaves with all locks
+// released.
 #pragma once
 
 #include <memory>
@@ -153,7 +157,6 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
                                    Tessa::Ref<Orbis::Any>& result, Tessa::Ref<Orbis::MethodFault>& fault);
 
  protected:
-  const Tessa::Ref<Tessa::Service::Logger>& GetLogger() const noexcept { return _logger; }
   // The records as they are in memory, valid or not. The caller sees to it that nobody refreshes them.
   const std::vector<HostCtl::Kova::DiskResult>& GetDiskCache() const noexcept { return _diskCache; }
 
@@ -198,7 +201,7 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
 
   // In reverse, the order in which a manager goes down: the provider first.
   Tessa::Ref<Tessa::Service::Logger> _logger;
-  Tessa::Ref<Util::KovaUtil> _util;
+  Tessa::Ref<Util::KovaUtil> _util;  // held for its life alone: the logger that it shares goes with it
   std::vector<HostCtl::Kova::DiskResult> _diskCache;  // guarded by _diskCacheLock
   bool _diskCacheValid = false;                       // guarded by _diskCacheLock
   Tessa::Ref<Tessa::System::Lock> _operationLock;

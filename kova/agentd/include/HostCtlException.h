@@ -83,7 +83,7 @@ class HOSTCTL_API KovaExceptionRemoveDiskAutoModeEnabled : public KovaStorageExc
   ~KovaExceptionRemoveDiskAutoModeEnabled() override;
 };
 
-// Deliberately not a KovaStorageException: it names no single disk, and is reported like any failure.
+// Not a KovaStorageException: it names no single disk, and is reported like any failure.
 class HOSTCTL_API KovaExceptionIncompatibleDiskMapping : public HostCtlException {
  public:
   using HostCtlException::HostCtlException;

@@ -13,7 +13,8 @@ namespace Kovasvc {
 
 using Texts = std::vector<std::string>;
 
-// 1 on success, 0 on failure.
+// 1 on success, 0 on failure, after which it may be called again. Called again after a success, or while the
+// process has no default logger, it ends the process.
 using InitKovaPluginFn = int();
 // SOAP texts of HostScsiDisk objects, request tag, fault, result.
 using AddDisksFn = void(const Texts& disks, const std::string& requestTag, std::string& fault,

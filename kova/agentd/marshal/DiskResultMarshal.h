@@ -1,7 +1,7 @@
 // The kernel's record of a disk becomes the management API's disk result.
 //
-// Threads: any; nothing is kept between calls. "out" references are replaced, and left as they were where
-// the text says so.
+// Threads: any; nothing is kept between calls. "out" references are replaced, or left as they were where a
+// function says so.
 #pragma once
 
 #include <string>
@@ -28,8 +28,8 @@ const char* MarshalDiskState(HostCtl::Kova::DiskState state);
 void MarshalDiskReason(const std::string& deviceName, HostCtl::Kova::DiskReason reason,
                        Tessa::Ref<Orbis::MethodFault>& fault);
 
-// Takes away what results do not carry: durable name, alternate names, standard inquiry data. The
-// misspelt name is the one it is known by.
+// Takes away what results do not carry: durable name, alternate names, standard inquiry data. (The name is
+// misspelt everywhere, and stays findable so.)
 void CleanUnusedDiskFileds(Nox::Host::ScsiDisk& disk);
 
 // One record. The disk in the result is a copy of the inventory's, or a stand-in for an absent disk.

@@ -39,7 +39,7 @@ struct Row {
 };
 
 // Tried in this order, for storage exceptions only. That makes the row of the incompatible mapping one
-// that no exception reaches, since its class is no storage exception; so it is wanted.
+// that no exception reaches, since its class is no storage exception: it is reported as a plain failure.
 constexpr std::array<Row, 6> rows = {{
     {&Is<HostCtl::Lib::KovaExceptionHasPartition>, &NamingDisk<Nox::Fault::DiskHasPartitions>},
     {&Is<HostCtl::Lib::KovaExceptionLastRemainingHDD>, &NamingDisk<Nox::Fault::DiskIsLastRemainingNonSSD>},

@@ -63,7 +63,7 @@ Ref<DiskMapping> DescribeGroup(Logger& logger, const HostCtl::Kova::DiskMapping&
     }
   }
   if (disks->IsEmpty()) {
-    // The misspelling is part of the text that people search their logs for.
+    // The misspelling stays: whoever searches a log finds this line by it.
     LogInternal(logger, LogLevel::Info, "Error marshaling disk maping for SSD: %1", NameForLog(ssd.Get()));
     return nullptr;
   }
@@ -80,7 +80,7 @@ bool IsMounted(Logger& logger, HostCtl::Kova::KovaInfo& provider, const std::str
     provider.QueryDisks({ssdDeviceName}, records, false);
     return records.empty() || records.front().state != DiskState::Ineligible;
   } catch (const std::exception& exception) {
-    // The format asks for a second argument that it is not given; it is kept as it is known.
+    // The format asks for a second argument and is given one, so the line ends in "%2".
     LogInternal(logger, LogLevel::Info, "Error when querying disks for KOVA: %2", exception.what());
     return true;
   }

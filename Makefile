@@ -8,7 +8,7 @@ CTEST := ctest --output-on-failure --no-tests=error -j $(JOBS)
 
 help:
 	@echo "make demo    build, start the agent on an example host; its disks are added, lost, unmounted, claimed"
-	@echo "make test    build and run every test that needs no virtual machine"
+	@echo "make test    build and run every test"
 	@echo "make check   format, second compiler, clang-tidy on what changed, sanitizers, fuzzing"
 	@echo "make bench   benchmarks"
 	@echo "make growth  instructions per disk of planning, among few disks and among many"
@@ -62,7 +62,7 @@ asan:
 	@cd build/asan && $(CTEST)
 
 # The thread sanitizer, on the tests in which threads meet.
-TSAN_TESTS := tessa_test otxctl_test otxctl_fault_test otxctl_contract_test kova_agentd_test kova_module_test agentd_test concurrency_test
+TSAN_TESTS := tessa_test orbis_test otxctl_test otxctl_fault_test otxctl_contract_test kova_agentd_test kova_module_test agentd_test concurrency_test
 
 tsan:
 	@$(SETUP) build test

@@ -128,7 +128,7 @@ TEST_F(InitPlugin, LetsTheMakingOfTheManagerFailLoudlyInside) {
   Ref<Tessa::Service::Logger> logger = _logger;
   EXPECT_THROW(CreateKovaManager(logger), HostCtl::Lib::HostCtlException);
   EXPECT_FALSE(_kovaManagerImpl);
-  EXPECT_EQ(logger->GetRefCount(), 3) << "the failed manager still refers to its logger";
+  EXPECT_EQ(logger->GetRefCount(), 3) << "the test's two and the process's default";
 }
 
 TEST_F(InitPluginDeathTest, PanicsWithoutADefaultLogger) {

@@ -199,12 +199,12 @@ TEST_F(RemoveDisk, LetsOtherExceptionsOutWithTheLockReleased) {
   EXPECT_EQ(_timeline.Events().back(), releaseOperation);
   _kernel.Fail("RemoveDisk", AFault("a fault is no answer here"));
   EXPECT_THROW(Remove("a"), SystemError::Exception);
-  EXPECT_THAT(_locks.HeldHere(), IsEmpty());
+  EXPECT_EQ(_timeline.Events().back(), releaseOperation);
   EXPECT_TRUE(IsCacheValid());
   _manager->InvalidateKovaDiskCache();
   _kernel.Fail("RefreshKovaInfo", AFault("nor here"));
   EXPECT_THROW(Remove("a"), SystemError::Exception);
-  EXPECT_THAT(_locks.HeldHere(), IsEmpty());
+  EXPECT_EQ(_timeline.Events().back(), releaseOperation);
   ExpectTextsUntouched();
 }
 
@@ -363,7 +363,7 @@ TEST_F(RemoveGroup, LetsAMissingNameOutWithTheLockReleased) {
                                           AMapping(Ssd("s"), {Hdd("a"), AScsiDisk("x").Unnamed()}),
                                           AMapping(Ssd("kova:" + uuid), {AScsiDisk("x").Unnamed()})}) {
     EXPECT_THAT([&] { Remove(mapping); }, ThrowsMessage<NotInitializedException>(StrEq("Not initialized")));
-    EXPECT_THAT(_locks.HeldHere(), IsEmpty());
+    EXPECT_EQ(_timeline.Events().back(), releaseOperation);
   }
   ExpectTextsUntouched();
   EXPECT_THAT(_kernel.CallTexts(), ElementsAre("RefreshKovaInfo()", "QueryDisks([], true)"));
@@ -374,11 +374,12 @@ TEST_F(RemoveGroup, LetsOtherExceptionsOutWithTheLockReleased) {
     _manager->InvalidateKovaDiskCache();
     _kernel.Fail(operation, std::runtime_error("not the kernel's"));
     EXPECT_THROW(Remove(_group), std::runtime_error) << operation;
-    EXPECT_THAT(_locks.HeldHere(), IsEmpty()) << operation;
+    EXPECT_EQ(_timeline.Events().back(), releaseOperation) << operation;
     _kernel.Heal(operation);
   }
   _kernel.Fail("RemoveDiskMapping", AFault("a fault is no answer here"));
   EXPECT_THROW(Remove(_group), SystemError::Exception);
+  EXPECT_EQ(_timeline.Events().back(), releaseOperation);
   ExpectTextsUntouched();
 }
 

@@ -273,7 +273,7 @@ TEST_F(Unmount, LetsAFaultOfTheRefreshOut) {
   _kernel.Fail("QueryDisks", AFault("broken"));
   EXPECT_THROW(Run({_first}), SystemError::Exception);
   ExpectTextsUntouched();
-  EXPECT_THAT(_locks.HeldHere(), IsEmpty());
+  EXPECT_EQ(_timeline.Events().back(), releaseOperation);
 }
 
 TEST_F(Unmount, LetsOtherExceptionsOutWithTheLockReleased) {
@@ -281,7 +281,7 @@ TEST_F(Unmount, LetsOtherExceptionsOutWithTheLockReleased) {
     _manager->InvalidateKovaDiskCache();
     _kernel.Fail(operation, std::runtime_error("not the kernel's"));
     EXPECT_THROW(Run({_first}), std::runtime_error) << operation;
-    EXPECT_THAT(_locks.HeldHere(), IsEmpty()) << operation;
+    EXPECT_EQ(_timeline.Events().back(), releaseOperation) << operation;
     _kernel.Heal(operation);
   }
   ExpectTextsUntouched();
@@ -387,10 +387,10 @@ TEST_F(Claim, LetsOtherExceptionsOutWithTheLockReleased) {
   _manager->RefreshKovaDiskCache();
   _kernel.Fail("ClaimUnmountedDiskgroups", std::runtime_error("not the kernel's"));
   EXPECT_THROW(_manager->ClaimUnmountedDiskgroup(), std::runtime_error);
-  EXPECT_THAT(_locks.HeldHere(), IsEmpty());
+  EXPECT_EQ(_timeline.Events().back(), releaseOperation);
   _kernel.Fail("ClaimUnmountedDiskgroups", AFault("a fault is no answer here"));
   EXPECT_THROW(_manager->ClaimUnmountedDiskgroup(), SystemError::Exception);
-  EXPECT_THAT(_locks.HeldHere(), IsEmpty());
+  EXPECT_EQ(_timeline.Events().back(), releaseOperation);
 }
 
 TEST_F(Claim, AsksThroughItsHookTheSame) {

@@ -130,6 +130,13 @@ TEST_F(HttpClientTls, AsksAndIsKnownByItsCertificate) {
   EXPECT_EQ(Ask(ByTls(server.Address()), TrustOnly("ca")), "none ");
 }
 
+TEST_F(HttpClientTls, IsKnownToHaveComeByTls) {
+  RunningServer server(Serving("server"), [](const HttpRequest& request) {
+    return HttpAnswer{200, "text/plain", request.scheme + "://" + request.authority};
+  });
+  EXPECT_EQ(Ask(ByTls(server.Address()), TrustOnly("ca")), "https://" + server.Address().Name());
+}
+
 TEST_F(HttpClientTls, FindsAServerByItsName) {
   RunningServer server(Serving("server"), &Whoami);
   EXPECT_EQ(Ask(ByTls(server.Address(), "localhost"), TrustOnly("ca")), "none ");

@@ -34,14 +34,16 @@ std::optional<HttpAnswer> Refusal(const error_code& error) {
   return gone ? std::nullopt : std::optional(RefusedWith(400, "not a request: " + error.message()));
 }
 
-HttpRequest FromHeader(const HttpHeader& header, const HttpPeer& peer) {
+HttpRequest FromHeader(const HttpHeader& header, const HttpDoor& door, const HttpPeer& peer) {
   return {.method = std::string(header.method_string()),
           .target = std::string(header.target()),
           .contentType = std::string(header[http::field::content_type]),
           .body = {},
           .soapAction = std::string(header["SOAPAction"]),
           .hasOrigin = header.count(http::field::origin) != 0,
-          .peer = peer};
+          .peer = peer,
+          .scheme = door.isTls ? "https" : "http",
+          .authority = std::string(header[http::field::host])};
 }
 
 }  // namespace
@@ -124,7 +126,7 @@ void HttpConnection::OnHeader(Error error) {
     Refuse(std::move(*refusal));
     return;
   }
-  _request = FromHeader(header, _peer);
+  _request = FromHeader(header, _door, _peer);
   if (_parser->is_done() || !WantsContinue(header)) {
     ReadBody();
     return;

@@ -12,6 +12,8 @@ namespace http = beast::http;
 namespace ip = boost::asio::ip;
 
 constexpr std::uint16_t defaultPort = 80;
+constexpr std::uint16_t defaultTlsPort = 443;
+constexpr std::size_t longestPort = 5;  // digits
 
 // What two of would leave open which one counts.
 constexpr http::field onceOnly[] = {http::field::host, http::field::content_length,
@@ -54,16 +56,37 @@ HostParts Split(std::string_view host) {
   return {host.substr(0, colon), host.substr(colon + 1)};
 }
 
+bool IsDigit(char byte) {
+  return byte >= '0' && byte <= '9';
+}
+
+bool IsLetter(char byte) {
+  return (byte >= 'a' && byte <= 'z') || (byte >= 'A' && byte <= 'Z');
+}
+
+bool HasOnly(std::string_view text, std::string_view others) {
+  return std::all_of(text.begin(), text.end(), [others](char byte) {
+    return IsDigit(byte) || IsLetter(byte) || others.find(byte) != std::string_view::npos;
+  });
+}
+
 }  // namespace
 
 HttpAnswer RefusedWith(unsigned status, const std::string& text) {
   return {status, "text/plain", text + "\n"};
 }
 
+bool IsHost(std::string_view host) {
+  const auto [name, port] = Split(host);
+  const bool bracketed = name.size() > 2 && name.front() == '[' && name.back() == ']';
+  return port.size() <= longestPort && std::all_of(port.begin(), port.end(), &IsDigit) &&
+         (bracketed ? HasOnly(name.substr(1, name.size() - 2), ":.") : HasOnly(name, "-._~%"));
+}
+
 bool IsOwnHost(std::string_view host, const HttpDoor& door) {
   const auto [name, port] = Split(host);
-  const bool hasOwnPort =
-      port == std::to_string(*door.tcpPort) || (port.empty() && *door.tcpPort == defaultPort);
+  const std::uint16_t assumed = door.isTls ? defaultTlsPort : defaultPort;
+  const bool hasOwnPort = port == std::to_string(*door.tcpPort) || (port.empty() && *door.tcpPort == assumed);
   if (hasOwnPort && IsLoopbackName(name)) {
     return true;
   }
@@ -75,6 +98,9 @@ bool IsOwnHost(std::string_view host, const HttpDoor& door) {
 std::optional<HttpAnswer> RefusalOf(const HttpHeader& header, const HttpDoor& door) {
   if (HasTwice(header)) {
     return RefusedWith(400, "a header field that may stand there once stands there twice");
+  }
+  if (!IsHost(header[http::field::host])) {
+    return RefusedWith(400, "the Host header is not written as a host is");
   }
   if (door.tcpPort && !IsOwnHost(header[http::field::host], door)) {
     return RefusedWith(421, "the Host header does not name this agent");

@@ -20,6 +20,7 @@ using HttpHeader = boost::beast::http::request_header<>;
 struct HttpDoor {
   std::optional<std::uint16_t> tcpPort = std::nullopt;  // none: a Unix socket
   std::vector<std::string> serverNames = {};            // the server's own besides loopback's
+  bool isTls = false;
 };
 
 // Nothing when the request may be read on.
@@ -28,7 +29,11 @@ std::optional<HttpAnswer> RefusalOf(const HttpHeader& header, const HttpDoor& do
 // Whether the client waits to be told before it sends the body.
 bool WantsContinue(const HttpHeader& header);
 
-// Whether a Host header means this server: a name or address of loopback with the port, or one of the
+// Whether that is how a host is written, with a port or without: "kova.example:9443", "[::1]", or nothing.
+bool IsHost(std::string_view host);
+
+// Whether a Host header means this server: a name or address of loopback with the port
+// (needless where it is the one that everybody assumes), or one of the
 // server's own names. A page of a stranger whose name was made to lead here still bears its own.
 bool IsOwnHost(std::string_view host, const HttpDoor& door);
 

@@ -62,6 +62,21 @@ TEST(HostHeader, NamesNobodyElse) {
 TEST(HostHeader, MayLeaveOutThePortThatEverybodyAssumes) {
   EXPECT_TRUE(IsOwnHost("localhost", {80, {}}));
   EXPECT_TRUE(IsOwnHost("localhost:80", {80, {}}));
+  EXPECT_TRUE(IsOwnHost("localhost", {443, {}, true}));
+  EXPECT_FALSE(IsOwnHost("localhost", {443, {}})) << "without TLS it is 80";
+  EXPECT_FALSE(IsOwnHost("localhost", {80, {}, true}));
+}
+
+TEST(HostHeader, IsWrittenInOneWay) {
+  for (const char* host : {"", "localhost", "kova.example:9443", "10.0.0.5", "[fd00::5]",
+                           "[::ffff:1.2.3.4]:1", "%2frun%2fkova.sock", "a_b~c-d", "kova:"}) {
+    EXPECT_TRUE(IsHost(host)) << host;
+  }
+  for (const char* host : {"<i>", "a b", "a\"b", "a'b", "a&b", "a/b", "user@a", "a:b", "a:123456", "a:1:2",
+                           "[::1", "::1", "[]", "[a]b", "[a%]", "\x01", "\xc3\xa4"}) {
+    EXPECT_FALSE(IsHost(host)) << host;
+    EXPECT_EQ(StatusOf(AHeader({{"Host", host}})), 400u) << host;
+  }
 }
 
 TEST(HttpHeaderRules, TheHostIsLookedAtOnTcpOnly) {

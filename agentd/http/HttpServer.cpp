@@ -151,7 +151,7 @@ void HttpServer::Impl::Welcome(const HttpListener& listener, Socket socket) {
   HttpDoor door;
   if (!address.isUnix) {
     socket.set_option(asio::ip::tcp::no_delay(true), ignored);
-    door = {address.port, _serverNames};
+    door = {address.port, _serverNames, tls != nullptr};
   }
   HttpPeer peer = PeerOf(listener, socket);
   std::make_shared<HttpConnection>(_context, std::move(door), std::move(peer), std::move(socket), tls)

@@ -127,6 +127,27 @@ TEST(HttpServerTcp, TellsTheHandlerOfAPageInABrowser) {
   EXPECT_THAT(seen, testing::ElementsAre(true, false));
 }
 
+// Answers how the client came.
+HttpAnswer WhichWay(const HttpRequest& request) {
+  return {200, "text/plain", request.scheme + " " + request.authority};
+}
+
+TEST(HttpServerTcp, TellsTheHandlerByWhatNameItWasAsked) {
+  const std::string path = Testing::FreshSocketPath();
+  RunningServer server({.listen = {UnixAddress(path), anyPort}, .serverNames = {"Kova.example"}}, &WhichWay);
+  RawClient local(path);
+  local.Send("GET / HTTP/1.1\r\nHost: any.host:1\r\n\r\n");
+  EXPECT_EQ(local.Receive().body, "http any.host:1");
+  local.Send("GET / HTTP/1.0\r\n\r\n");
+  EXPECT_EQ(local.Receive().body, "http ");
+  RawClient remote(server.Address(1));
+  remote.Send("GET / HTTP/1.1\r\nHost: kova.Example:81\r\n\r\n");
+  EXPECT_EQ(remote.Receive().body, "http kova.Example:81");
+  const std::string loopback = server.Address(1).Name();
+  remote.Send("GET / HTTP/1.1\r\nHost: " + loopback + "\r\n\r\n");
+  EXPECT_EQ(remote.Receive().body, "http " + loopback);
+}
+
 TEST(HttpServerTcp, FieldsBehindABodyChangeNothingOfTheHeader) {
   HttpRequest seen;
   RunningServer server([&seen](const HttpRequest& request) {

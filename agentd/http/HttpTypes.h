@@ -30,6 +30,10 @@ struct HttpRequest {
   std::string soapAction = {};  // of the header of that name; empty: none
   bool hasOrigin = false;       // a page in a browser sends this
   HttpPeer peer = {};
+  // How the client came. The authority is whom it asked, as it wrote it: "kova.example:9443". On TCP that is
+  // one of the server's own names; on a Unix socket it may be any host, or empty.
+  std::string scheme = "http";  // or "https", behind TLS
+  std::string authority = {};   // letters, digits, "-._~%:[]" only
 };
 
 struct HttpAnswer {

@@ -3,8 +3,8 @@
 #include <map>
 #include <ostream>
 
+#include "host/FaultWords.h"
 #include "host/Text.h"
-#include "kovactl/FaultWords.h"
 #include "kovactl/Table.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
@@ -28,7 +28,7 @@ std::string Remark(const Value& task) {
   const Value* const fault = task.Find("fault");
   if (fault != nullptr && fault->kind == Kind::Object) {
     const auto read = Orbis::ReadJson(*fault, &Orbis::MethodFault::StaticType(), "fault");
-    return Explain(static_cast<const Orbis::MethodFault&>(*read));
+    return Host::Explain(static_cast<const Orbis::MethodFault&>(*read));
   }
   const Value* const percent = task.Find("percent");
   if (TextOf(task, "state") != "running" || percent == nullptr || percent->kind != Kind::Integer) {

@@ -4,7 +4,7 @@
 #include <array>
 #include <cstdio>
 
-#include "kovactl/FaultWords.h"
+#include "host/FaultWords.h"
 #include "nox/Kova.h"
 
 namespace Kovactl {
@@ -64,7 +64,7 @@ std::string StateOf(const DiskResult& result) {
 
 std::string ReasonOf(const DiskResult& result) {
   if (result.GetError()) {
-    return WordsFor(*result.GetError());
+    return Host::WordsFor(*result.GetError());
   }
   if (result.GetDisk() && HasLeft(*result.GetDisk())) {
     return "has left the host";

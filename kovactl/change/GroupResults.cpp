@@ -4,9 +4,10 @@
 #include <ostream>
 #include <set>
 
+#include "host/FaultWords.h"
 #include "host/Text.h"
 #include "kovactl/DiskGroups.h"
-#include "kovactl/FaultWords.h"
+#include "kovactl/FaultAdvice.h"
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
 #include "nox/Faults.h"
@@ -71,7 +72,7 @@ class Explainer {
  public:
   explicit Explainer(std::ostream& err) : _err(err) {}
   void Tell(const std::string& subject, const MethodFault& fault) {
-    _err << "kovactl: " << Host::Printable(subject + Explain(fault)) << "\n";
+    _err << "kovactl: " << Host::Printable(subject + Host::Explain(fault)) << "\n";
     const std::string advice = Advise(fault);
     if (!advice.empty() && _given.insert(advice).second) {
       _err << "  " << advice << "\n";

@@ -1,4 +1,4 @@
-#include "kovactl/FaultWords.h"
+#include "host/FaultWords.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -9,7 +9,7 @@
 #include "orbis/Any.h"
 #include "orbis/TypeDescriptor.h"
 
-namespace Kovactl {
+namespace Host {
 namespace {
 
 using Orbis::LocalizableMessage;
@@ -51,6 +51,11 @@ TEST(FaultWords, OfAFaultGoOnWithWhatItCarries) {
   Nox::Fault::NotPermitted notPermitted;
   notPermitted.SetRole("operator");
   EXPECT_EQ(Explain(notPermitted), "the caller's role does not allow this: operator");
+  Nox::Fault::HostChanged changed;
+  EXPECT_EQ(Explain(changed), "the host has changed since it was looked at");
+  changed.SetExpected("g1");
+  changed.SetActual("g2");
+  EXPECT_EQ(Explain(changed), "the host has changed since it was looked at: g1, now g2");
 }
 
 TEST(FaultWords, OfAFaultEndWithItsMessagesOrTheirKeys) {
@@ -78,10 +83,8 @@ Ref<Fault> WithKey(const std::string& key) {
 TEST(FaultWords, StandForTheKeysThatSayWhichLimitStoppedPlanning) {
   const auto allFlash = WithKey<Nox::Fault::KovaFault>("nox.agentd.kovaDiskOperation.allFlashExceed");
   EXPECT_THAT(Explain(*allFlash), HasSubstr("every all-flash disk group is full"));
-  EXPECT_THAT(Advise(*allFlash), HasSubstr("make room"));
   const auto hybrid = WithKey<Nox::Fault::KovaFault>("nox.agentd.kovaDiskOperation.hybridExceed");
   EXPECT_THAT(Explain(*hybrid), HasSubstr("every hybrid disk group is full"));
-  EXPECT_THAT(Advise(*hybrid), HasSubstr("make room"));
 }
 
 TEST(FaultWords, OfAGroupThatIsNotThereGoOnWithTheGroup) {
@@ -95,24 +98,7 @@ TEST(FaultWords, OfAGroupThatIsNotThereGoOnWithTheGroup) {
   (*fault->GetFaultMessage())[0]->SetArg(arguments);
   EXPECT_THAT(Explain(*fault),
               HasSubstr("; the host has no such disk group mounted (SSD: naa.1, Disks: naa.2)"));
-  EXPECT_THAT(Advise(*fault), HasSubstr("kovactl claim"));
-}
-
-TEST(FaultWords, AdviseWhatToDoAboutEachKindOfFault) {
-  for (const auto& fault : EveryFault()) {
-    const bool isBare = &fault->GetType() == &Nox::Fault::KovaFault::StaticType();
-    EXPECT_EQ(Advise(*fault).empty(), isBare) << fault->GetType().name;
-  }
-  EXPECT_THAT(Advise(Nox::Fault::DiskHasPartitions("naa.1")), HasSubstr("lsblk"));
-  EXPECT_THAT(Advise(Nox::Fault::DiskIsLastRemainingNonSSD("naa.1")), HasSubstr("kovactl remove-group"));
-}
-
-TEST(FaultWords, SayWhenABusyHostMayBeAskedAgain) {
-  Nox::Fault::Busy busy;
-  EXPECT_EQ(Advise(busy), "Try again later.");
-  busy.SetRetryAfterSeconds(30);
-  EXPECT_EQ(Advise(busy), "Try again in 30 s.");
 }
 
 }  // namespace
-}  // namespace Kovactl
+}  // namespace Host

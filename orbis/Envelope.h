@@ -37,7 +37,7 @@ class TESSA_API EnvelopeException : public ParseException {
 class TESSA_API SoapMessage {
  public:
   // Throws EnvelopeException, or ParseException for a text that is no XML of ours. Headers are passed over,
-  // but for those that must be understood.
+  // but for those that must be understood and are addressed to whoever gets the message.
   SoapMessage(std::string_view text, const Limits& limits);
   ~SoapMessage();
   SoapMessage(const SoapMessage&) = delete;
@@ -46,7 +46,8 @@ class TESSA_API SoapMessage {
   // The name of the one element in the body, which is of the API's namespace. Lives as long as the message.
   std::string_view GetName() const noexcept;
 
-  // That element as an object of the type. Throws ParseException.
+  // That element as an object of the type, read as generously as requests are: elements stand in any order,
+  // those that only answers must have may be missing, and xsi:nil means absent. Throws ParseException.
   Ref<Any> Read(const TypeDescriptor& type) const;
 
  private:
@@ -58,9 +59,16 @@ class TESSA_API SoapMessage {
 // does, and leaves `out` as it was.
 TESSA_API void AppendSoapMessage(std::string_view name, const DataObject& content, std::string& out);
 
-// Appends a message that is a fault. `code` is "Client", "Server" or an EnvelopeException's; `fault`, if
-// there is one, is the typed detail. Never fails on texts.
-TESSA_API void AppendSoapFault(std::string_view code, std::string_view text, const MethodFault* fault,
+// What stands in a fault beside its text.
+struct SoapDetail {
+  const MethodFault* fault = nullptr;  // the typed fault; null: none
+  std::string_view name = {};          // of a further element, behind it; empty: none
+  std::string_view text = {};          // what that element holds
+};
+
+// Appends a message that is a fault. `code` is "Client", "Server" or an EnvelopeException's. Never fails on
+// texts.
+TESSA_API void AppendSoapFault(std::string_view code, std::string_view text, const SoapDetail& detail,
                                std::string& out);
 
 }  // namespace Orbis

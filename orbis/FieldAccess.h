@@ -64,6 +64,12 @@ FieldDescriptor Reference(std::string_view name, FieldKind kind, Presence presen
   return field;
 }
 
+// The same field, which requests may leave out.
+inline FieldDescriptor Output(FieldDescriptor field) {
+  field.output = true;
+  return field;
+}
+
 template <class T>
 Ref<Any> Create() {
   return new T;

@@ -5,7 +5,7 @@
 namespace Orbis {
 
 ParseException::ParseException(std::string path, int line, const std::string& reason)
-    : Throwable(path + ", line " + std::to_string(line) + ": " + reason),
+    : Throwable(path + (line > 0 ? ", line " + std::to_string(line) : "") + ": " + reason),
       _path(std::move(path)),
       _line(line),
       _reason(reason) {}

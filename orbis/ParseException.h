@@ -9,8 +9,8 @@ namespace Orbis {
 
 class TESSA_API ParseException : public Tessa::Throwable {
  public:
-  // `path` names the element or value ("/object/diskResult[2]/disk"), `line` counts from 1; 0 when the
-  // text as a whole is refused.
+  // `path` names the element or value ("/object/diskResult[2]/disk"), `line` counts from 1; 0, which is not
+  // told, when the text as a whole is refused.
   ParseException(std::string path, int line, const std::string& reason);
   ParseException(const ParseException&);
   ParseException& operator=(const ParseException&);

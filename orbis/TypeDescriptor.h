@@ -40,6 +40,7 @@ struct FieldDescriptor {
   Presence presence;
   const TypeDescriptor& (*declaredType)();  // kind Object: the declared type of the object or element
   int since = 0;                            // order of the first version that has the field
+  bool output = false;                      // a required one that a request may leave out
 
   // Scalars: the value, or null when unset; and the value to write to, set if it was not.
   const void* (*read)(const DataObject&) = nullptr;

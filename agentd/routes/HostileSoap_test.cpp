@@ -150,11 +150,14 @@ INSTANTIATE_TEST_SUITE_P(
         Hostile{"OtherNamespace", Query("<names xmlns='urn:other'>a</names>"), "InvalidArgument"},
         Hostile{"ElementInText", Query("<names><b/></names>"), "InvalidArgument"},
         Hostile{"CommentInValue", Query("<names>a<!-- -->b</names>"), "InvalidArgument"},
-        Hostile{"Nil", Query("<names i:nil='true'/>"), "InvalidArgument"},
+        Hostile{"NilWhereAValueMustBe",
+                open + "<RemoveDisk xmlns='urn:nox'><disk i:nil='true'/></RemoveDisk>" + close,
+                "xsi:nil is not allowed"},
+        Hostile{"NilRequestThatNeedsParameters", open + "<RemoveDisk xmlns='urn:nox' i:nil='true'/>" + close,
+                "InvalidArgument"},
         Hostile{"Reference", Query("<names href='#1'/>"), "InvalidArgument"},
         Hostile{"Missing", open + "<RemoveDisk xmlns='urn:nox'/>" + close, "InvalidArgument"},
         Hostile{"Repeated", Removal("<passThrough/><passThrough/>"), "InvalidArgument"},
-        Hostile{"OutOfOrder", Removal("<optionText/><passThrough/>"), "InvalidArgument"},
         Hostile{"TooLarge", Removal("<optionFirst>2147483648</optionFirst>"), "InvalidArgument"},
         Hostile{"NoNumber", Removal("<optionFirst/>"), "InvalidArgument"},
         Hostile{"TypeOfAnotherKind", Addition("<disks i:type='KovaHostDiskMapping'/>"), "InvalidArgument"},
@@ -164,7 +167,7 @@ INSTANTIATE_TEST_SUITE_P(
         Hostile{"UnknownType", Addition("<disks i:type='Nothing'/>"), "InvalidArgument"},
         Hostile{"TypeOfTheRequest", open + "<AddDisks xmlns='urn:nox' i:type='HostScsiDisk'/>" + close,
                 "InvalidArgument"},
-        Hostile{"MissingField", Addition("<disks><deviceName/></disks>"), "InvalidArgument"}),
+        Hostile{"MissingField", Addition("<disks><capacity/></disks>"), "InvalidArgument"}),
     nameOfRow);
 
 TEST_F(HostileSoap, AMessageCutOffAnywhereIsAFault) {

@@ -182,7 +182,7 @@ void PostSoap(const Call& call) {
 }
 
 void GetSoap(const Call& call) {
-  call.responder.Answer(DescribeService(call.target));
+  call.responder.Answer(DescribeService(call.request, call.target));
 }
 
 bool IsNothing(std::string_view rest) {

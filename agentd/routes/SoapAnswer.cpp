@@ -1,13 +1,15 @@
 #include "agentd/routes/SoapAnswer.h"
 
 #include <array>
+#include <optional>
 #include <string>
+#include <type_traits>
 
+#include "host/FaultWords.h"
 #include "host/Refusal.h"
 #include "nox/Faults.h"
 #include "nox/Operations.h"
 #include "orbis/Envelope.h"
-#include "orbis/FaultText.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/WrittenSoap.h"
 #include "tessa/Narrow.h"
@@ -27,19 +29,23 @@ HttpAnswer Xml(unsigned status) {
   return http;
 }
 
-template <class Response, class Result>
-Ref<Orbis::DataObject> Respond(const Host::Answer& answer) {
-  const auto response = MakeRef<Response>();
-  response->SetResult(Tessa::NarrowToType<Result>(answer.result));
-  response->SetFault(answer.fault);
-  return response;
-}
+// An answer, and the id of its task if it is a change's.
+struct Told {
+  const Host::Answer& answer;
+  std::string_view task;  // empty: none
+};
 
-// For an operation without a result.
-template <class Response>
-Ref<Orbis::DataObject> RespondPlainly(const Host::Answer& answer) {
+// Sets what there is a place for.
+template <class Response, class Result = void>
+Ref<Orbis::DataObject> Respond(const Told& told) {
   const auto response = MakeRef<Response>();
-  response->SetFault(answer.fault);
+  if constexpr (!std::is_void_v<Result>) {
+    response->SetResult(Tessa::NarrowToType<Result>(told.answer.result));
+  }
+  response->SetFault(told.answer.fault);
+  if constexpr (requires { response->GetTask(); }) {
+    response->SetTask(told.task.empty() ? std::nullopt : std::optional(std::string(told.task)));
+  }
   return response;
 }
 
@@ -49,20 +55,20 @@ using ConfigInfo = Nox::Kova::Host::ConfigInfo;
 
 struct Row {
   std::string_view operation;
-  Ref<Orbis::DataObject> (*respond)(const Host::Answer& answer);
+  Ref<Orbis::DataObject> (*respond)(const Told& told);
 };
 
 constexpr std::array<Row, 10> rows = {{
     {"QueryDisksForKova", &Respond<Op::QueryDisksForKovaResponse, DiskResults>},
     {"AddDisks", &Respond<Op::AddDisksResponse, MapResults>},
     {"InitializeDisks", &Respond<Op::InitializeDisksResponse, MapResults>},
-    {"RemoveDisk", &RespondPlainly<Op::RemoveDiskResponse>},
-    {"RemoveDiskMapping", &RespondPlainly<Op::RemoveDiskMappingResponse>},
+    {"RemoveDisk", &Respond<Op::RemoveDiskResponse>},
+    {"RemoveDiskMapping", &Respond<Op::RemoveDiskMappingResponse>},
     {"AddAllEligibleDisks", &Respond<Op::AddAllEligibleDisksResponse, MapResults>},
     {"UnmountDiskMapping", &Respond<Op::UnmountDiskMappingResponse, MapResults>},
     {"GetStorageInfo", &Respond<Op::GetStorageInfoResponse, ConfigInfo::StorageInfo>},
     {"GetConfigInfo", &Respond<Op::GetConfigInfoResponse, ConfigInfo>},
-    {"ClaimUnmountedDiskgroup", &RespondPlainly<Op::ClaimUnmountedDiskgroupResponse>},
+    {"ClaimUnmountedDiskgroup", &Respond<Op::ClaimUnmountedDiskgroupResponse>},
 }};
 
 bool IsNothing(const Ref<Orbis::Any>& result) {
@@ -77,7 +83,8 @@ const char* CodeOf(const MethodFault& fault) {
   return server ? "Server" : "Client";
 }
 
-// For whoever reads the fault's text alone: its first message in words, if it has one.
+// For whoever reads the fault's text alone: its first message in words or, without one, what its kind means
+// and what it carries.
 std::string TextOf(const MethodFault& fault) {
   const auto messages = fault.GetFaultMessage();
   for (const Orbis::LocalizableMessage* message : *messages) {
@@ -85,29 +92,38 @@ std::string TextOf(const MethodFault& fault) {
       return fault.GetType().name + ": " + message->GetMessage();
     }
   }
-  return Orbis::FaultText(fault);
+  return fault.GetType().name + ": " + Host::Explain(fault);
 }
 
-HttpAnswer TypedFault(const MethodFault& fault) {
+HttpAnswer TypedFault(const MethodFault& fault, std::string_view task = {}) {
   HttpAnswer http = Xml(500);
-  Orbis::AppendSoapFault(CodeOf(fault), TextOf(fault), &fault, http.body);
+  const std::string_view name = task.empty() ? "" : "task";
+  Orbis::AppendSoapFault(CodeOf(fault), TextOf(fault), {&fault, name, task}, http.body);
+  return http;
+}
+
+HttpAnswer ToSoap(std::string_view operation, const Told& told) {
+  if (told.answer.fault && IsNothing(told.answer.result)) {
+    return TypedFault(*told.answer.fault, told.task);
+  }
+  HttpAnswer http = Xml(200);
+  for (const Row& row : rows) {
+    if (row.operation == operation) {
+      const Ref<Orbis::DataObject> response = row.respond(told);
+      Orbis::AppendSoapMessage(response->GetType().name, *response, http.body);
+    }
+  }
   return http;
 }
 
 }  // namespace
 
 HttpAnswer ToSoap(std::string_view operation, const Host::Answer& answer) {
-  if (answer.fault && IsNothing(answer.result)) {
-    return TypedFault(*answer.fault);
-  }
-  HttpAnswer http = Xml(200);
-  for (const Row& row : rows) {
-    if (row.operation == operation) {
-      const Ref<Orbis::DataObject> response = row.respond(answer);
-      Orbis::AppendSoapMessage(response->GetType().name, *response, http.body);
-    }
-  }
-  return http;
+  return ToSoap(operation, Told{answer, {}});
+}
+
+HttpAnswer ToSoap(const Task& ended) {
+  return ToSoap(ended.operation, Told{ended.answer, ended.id});
 }
 
 HttpAnswer ToSoap(std::string_view operation, const Host::WrittenAnswer& answer) {
@@ -132,7 +148,7 @@ HttpAnswer ToSoap(const Orbis::ParseException& refused) {
 
 HttpAnswer SoapFault(std::string_view code, std::string_view text) {
   HttpAnswer http = Xml(500);
-  Orbis::AppendSoapFault(code, text, nullptr, http.body);
+  Orbis::AppendSoapFault(code, text, {}, http.body);
   return http;
 }
 

@@ -6,6 +6,7 @@
 #include <string_view>
 
 #include "agentd/http/HttpTypes.h"
+#include "agentd/tasks/Task.h"
 #include "host/Answer.h"
 
 namespace Orbis {
@@ -17,6 +18,9 @@ namespace Agentd {
 // The operation's response, with the result and, beside it, the fault; or a SOAP fault with the typed fault
 // as its detail, when there is a fault and no result, or an empty list.
 HttpAnswer ToSoap(std::string_view operation, const Host::Answer& answer);
+
+// The same of a change that has ended, with the id of its task: in the response, or in the fault's detail.
+HttpAnswer ToSoap(const Task& ended);
 
 // The same of a query of disks, whose result is still a text.
 HttpAnswer ToSoap(std::string_view operation, const Host::WrittenAnswer& answer);

@@ -33,15 +33,10 @@ HttpAnswer Made(const Make& make) {
   }
 }
 
-// The service, with the schema where this server has it.
-std::string Wsdl() {
-  std::string text(Nox::WsdlText());
-  const std::string reference = "schemaLocation=\"" + std::string(schemaFile);
-  const std::size_t at = text.find(reference);
-  if (at != std::string::npos) {
-    text.replace(at, reference.size(), "schemaLocation=\"?xsd=" + std::string(schemaFile));
-  }
-  return text;
+// Where the client reaches this service: as it has just done. Who asked no host came by a socket file, and
+// knows how.
+std::string AddressFor(const HttpRequest& request) {
+  return request.scheme + "://" + (request.authority.empty() ? "localhost" : request.authority) + "/soap";
 }
 
 void Submit(const SoapService& service, SoapRequest& read, const HttpResponder& responder) {
@@ -51,10 +46,7 @@ void Submit(const SoapService& service, SoapRequest& read, const HttpResponder& 
       [&api = service.api, &operation = *read.operation, arguments = std::move(read.arguments)] {
         return operation.call(api, arguments);
       },
-      [responder](const Task& ended) {
-        responder.Answer(Made([&ended] { return ToSoap(ended.operation, ended.answer); }));
-      },
-      bytes);
+      [responder](const Task& ended) { responder.Answer(Made([&ended] { return ToSoap(ended); })); }, bytes);
 }
 
 void Ask(const SoapService& service, SoapRequest& read, const HttpResponder& responder) {
@@ -86,11 +78,11 @@ void ServeSoap(const SoapService& service, const HttpRequest& request, const Htt
   }
 }
 
-HttpAnswer DescribeService(const HttpTarget& target) {
+HttpAnswer DescribeService(const HttpRequest& request, const HttpTarget& target) {
   if (target.parameters.size() == 1) {
     const auto& [name, value] = target.parameters.front();
     if (name == "wsdl" && value.empty()) {
-      return {200, "text/xml; charset=utf-8", Wsdl()};
+      return {200, "text/xml; charset=utf-8", Nox::WsdlText(AddressFor(request), "")};
     }
     if (name == "xsd" && value == schemaFile) {
       return {200, "text/xml; charset=utf-8", std::string(Nox::XsdText())};

@@ -24,7 +24,8 @@ struct SoapService {
 // fault.
 void ServeSoap(const SoapService& service, const HttpRequest& request, const HttpResponder& responder);
 
-// "/soap?wsdl" and, as it refers to, "/soap?xsd=nox.xsd".
-HttpAnswer DescribeService(const HttpTarget& target);
+// "/soap?wsdl": one document, whose address is the one that this client came by; and "/soap?xsd=nox.xsd", the
+// types alone, for people.
+HttpAnswer DescribeService(const HttpRequest& request, const HttpTarget& target);
 
 }  // namespace Agentd

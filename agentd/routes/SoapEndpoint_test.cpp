@@ -86,6 +86,45 @@ TEST_F(SoapEndpoint, CallsEveryOperationWithItsParameters) {
                   "RemoveDiskMapping naa.1! < naa.2! > p o 1 2", "ClaimUnmountedDiskgroup"));
 }
 
+TEST_F(SoapEndpoint, TakesADiskThatHasNothingButItsName) {
+  const auto named = [](const std::string& element, const std::string& name) {
+    return "<" + element + "><canonicalName>" + name + "</canonicalName></" + element + ">";
+  };
+  const std::string group = named("nonSsd", "naa.2") + named("ssd", "naa.1");
+  Ask("AddDisks", named("disks", "naa.1"));
+  Ask("RemoveDiskMapping", "<mapping>" + group + "</mapping>");
+  EXPECT_THAT(_api.Asked(), ElementsAre("AddDisks naa.1?", "RemoveDiskMapping naa.1? < naa.2? >   0 0"));
+}
+
+TEST_F(SoapEndpoint, TakesParametersInAnyOrderAndNilForAbsent) {
+  Ask("RemoveDisk",
+      "<optionSecond>2</optionSecond><passThrough "
+      "i:nil='true'/><optionText>o</optionText><disk>naa.1</disk>");
+  Post(Message("<GetConfigInfo xmlns='urn:nox' i:nil='true'/>"));
+  EXPECT_THAT(_api.Asked(), ElementsAre("RemoveDisk naa.1  o 0 2", "GetConfigInfo"));
+}
+
+TEST_F(SoapEndpoint, TheAnswerToAChangeTellsItsTask) {
+  const auto lastTask = [this] { return "<task xmlns=\"urn:nox\">" + _tasks.List().back().id + "</task>"; };
+  const std::string done = Ask("AddAllEligibleDisks").body;
+  EXPECT_THAT(done, HasSubstr("<task>" + _tasks.List().back().id + "</task></AddAllEligibleDisksResponse>"));
+  EXPECT_THAT(Ask("GetConfigInfo").body, Not(HasSubstr("<task")));
+  _api.answer.fault = MakeRef<Nox::Fault::InsufficientDisks>();
+  const std::string failed = Ask("AddAllEligibleDisks").body;
+  EXPECT_THAT(failed, HasSubstr("</fault>" + lastTask() + "</detail>"));
+}
+
+TEST_F(SoapEndpoint, AFaultSaysInWordsWhatIsWrongWithWhat) {
+  _api.answer.fault = MakeRef<Nox::Fault::DiskHasPartitions>("naa.1");
+  EXPECT_THAT(
+      Ask("AddAllEligibleDisks").body,
+      HasSubstr(
+          "<faultstring>DiskHasPartitions: holds partitions or is in use by others: naa.1</faultstring>"));
+  _api.answer.fault = MakeRef<Nox::Fault::InsufficientDisks>();
+  EXPECT_THAT(Ask("AddAllEligibleDisks").body,
+              HasSubstr("<faultstring>InsufficientDisks: too few disks for a disk group</faultstring>"));
+}
+
 TEST_F(SoapEndpoint, LeavesOutParametersThatWereLeftOut) {
   Ask("QueryDisksForKova");
   Ask("AddDisks");
@@ -128,13 +167,12 @@ TEST_F(SoapEndpoint, AnswersWithResultAndFault) {
   EXPECT_EQ(answer.status, 200u);
   EXPECT_THAT(answer.body,
               AllOf(HasSubstr("<AddAllEligibleDisksResponse xmlns=\"urn:nox\"><result>"),
-                    HasSubstr("<fault xsi:type=\"DiskHasPartitions\"><device>naa.1</device></fault>"
-                              "</AddAllEligibleDisksResponse>")));
+                    HasSubstr("<fault xsi:type=\"DiskHasPartitions\"><device>naa.1</device></fault><task>")));
 }
 
 TEST_F(SoapEndpoint, AnswersWithNothingWhenThereIsNothingToSay) {
   EXPECT_THAT(Ask("RemoveDisk", "<disk>naa.1</disk>").body,
-              HasSubstr("<RemoveDiskResponse xmlns=\"urn:nox\"></RemoveDiskResponse>"));
+              HasSubstr("<RemoveDiskResponse xmlns=\"urn:nox\"><task>"));
 }
 
 TEST_F(SoapEndpoint, AFaultAloneIsATypedSoapFault) {
@@ -150,7 +188,7 @@ TEST_F(SoapEndpoint, AFaultAloneIsATypedSoapFault) {
     EXPECT_THAT(answer.body,
                 AllOf(HasSubstr("<faultcode>soapenv:Client</faultcode>"),
                       HasSubstr("<detail><fault xmlns=\"urn:nox\" xsi:type=\"DiskHasPartitions\">"
-                                "<device>naa.1</device></fault></detail>")));
+                                "<device>naa.1</device></fault>")));
   }
 }
 
@@ -203,13 +241,32 @@ TEST_F(SoapEndpoint, DescribesItself) {
   const HttpAnswer wsdl = Serve({"GET", "/soap?wsdl", "", ""});
   EXPECT_EQ(wsdl.status, 200u);
   EXPECT_EQ(wsdl.contentType, "text/xml; charset=utf-8");
-  EXPECT_THAT(wsdl.body, AllOf(StartsWith("<?xml"), HasSubstr("schemaLocation=\"?xsd=nox.xsd\"")));
+  EXPECT_THAT(wsdl.body, AllOf(StartsWith("<?xml"), Not(HasSubstr("schemaLocation"))));
   const HttpAnswer xsd = Serve({"GET", "/soap?xsd=nox.xsd", "", ""});
   EXPECT_EQ(xsd.status, 200u);
   EXPECT_THAT(xsd.body, HasSubstr("targetNamespace=\"urn:nox\""));
   for (const char* target : {"/soap", "/soap?xsd=other", "/soap?wsdl&x=1", "/soap?wsdl=1"}) {
     EXPECT_EQ(Serve({"GET", target, "", ""}).status, 404u) << target;
   }
+}
+
+TEST_F(SoapEndpoint, IsWhereTheClientHasFoundIt) {
+  const auto addressFor = [this](const std::string& scheme, const std::string& authority) {
+    const std::string text = Serve({.method = "GET",
+                                    .target = "/soap?wsdl",
+                                    .contentType = "",
+                                    .body = "",
+                                    .scheme = scheme,
+                                    .authority = authority})
+                                 .body;
+    const std::string before = "<soap:address location=\"";
+    const std::size_t begin = text.find(before) + before.size();
+    return text.substr(begin, text.find('"', begin) - begin);
+  };
+  EXPECT_EQ(addressFor("http", "127.0.0.1:8080"), "http://127.0.0.1:8080/soap");
+  EXPECT_EQ(addressFor("https", "kova.example"), "https://kova.example/soap");
+  EXPECT_EQ(addressFor("http", "[::1]:80"), "http://[::1]:80/soap");
+  EXPECT_EQ(addressFor("http", ""), "http://localhost/soap") << "over a socket file, by a client of old";
 }
 
 TEST_F(SoapEndpoint, IsBusyWhenTooManyChangesWait) {

@@ -9,8 +9,10 @@
 
 namespace Orbis::Soap {
 
-// The value of the element, whose declared type may be null (any). Throws ParseException.
-Ref<Any> ReadElement(const Xml::Element& element, const TypeDescriptor* declared);
+// The object of a request's element, as clients of other makes write them: elements stand in any order, those
+// that answers alone must have may be missing, and one that is nil is as if it were not there. Throws
+// ParseException.
+Ref<Any> ReadRequestElement(const Xml::Element& element, const TypeDescriptor& declared);
 
 // Appends the element, in the API's namespace and with xsi:type unless `declared` is what it is. The prefixes
 // xsd and xsi must be bound there. Throws as SerializeObjectToSoap does; `out` then holds a part.

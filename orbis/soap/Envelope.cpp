@@ -30,7 +30,7 @@ bool IsEnvelopes(const Element* element, std::string_view name) {
 
 void CheckHeader(const Element& header) {
   for (const Element* entry = header.firstChild; entry != nullptr; entry = entry->nextSibling) {
-    if (entry->mustUnderstand) {
+    if (entry->mustUnderstand && !entry->forAnother) {
       Refuse("MustUnderstand", *entry, "no header is understood, and this one demands it");
     }
   }
@@ -98,6 +98,17 @@ void AppendEnvelope(std::string& out, Append append) {
   }
 }
 
+void AppendDetail(const SoapDetail& detail, std::string& out) {
+  if (detail.fault != nullptr) {
+    Soap::AppendElement("fault", *detail.fault, &MethodFault::StaticType(), out);
+  }
+  if (!detail.name.empty()) {
+    out.append("<").append(detail.name).append(" xmlns=\"").append(apiNamespace).append("\">");
+    Xml::AppendText(out, detail.text);
+    out.append("</").append(detail.name).append(">");
+  }
+}
+
 }  // namespace
 
 EnvelopeException::EnvelopeException(const char* code, std::string path, int line, const std::string& reason)
@@ -122,7 +133,7 @@ std::string_view SoapMessage::GetName() const noexcept {
 }
 
 Ref<Any> SoapMessage::Read(const TypeDescriptor& type) const {
-  return Soap::ReadElement(_store->content, &type);
+  return Soap::ReadRequestElement(_store->content, type);
 }
 
 void AppendSoapMessage(std::string_view name, const DataObject& content, std::string& out) {
@@ -152,15 +163,15 @@ bool AppendMessageOfSoap(std::string_view name, std::string_view field, const Ty
   }
 }
 
-void AppendSoapFault(std::string_view code, std::string_view text, const MethodFault* fault,
+void AppendSoapFault(std::string_view code, std::string_view text, const SoapDetail& detail,
                      std::string& out) {
   AppendEnvelope(out, [&] {
     out.append("<soapenv:Fault><faultcode>soapenv:").append(code).append("</faultcode><faultstring>");
     Xml::AppendText(out, text);
     out.append("</faultstring>");
-    if (fault != nullptr) {
+    if (detail.fault != nullptr || !detail.name.empty()) {
       out.append("<detail>");
-      Soap::AppendElement("fault", *fault, &MethodFault::StaticType(), out);
+      AppendDetail(detail, out);
       out.append("</detail>");
     }
     out.append("</soapenv:Fault>");

@@ -72,6 +72,16 @@ TEST(SoapMessage, RefusesAHeaderThatMustBeUnderstood) {
   }
 }
 
+TEST(SoapMessage, LeavesHeadersForOthersToThem) {
+  const auto refusalOf = [](const std::string& actor) {
+    return Refusal(Enveloped(aMessage, "<e:Header><t:x xmlns:t='urn:t' e:mustUnderstand='1' e:actor='" +
+                                           actor + "'/></e:Header>"));
+  };
+  EXPECT_EQ(refusalOf("urn:a-proxy"), "accepted");
+  EXPECT_THAT(refusalOf(""), HasSubstr("MustUnderstand: "));
+  EXPECT_THAT(refusalOf("http://schemas.xmlsoap.org/soap/actor/next"), HasSubstr("MustUnderstand: "));
+}
+
 TEST(SoapMessage, RefusesAttributesOfDataButNotOfTheEnvelope) {
   EXPECT_EQ(Refusal("<e:Envelope xmlns:e='http://schemas.xmlsoap.org/soap/envelope/' e:encodingStyle=''>"
                     "<e:Body id='b'>" +
@@ -122,7 +132,7 @@ TEST(AppendSoapMessage, LeavesTheTextAloneWhenItThrows) {
 TEST(AppendSoapFault, NamesTheTypeOfTheDetail) {
   const auto fault = MakeRef<Fault::SystemError>("it broke");
   std::string text;
-  AppendSoapFault("Server", "a <b>", fault.Get(), text);
+  AppendSoapFault("Server", "a <b>", {.fault = fault.Get()}, text);
   EXPECT_THAT(text, HasSubstr("<soapenv:Fault><faultcode>soapenv:Server</faultcode><faultstring>a &lt;b&gt;"
                               "</faultstring><detail><fault xmlns=\"urn:nox\" xsi:type=\"SystemError\">"
                               "<reason>it broke</reason></fault></detail></soapenv:Fault>"));
@@ -130,8 +140,14 @@ TEST(AppendSoapFault, NamesTheTypeOfTheDetail) {
 
 TEST(AppendSoapFault, HasNoDetailWithoutAFault) {
   std::string text;
-  AppendSoapFault("Client", "no", nullptr, text);
+  AppendSoapFault("Client", "no", {}, text);
   EXPECT_THAT(text, HasSubstr("<faultstring>no</faultstring></soapenv:Fault>"));
+}
+
+TEST(AppendSoapFault, HasRoomForMoreThanTheFault) {
+  std::string text;
+  AppendSoapFault("Client", "no", {.fault = nullptr, .name = "task", .text = "a<b"}, text);
+  EXPECT_THAT(text, HasSubstr("<detail><task xmlns=\"urn:nox\">a&lt;b</task></detail></soapenv:Fault>"));
 }
 
 }  // namespace

@@ -1,4 +1,6 @@
+#include <algorithm>
 #include <string>
+#include <vector>
 
 #include "orbis/Excerpt.h"
 #include "orbis/ParseException.h"
@@ -22,9 +24,15 @@ std::string Quoted(std::string_view text) {
   return "'" + std::string(text) + "'";
 }
 
+enum class Reading {
+  Exact,     // of what we wrote: in our order, complete
+  Generous,  // of requests, which clients of other makes write: see ReadRequestElement
+};
+
 class SoapReader {
  public:
-  SoapReader(const Version* version, const TypeFilter* filter) : _version(version), _filter(filter) {}
+  explicit SoapReader(Reading reading, const Version* version = nullptr, const TypeFilter* filter = nullptr)
+      : _reading(reading), _version(version), _filter(filter) {}
 
   // A value whose declared type is null (any) or a data object's or list's.
   Ref<Any> ReadValue(const Element& element, const TypeDescriptor* declared) const {
@@ -42,6 +50,11 @@ class SoapReader {
     const Ref<Any> boxed = type.create();
     ReadScalar(element, type.simple, BoxedValue(*boxed));
     return boxed;
+  }
+
+  // An element that is nil holds no fields.
+  Ref<Any> ReadRoot(const Element& element, const TypeDescriptor& declared) const {
+    return element.nil ? ReadObject(element, declared) : ReadValue(element, &declared);
   }
 
  private:
@@ -85,6 +98,10 @@ class SoapReader {
     CheckNoText(element);
     const Ref<Any> value = type.create();
     auto& object = static_cast<DataObject&>(*value);
+    if (_reading == Reading::Generous) {
+      ReadInAnyOrder(element, type, object);
+      return value;
+    }
     const Element* child = element.firstChild;
     for (const FieldDescriptor* field : type.fields) {
       if (Has(field->since)) {
@@ -95,6 +112,59 @@ class SoapReader {
       RefuseExtra(*child, type);
     }
     return value;
+  }
+
+  void ReadInAnyOrder(const Element& element, const TypeDescriptor& type, DataObject& object) const {
+    std::vector<bool> found(type.fields.size());
+    std::vector<Ref<Any>> lists(type.fields.size());
+    for (const Element* child = element.firstChild; child != nullptr; child = child->nextSibling) {
+      const std::size_t index = IndexOfField(*child, type);
+      const FieldDescriptor& field = *type.fields[index];
+      if (child->nil && MayBeLeftOut(field)) {
+        continue;
+      }
+      if (field.presence == Presence::List) {
+        ReadItem(*child, field, object, lists[index]);
+      } else if (found[index]) {
+        Refuse(*child, "element " + Quoted(child->name) + " is repeated");
+      } else {
+        ReadSingle(*child, field, object);
+      }
+      found[index] = true;
+    }
+    for (std::size_t i = 0; i < found.size(); ++i) {
+      if (!found[i] && !MayBeLeftOut(*type.fields[i])) {
+        Refuse(element, "required element " + Quoted(type.fields[i]->name) + " is missing");
+      }
+    }
+  }
+
+  static bool MayBeLeftOut(const FieldDescriptor& field) {
+    return field.presence != Presence::Required || field.output;
+  }
+
+  static std::size_t IndexOfField(const Element& child, const TypeDescriptor& type) {
+    const auto isIt = [&child](const FieldDescriptor* field) { return IsNamed(&child, field->name); };
+    const auto field = std::find_if(type.fields.begin(), type.fields.end(), isIt);
+    if (field == type.fields.end()) {
+      RefuseUnknown(child, type);
+    }
+    return static_cast<std::size_t>(field - type.fields.begin());
+  }
+
+  // One more element of a list, which is made with the first.
+  void ReadItem(const Element& child, const FieldDescriptor& field, DataObject& object,
+                Ref<Any>& list) const {
+    const bool ofTexts = field.kind == FieldKind::Strings;
+    if (!list) {
+      list = ofTexts ? Ref<Any>(MakeRef<TextList>()) : Ref<Any>(field.declaredType().array->createArray());
+      field.assign(object, list);
+    }
+    if (ofTexts) {
+      ReadText(child, static_cast<TextList&>(*list));
+    } else {
+      static_cast<DataArrayBase&>(*list).AppendAny(ReadValue(child, &field.declaredType()));
+    }
   }
 
   static bool IsNamed(const Element* element, std::string_view name) {
@@ -122,18 +192,23 @@ class SoapReader {
     if (field.presence == Presence::List) {
       return ReadListField(child, field, object);
     }
+    ReadSingle(*child, field, object);
+    return child->nextSibling;
+  }
+
+  // The value of a field that is no list.
+  void ReadSingle(const Element& child, const FieldDescriptor& field, DataObject& object) const {
     if (IsScalar(field.kind)) {
-      CheckDeclaredSimple(*child, field.kind);
-      ReadScalar(*child, field.kind, field.write(object));
+      CheckDeclaredSimple(child, field.kind);
+      ReadScalar(child, field.kind, field.write(object));
     } else if (field.kind == FieldKind::Base64) {
-      CheckDeclaredSimple(*child, field.kind);
+      CheckDeclaredSimple(child, field.kind);
       const Ref<Binary> bytes = MakeRef<Binary>();
-      ReadScalar(*child, FieldKind::Base64, &bytes->Value());
+      ReadScalar(child, FieldKind::Base64, &bytes->Value());
       field.assign(object, bytes);
     } else {
-      field.assign(object, ReadValue(*child, field.kind == FieldKind::Any ? nullptr : &field.declaredType()));
+      field.assign(object, ReadValue(child, field.kind == FieldKind::Any ? nullptr : &field.declaredType()));
     }
-    return child->nextSibling;
   }
 
   const Element* ReadListField(const Element* child, const FieldDescriptor& field, DataObject& object) const {
@@ -224,10 +299,15 @@ class SoapReader {
         Refuse(element, "element " + Quoted(element.name) + " is repeated or out of order");
       }
     }
+    RefuseUnknown(element, type);
+  }
+
+  [[noreturn]] static void RefuseUnknown(const Element& element, const TypeDescriptor& type) {
     Refuse(element, "unknown element " + Quoted(element.name) + " in namespace " + Quoted(element.nameSpace) +
                         "; " + type.name + " has no such field");
   }
 
+  const Reading _reading;
   const Version* _version;
   const TypeFilter* _filter;
 };
@@ -242,13 +322,13 @@ Ref<Any> ReadDocument(std::string_view text, const Limits& limits, const Version
   if (root.type.name.empty()) {
     Refuse(root, "the root element needs xsi:type");
   }
-  return SoapReader(version, filter).ReadValue(root, type);
+  return SoapReader(Reading::Exact, version, filter).ReadValue(root, type);
 }
 
 }  // namespace
 
-Ref<Any> Soap::ReadElement(const Element& element, const TypeDescriptor* declared) {
-  return SoapReader(nullptr, nullptr).ReadValue(element, declared);
+Ref<Any> Soap::ReadRequestElement(const Element& element, const TypeDescriptor& declared) {
+  return SoapReader(Reading::Generous).ReadRoot(element, declared);
 }
 
 void DeserializeSoapToObject(std::string_view text, Ref<Any>& value, const Version* version,

@@ -80,13 +80,12 @@ TEST(AppendJsonOfSoap, WritesEveryKindOfValue) {
   pairs->Append(APair("none", MakeRef<Pairs>()));
   std::string json = "kept ";
   EXPECT_TRUE(AppendJsonOfSoap(Written(*pairs), json));
-  EXPECT_EQ(json,
-            R"(kept [{"@type":"KeyAnyValue","key":"a & b","value":)"
-            R"({"@type":"TextList","@value":["<item>","</item>",""]}},)"
-            R"({"@type":"KeyAnyValue","key":"","value":{"@type":"KeyAnyValue","key":"inner","value":)"
-            R"({"@type":"TextList","@value":["x"]}}},)"
-            R"({"@type":"KeyAnyValue","key":"\r\n\"\\\t","value":{"@type":"xsd:int","@value":-3}},)"
-            R"({"@type":"KeyAnyValue","key":"none","value":{"@type":"KeyAnyValueList","@value":[]}}])");
+  EXPECT_EQ(json, R"(kept [{"@type":"KeyAnyValue","key":"a & b","value":)"
+                  R"({"@type":"TextList","@value":["<item>","</item>",""]}},)"
+                  R"({"@type":"KeyAnyValue","key":"","value":{"@type":"KeyAnyValue","key":"inner","value":)"
+                  R"({"@type":"TextList","@value":["x"]}}},)"
+                  R"({"@type":"KeyAnyValue","key":"\r\n\"\\\t","value":{"@type":"xsd:int","@value":-3}},)"
+                  R"({"@type":"KeyAnyValue","key":"none","value":{"@type":"KeyAnyValueList","@value":[]}}])");
 }
 
 TEST(AppendJsonOfSoap, TakesTextsThatGrowInJson) {

@@ -13,6 +13,8 @@ namespace {
 
 constexpr std::string_view kXmlNamespace = "http://www.w3.org/XML/1998/namespace";
 constexpr std::string_view kXsiNamespace = "http://www.w3.org/2001/XMLSchema-instance";
+// The actor that everybody is who gets a message.
+constexpr std::string_view kNextActor = "http://schemas.xmlsoap.org/soap/actor/next";
 
 bool IsBlankCharacter(char c) {
   return c == ' ' || c == '\n' || c == '\t' || c == '\r';
@@ -24,6 +26,10 @@ bool IsBlank(std::string_view text) {
 
 bool IsControl(char c) {
   return static_cast<unsigned char>(c) < 0x20 || c == 0x7F;
+}
+
+bool IsSchemaHint(std::string_view name) {
+  return name == "schemaLocation" || name == "noNamespaceSchemaLocation";
 }
 
 std::string Quoted(std::string_view text) {
@@ -190,10 +196,14 @@ void TreeBuilder::AddAttribute(const Name& name, std::string_view value) {
     element.type = ResolveType(value);
   } else if (xsi && name.local == "nil") {
     element.nil = ReadNil(value);
+  } else if (_attributes == Attributes::RefuseOnData && xsi && IsSchemaHint(name.local)) {
+    return;
   } else if (_attributes == Attributes::Refuse || element.nameSpace == apiNamespace) {
     Refuse("attribute " + Quoted(name.local) + " is not known here");
   } else if (name.nameSpace == envelopeNamespace && name.local == "mustUnderstand") {
     element.mustUnderstand = value == "1" || value == "true";
+  } else if (name.nameSpace == envelopeNamespace && name.local == "actor") {
+    element.forAnother = !value.empty() && value != kNextActor;
   }
 }
 

@@ -33,6 +33,7 @@ struct Element {
   TypeName type;  // xsi:type is the only attribute besides xsi:nil that an element may carry, see below
   bool nil = false;
   bool mustUnderstand = false;  // an envelope's attribute of that name says so
+  bool forAnother = false;      // its attribute "actor" names somebody on the way, not who gets the message
   int line = 0;
   const Element* firstChild = nullptr;
   const Element* nextSibling = nullptr;
@@ -43,7 +44,7 @@ struct Element {
 enum class Attributes {
   Refuse,        // an error that names the attribute
   RefuseOnData,  // the same on elements of the API's namespace, which are data; others are an envelope's,
-                 // whose attributes other software chooses
+                 // whose attributes other software chooses. Where a schema is to be found is passed over
 };
 
 class Document {

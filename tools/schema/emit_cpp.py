@@ -1,6 +1,7 @@
 """Writes the C++ classes of the API types and their descriptors."""
 
 import os
+import re
 
 import emit_openapi
 import emit_xsd
@@ -188,6 +189,11 @@ def forward_declarations(schema, types):
 
 
 def descriptor_field(schema, type_, f):
+    described = plain_descriptor_field(schema, type_, f)
+    return f"Output({described})" if f.output else described
+
+
+def plain_descriptor_field(schema, type_, f):
     presence = "List" if f.list else "Optional" if f.optional else "Required"
     member_ = f"&{type_.cpp_name}::_{f.name}"
     if is_scalar(f):
@@ -290,6 +296,8 @@ def messages(schema, origin):
         if o.returns:
             answer.fields.append(Field("result", o.returns, not o.returns_list, o.returns_list))
         answer.fields.append(Field("fault", "MethodFault", True, False))
+        if o.changes:
+            answer.fields.append(Field("task", "string", True, False))
         types += [request, answer]
     return types
 
@@ -299,14 +307,20 @@ def documents_header(origin):
         BANNER.format(origin=origin),
         "#pragma once",
         "",
+        "#include <string>",
         "#include <string_view>",
         "",
         '#include "tessa/Api.h"',
         "",
         "namespace Nox {",
         "",
-        "// The service as clients of other makes need it described. Texts that live for ever; threads: any.",
-        "TESSA_API std::string_view WsdlText() noexcept;",
+        "// The service as clients of other makes need it described. Threads: any.",
+        "",
+        "// One document, with the types. `address`: where this client reaches the service. `product`: a sentence about",
+        "// the server, or none. Both are texts of XML attributes: escaped.",
+        "TESSA_API std::string WsdlText(std::string_view address, std::string_view product);",
+        "",
+        "// Texts that live for ever.",
         "TESSA_API std::string_view XsdText() noexcept;",
         "TESSA_API std::string_view OpenApiText() noexcept;",
         "",
@@ -315,23 +329,26 @@ def documents_header(origin):
 
 
 def documents_source(schema, origin):
-    lines = [BANNER.format(origin=origin), '#include "nox/Documents.h"', "", "#include <string>", "", "namespace Nox {"]
-    for name, document in (("Wsdl", emit_xsd.wsdl(schema)), ("Xsd", emit_xsd.xsd(schema)),
-                           ("OpenApi", emit_openapi.openapi(schema))):
+    lines = [BANNER.format(origin=origin), '#include "nox/Documents.h"', "", "namespace Nox {"]
+    lines += ["", "std::string WsdlText(std::string_view address, std::string_view product) {"]
+    places = {"@address@": "std::string(address)", "@product@": "std::string(product)"}
+    parts = re.split("(@address@|@product@)", "\n".join(emit_xsd.wsdl(schema, *places)) + "\n")
+    texts = [text for part in parts for text in ([places[part]] if part in places else literals(part.splitlines(True)))]
+    lines += ["  return " + " +\n".join(texts) + ";", "}"]
+    for name, document in (("Xsd", emit_xsd.xsd(schema)), ("OpenApi", emit_openapi.openapi(schema))):
         lines += ["", f"std::string_view {name}Text() noexcept {{", "  static const std::string* const text = new std::string("]
-        lines += [" +\n".join(f'std::string(R"document({piece})document")' for piece in pieces(document)) + ");"]
-        lines += ["  return *text;", "}"]
+        lines += [" +\n".join(literals([line + "\n" for line in document])) + ");", "  return *text;", "}"]
     return lines + ["", "}  // namespace Nox"]
 
 
-def pieces(document, most=30_000):
-    """The text of the lines in pieces: compilers need not understand longer literals."""
+def literals(lines, most=30_000):
+    """The text of the lines in C++, in pieces: compilers need not understand longer literals."""
     found = [""]
-    for line in document:
+    for line in lines:
         if len(found[-1]) + len(line) > most:
             found.append("")
-        found[-1] += line + "\n"
-    return found
+        found[-1] += line
+    return [f'std::string(R"document({piece})document")' for piece in found]
 
 
 def write(path, lines):

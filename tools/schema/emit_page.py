@@ -9,6 +9,10 @@ def link(schema, name):
     return f"[{name}](#{name.lower()})" if name in schema.types else name
 
 
+def only_answers(f):
+    return " Not needed in requests." if f.output else ""
+
+
 def type_section(schema, type_):
     lines = [f"### {type_.name}", ""]
     if type_.doc:
@@ -25,17 +29,18 @@ def type_section(schema, type_):
     fields = schema.all_fields(type_)
     if fields:
         lines += ["| Field | Type | |", "| --- | --- | --- |"]
-        lines += [f"| `{f.name}` | {occurs(f)}{link(schema, f.type)} | {f.doc} |" for f in fields] + [""]
+        lines += [f"| `{f.name}` | {occurs(f)}{link(schema, f.type)} | {f.doc}{only_answers(f)} |" for f in fields] + [""]
     if type_.constants:
         lines += ["Constants: " + ", ".join(f'`{k}` = "{v}"' for k, v in type_.constants) + ".", ""]
     return lines
 
 
 def operation_section(schema, operation):
-    lines = [f"### {operation.name}", "", operation.doc, ""]
+    kind = "Changes the host." if operation.changes else "Changes nothing."
+    lines = [f"### {operation.name}", "", f"{operation.doc} {kind}", ""]
     if operation.parameters:
-        lines += ["| Parameter | Type |", "| --- | --- |"]
-        lines += [f"| `{f.name}` | {occurs(f)}{link(schema, f.type)} |" for f in operation.parameters] + [""]
+        lines += ["| Parameter | Type | |", "| --- | --- | --- |"]
+        lines += [f"| `{f.name}` | {occurs(f)}{link(schema, f.type)} | {f.doc} |" for f in operation.parameters] + [""]
     answer = "a fault when it failed"
     if operation.returns:
         answer = ("list of " if operation.returns_list else "") + link(schema, operation.returns) + ", " + answer

@@ -17,6 +17,7 @@ class Field:
     optional: bool
     list: bool
     lazy: bool = False
+    output: bool = False
     doc: str = ""
 
     @property
@@ -50,10 +51,11 @@ class Type:
 @dataclass
 class Operation:
     name: str
-    parameters: list
+    changes: bool
     returns: str
     returns_list: bool
     doc: str = ""
+    parameters: list = field(default_factory=list)
 
 
 @dataclass
@@ -81,20 +83,22 @@ class Schema:
 
 
 TYPE = re.compile(r"(abstract )?(type|fault) (\w+) = ([\w:]+) : (\w+) \{$")
-FIELD = re.compile(r"(\w+)(\?|\[\])?: (\w+)( lazy)?$")
+FIELD = re.compile(r"(\w+)(\?|\[\])?: (\w+)( lazy| output)?$")
 CONSTANT = re.compile(r'const (\w+) = "([^"]*)"$')
 CONSTRUCT = re.compile(r"construct\((\w+)\)$")
-OPERATION = re.compile(r"operation (\w+)\((.*)\)(?: returns (\w+)(\[\])?)?$")
+OPERATION = re.compile(r"(query|change) (\w+)(?: returns (\w+)(\[\])?)? \{$")
 
 
 def _field(text, where):
     match = FIELD.match(text)
     if not match:
         raise SchemaError(f"{where}: not a field: {text}")
-    name, mark, type_, lazy = match.groups()
-    if lazy and (mark != "[]" or type_ in SIMPLE_TYPES):
+    name, mark, type_, word = match.groups()
+    if word == " lazy" and (mark != "[]" or type_ in SIMPLE_TYPES):
         raise SchemaError(f"{where}: only a list of data objects can be lazy: {text}")
-    return Field(name, type_, mark == "?", mark == "[]", bool(lazy))
+    if word == " output" and mark:
+        raise SchemaError(f"{where}: only a field that is always there can be output: {text}")
+    return Field(name, type_, mark == "?", mark == "[]", word == " lazy", word == " output")
 
 
 def _read(path, schema):
@@ -122,17 +126,20 @@ def _read(path, schema):
             schema.types[name] = current
         elif text == "}" and current:
             current = None
-        elif not current and (match := OPERATION.match(text)):
-            name, parameters, returns, many = match.groups()
-            fields = [_field(part.strip(), where) for part in parameters.split(",") if part.strip()]
-            schema.operations.append(Operation(name, fields, returns or "", bool(many), " ".join(doc)))
-        elif current and (match := CONSTANT.match(text)):
+        elif match := OPERATION.match(text):
+            kind, name, returns, many = match.groups()
+            if current:
+                raise SchemaError(f"{where}: {current.name} is not closed before {name}")
+            current = Operation(name, kind == "change", returns or "", bool(many), " ".join(doc))
+            schema.operations.append(current)
+        elif isinstance(current, Type) and (match := CONSTANT.match(text)):
             current.constants.append(match.groups())
-        elif current and (match := CONSTRUCT.match(text)):
+        elif isinstance(current, Type) and (match := CONSTRUCT.match(text)):
             current.construct = match.group(1)
         elif current:
-            current.fields.append(_field(text, where))
-            current.fields[-1].doc = " ".join(doc)
+            fields = current.fields if isinstance(current, Type) else current.parameters
+            fields.append(_field(text, where))
+            fields[-1].doc = " ".join(doc)
         else:
             raise SchemaError(f"{where}: not understood: {text}")
         doc = []
@@ -194,11 +201,19 @@ def _check(schema):
     for operation in schema.operations:
         if names.count(operation.name) > 1:
             raise SchemaError(f"{operation.name}: operation is defined twice")
-        for f in operation.parameters:
-            if f.is_object and f.type not in schema.types:
-                raise SchemaError(f"{operation.name}({f.name}): unknown type {f.type}")
-        if operation.returns and operation.returns not in schema.types:
-            raise SchemaError(f"{operation.name}: unknown result {operation.returns}")
+        _check_operation(schema, operation)
+
+
+def _check_operation(schema, operation):
+    if not operation.doc:
+        raise SchemaError(f"{operation.name}: an operation says what it is for")
+    for f in operation.parameters:
+        if f.is_object and f.type not in schema.types:
+            raise SchemaError(f"{operation.name}({f.name}): unknown type {f.type}")
+        if not f.doc:
+            raise SchemaError(f"{operation.name}({f.name}): a parameter says what it is for")
+    if operation.returns and operation.returns not in schema.types:
+        raise SchemaError(f"{operation.name}: unknown result {operation.returns}")
 
 
 def read(paths):

@@ -47,6 +47,10 @@ def types(*lines):
     return "file Test\n" + "\n".join(lines) + "\n"
 
 
+def operation(*lines):
+    return "## Runs.\n" + "\n".join(lines) + "\n"
+
+
 LAMP = "type Lamp = Test::Lamp : DataObject {\n  name: string\n}"
 FAULT = "fault Broken = Test::Broken : DataObject {\n}"
 
@@ -66,8 +70,12 @@ ERRORS = {
     "a type that is not closed": (types("type Lamp = Test::Lamp : DataObject {"), r"test\.schema: Lamp is not closed"),
     "a type inside another": (types("type Lamp = Test::Lamp : DataObject {", FAULT),
                               r"test\.schema:3: Lamp is not closed before Broken"),
-    "an operation inside a type": (types("type Lamp = Test::Lamp : DataObject {", "operation Run()", "}"),
-                                   r"test\.schema:3: not a field: operation Run\(\)"),
+    "an operation inside a type": (types("type Lamp = Test::Lamp : DataObject {", "query Run {", "}"),
+                                   r"test\.schema:3: Lamp is not closed before Run"),
+    "a type inside an operation": ("file Test\n## Runs.\nquery Run {\n" + LAMP + "\n",
+                                   r"test\.schema:4: Run is not closed before Lamp"),
+    "an output field that may be missing": (types("type Lamp = Test::Lamp : DataObject {", "  name?: string output", "}"),
+                                            r"test\.schema:3: only a field that is always there"),
     "a closing brace too many": (types(LAMP, "}"), r"test\.schema:5: not understood: \}"),
     "an unknown base": (types("type Lamp = Test::Lamp : Furniture {", "}"), r"Lamp: unknown base Furniture"),
     "its own base": (types("type Lamp = Test::Lamp : Lamp {", "}"), r"Lamp: its bases run in a circle"),
@@ -97,10 +105,16 @@ ERRORS = {
                                         r"Lamp: requires an object of its own type"),
     "a name of the binding": (types("type LampList = Test::LampList : DataObject {", "}"),
                               r"LampList: the name belongs"),
-    "a parameter of an unknown type": ("operation Run(lamp: Lamp)\n", r"Run\(lamp\): unknown type Lamp"),
-    "a parameter that is none": ("operation Run(lamp)\n", r"test\.schema:1: not a field: lamp"),
-    "an unknown result": ("operation Run() returns Lamp\n", r"Run: unknown result Lamp"),
-    "an operation twice": ("operation Run()\noperation Run()\n", r"Run: operation is defined twice"),
+    "a parameter of an unknown type": (operation("change Run {", "  ## Which.", "  lamp: Lamp", "}"),
+                                       r"Run\(lamp\): unknown type Lamp"),
+    "a parameter that is none": (operation("change Run {", "  lamp", "}"), r"test\.schema:3: not a field: lamp"),
+    "a parameter without a word": (operation("change Run {", "  lamp: string", "}"), r"Run\(lamp\): a parameter says"),
+    "an operation without a word": ("query Run {\n}\n", r"Run: an operation says"),
+    "an operation that is not closed": (operation("query Run {"), r"test\.schema: Run is not closed"),
+    "an operation of another kind": (operation("action Run {", "}"), r"test\.schema:2: not understood: action Run"),
+    "a constant in an operation": (operation("query Run {", '  const RED = "red"', "}"), r"test\.schema:3: not a field"),
+    "an unknown result": (operation("query Run returns Lamp {", "}"), r"Run: unknown result Lamp"),
+    "an operation twice": (operation("query Run {", "}") * 2, r"Run: operation is defined twice"),
 }
 
 
@@ -154,13 +168,19 @@ class Language(InFolder):
         self.assertEqual([f.name for f in schema.all_fields(schema.types["Torch"])], ["name", "battery"])
 
     def test_operations_have_parameters_and_a_result(self):
-        schema = self.read(types(LAMP, "## Turns lamps on.",
-                                 "operation TurnOn(lamps[]: Lamp, label?: string) returns Lamp[]"))
-        operation = schema.operations[0]
-        self.assertEqual((operation.name, operation.returns, operation.returns_list, operation.doc),
-                         ("TurnOn", "Lamp", True, "Turns lamps on."))
-        self.assertEqual([(f.name, f.optional, f.list) for f in operation.parameters],
-                         [("lamps", False, True), ("label", True, False)])
+        schema = self.read(types(LAMP, "## Turns lamps on.", "change TurnOn returns Lamp[] {", "  ## Which.",
+                                 "  lamps[]: Lamp", "  ## In words", "  ## of your own.", "  label?: string", "}",
+                                 "## Which are on.", "query LampsThatAreOn {", "}"))
+        change, query = schema.operations
+        self.assertEqual((change.name, change.changes, change.returns, change.returns_list, change.doc),
+                         ("TurnOn", True, "Lamp", True, "Turns lamps on."))
+        self.assertEqual([(f.name, f.optional, f.list, f.doc) for f in change.parameters],
+                         [("lamps", False, True, "Which."), ("label", True, False, "In words of your own.")])
+        self.assertEqual((query.name, query.changes, query.returns, query.parameters), ("LampsThatAreOn", False, "", []))
+
+    def test_fields_that_only_answers_must_have_say_so(self):
+        schema = self.read(types("type Lamp = Test::Lamp : DataObject {", "  name: string", "  watts: int output", "}"))
+        self.assertEqual([f.output for f in schema.types["Lamp"].fields], [False, True])
 
     def test_later_files_build_on_earlier_ones(self):
         first = self.schema_file(types(LAMP), "first.schema")
@@ -257,12 +277,57 @@ class Documents(unittest.TestCase):
         actions = [b.find(SOAP + "operation").get("soapAction") for b in bound]
         self.assertEqual(actions, [f"urn:nox#{name}" for name in operations])
 
+    def response(self, operation):
+        """[(name, type, fewest), ..] of the fields of the answer."""
+        element = next(e for e in self.xsd.findall(XSD + "element") if e.get("name") == operation.name + "Response")
+        return [(f.get("name"), f.get("type"), f.get("minOccurs")) for f in list(element.iter(XSD + "element"))[1:]]
+
     def test_every_operation_can_answer_with_a_fault(self):
         for operation in self.schema.operations:
-            response = next(e for e in self.xsd.findall(XSD + "element") if e.get("name") == operation.name + "Response")
-            last = list(response.iter(XSD + "element"))[-1]
-            self.assertEqual((last.get("name"), last.get("type"), last.get("minOccurs")),
-                             ("fault", "nox:MethodFault", "0"))
+            self.assertIn(("fault", "nox:MethodFault", "0"), self.response(operation))
+
+    def test_the_answer_to_every_change_tells_its_task(self):
+        for operation in self.schema.operations:
+            self.assertEqual(("task", "xsd:string", "0") in self.response(operation), operation.changes, operation.name)
+
+    def test_a_disk_needs_nothing_but_its_name(self):
+        for name in ("HostDevice", "HostScsiLun", "HostScsiDisk"):
+            type_ = next(t for t in self.xsd.findall(XSD + "complexType") if t.get("name") == name)
+            self.assertEqual({e.get("minOccurs") for e in type_.iter(XSD + "element")}, {"0"}, name)
+
+    def test_the_service_is_one_document(self):
+        self.assertFalse(list(self.wsdl.iter(XSD + "import")) + list(self.wsdl.iter(XSD + "include")))
+        inline = self.wsdl.find(WSDL + "types").find(XSD + "schema")
+        defined = set(self.names(inline, XSD + "complexType"))
+        elements = set(self.names(inline, XSD + "element"))
+        used = set()
+        for element in inline.iter():
+            for reference in (element.get("type"), element.get("base")):
+                if reference and reference.startswith("nox:"):
+                    used.add(reference[4:])
+        self.assertEqual(used - defined, set())
+        faults = {n for n, t in self.schema.types.items() if t.fault}
+        self.assertEqual(defined - used - faults, set(), "types that nobody uses")
+        self.assertEqual(faults - defined, set())
+        self.assertTrue({part.get("element")[4:] for part in self.wsdl.iter(WSDL + "part")} <= elements)
+
+    def test_the_address_and_the_product_are_the_servers_to_say(self):
+        wsdl = ElementTree.fromstring("\n".join(emit_xsd.wsdl(self.schema, "https://a:1/soap", " Version 7.")).encode())
+        service = wsdl.find(WSDL + "service")
+        self.assertEqual(service.find(WSDL + "port").find(SOAP + "address").get("location"), "https://a:1/soap")
+        self.assertTrue(service.find(WSDL + "documentation").text.endswith(" Version 7."))
+
+    def test_every_operation_parameter_and_field_is_documented(self):
+        for operation in self.schema.operations:
+            element = next(e for e in self.xsd.findall(XSD + "element") if e.get("name") == operation.name)
+            self.assertEqual(element.find(f"{XSD}annotation/{XSD}documentation").text, operation.doc)
+        for outer in self.xsd.findall(XSD + "element") + self.xsd.findall(XSD + "complexType"):
+            if outer.get("name").endswith("List"):
+                continue
+            for field in list(outer.iter(XSD + "element")):
+                if field is not outer:
+                    self.assertIsNotNone(field.find(f"{XSD}annotation/{XSD}documentation"),
+                                         f"{outer.get('name')}.{field.get('name')}")
 
     def test_the_page_describes_every_type_and_its_links_lead_somewhere(self):
         page = "\n".join(emit_page.page(self.schema))

@@ -1,14 +1,15 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test check bench growth soak build format-check format asan tsan clang tidy fuzz clean
+.PHONY: help demo test clients check bench growth soak build format-check format asan tsan clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
-CTEST := ctest --output-on-failure --no-tests=error -j $(JOBS)
+CTEST := ctest --output-on-failure --no-tests=error -LE clients -j $(JOBS)
 
 help:
 	@echo "make demo    build, start the agent on an example host; its disks are added, lost, unmounted, claimed"
-	@echo "make test    build and run every test"
+	@echo "make test    build and run every test but those of make clients"
+	@echo "make clients tests with SOAP clients whose tools are large (Java)"
 	@echo "make check   format, second compiler, clang-tidy on what changed, sanitizers, fuzzing"
 	@echo "make bench   benchmarks"
 	@echo "make growth  instructions per disk of planning, among few disks and among many"
@@ -31,6 +32,12 @@ test:
 	@cmake --preset dev >/dev/null
 	@cmake --build --preset dev -j $(JOBS)
 	@cd build/dev && $(CTEST)
+
+clients:
+	@$(SETUP) build test clients
+	@cmake --preset dev >/dev/null
+	@cmake --build --preset dev -j $(JOBS) --target agentd kovactl
+	@cd build/dev && ctest --output-on-failure --no-tests=error -L clients
 
 check: format-check clang tidy asan tsan fuzz
 

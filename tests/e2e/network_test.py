@@ -139,22 +139,6 @@ class TlsTest(NetworkTest):
     def tls_of(server):
         return ["--tls-cert", server + ".pem", "--tls-key", server + ".key", "--tls-client-ca", "ca.pem"]
 
-    def openssl(self, *arguments):
-        outcome = self.run_program("openssl", *arguments)
-        self.assertEqual(outcome.status, 0, outcome.err)
-
-    def make_ca(self, name):
-        self.openssl("req", "-x509", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes", "-days", "2",
-                     "-subj", "/CN=" + name, "-keyout", name + ".key", "-out", name + ".pem")
-
-    def issue(self, name, ca, subject, extension=None, days="2"):
-        """name.key and name.pem, signed by the CA."""
-        self.write(name + ".ext", (extension or "basicConstraints=CA:FALSE") + "\n")
-        self.openssl("req", "-newkey", "ec", "-pkeyopt", "ec_paramgen_curve:P-256", "-nodes", "-subj", subject,
-                     "-keyout", name + ".key", "-out", name + ".csr")
-        self.openssl("x509", "-req", "-in", name + ".csr", "-CA", ca + ".pem", "-CAkey", ca + ".key", "-CAcreateserial",
-                     "-days", days, "-extfile", name + ".ext", "-out", name + ".pem")
-
 
 @unittest.skipUnless(shutil.which("curl"), "curl is not installed")
 @unittest.skipUnless(shutil.which("openssl"), "openssl is not installed")

@@ -1,73 +1,32 @@
 #!/usr/bin/env python3
 """A SOAP client that nobody here wrote, from the service's own description: the whole story of a host."""
 
-import http.client
-import os
-import socket
 import unittest
 
 import requests
-import requests.adapters
-import urllib3
 import zeep
 import zeep.exceptions
 import zeep.transports
 
-from programs import ProgramTest, disk
-
-FLASH, FLASH2, USB, PARTED = "naa.f1", "naa.f2", "naa.u1", "naa.p1"
-HOST = {
-    "name": "a", "faultDomain": "rack-1",
-    "cluster": {"enabled": True, "clusterUuid": "c-1", "nodeUuid": "n-1"},
-    "disks": [disk(FLASH, True), disk(FLASH2, True), *[disk(f"naa.c{i}") for i in range(1, 5)],
-              disk(USB, transport="usb"), disk(PARTED, partitions=2)],
-}
+from doors import FLASH, FLASH2, HALF_FAILS, HOST, PARTED, USB, DoorsTest
 
 
-class UnixConnection(http.client.HTTPConnection):
-    """HTTP over a socket file."""
-
-    def __init__(self, path):
-        super().__init__("localhost")
-        self.path = path
-
-    def connect(self):
-        self.sock = socket.socket(socket.AF_UNIX, socket.SOCK_STREAM)
-        self.sock.connect(self.path)
-
-
-class UnixPool(urllib3.connectionpool.HTTPConnectionPool):
-    def __init__(self, path):
-        super().__init__("localhost")
-        self.path = path
-
-    def _new_conn(self):
-        return UnixConnection(self.path)
-
-
-class UnixAdapter(requests.adapters.HTTPAdapter):
-    """Sends every request to one socket file."""
-
-    def __init__(self, path):
-        super().__init__()
-        self.pool = UnixPool(path)
-
-    def get_connection(self, url, proxies=None):
-        return self.pool
-
-
-class ZeepTest(ProgramTest):
-    def connect(self, host):
-        self.start_agent("--host", self.write("host.json", host))
-        session = requests.Session()
-        session.mount("http://", UnixAdapter(self.socket))
-        self.client = zeep.Client("http://localhost/soap?wsdl", transport=zeep.transports.Transport(session=session))
+class ZeepTest(DoorsTest):
+    def connect(self, wsdl, **session):
+        """The service at the address that its description has."""
+        settings = requests.Session()
+        self.addCleanup(settings.close)
+        settings.trust_env = False  # whatever this machine asks by or trusts
+        for name, value in session.items():
+            setattr(settings, name, value)
+        self.client = zeep.Client(wsdl, transport=zeep.transports.Transport(session=settings))
         return self.client.service
 
     def fault_of(self, call, *arguments, **named):
         """The typed fault that the call ends in."""
         with self.assertRaises(zeep.exceptions.Fault) as caught:
             call(*arguments, **named)
+        self.fault_text = caught.exception.message
         return self.client.wsdl.types.deserialize(caught.exception.detail[0])
 
     @staticmethod
@@ -86,8 +45,19 @@ class ZeepTest(ProgramTest):
 
 class Story(ZeepTest):
     def test_from_the_first_query_to_the_last_removal(self):
-        service = self.connect(HOST)
+        self.tell(self.connect(self.through_a_bridge(HOST)))
 
+    def test_over_tls_from_the_first_query_to_the_last_removal(self):
+        self.tell(self.connect(self.over_tls(HOST), verify=self.path("ca.pem"),
+                               cert=(self.path("client.pem"), self.path("client.key"))))
+
+    def test_over_tcp_where_clients_may_read(self):
+        service = self.connect(self.over_tcp(HOST))
+        self.assertEqual(len(service.QueryDisksForKova()["result"]), len(HOST["disks"]))
+        fault = self.fault_of(service.ClaimUnmountedDiskgroup)
+        self.assertEqual((self.type_of(fault), fault.role), ("NotPermitted", "change"))
+
+    def tell(self, service):
         disks = service.QueryDisksForKova()["result"]
         self.assertEqual([result.disk.canonicalName for result in disks], [d["name"] for d in HOST["disks"]])
         self.assertEqual(self.find(disks, FLASH).state, "eligible")
@@ -98,6 +68,7 @@ class Story(ZeepTest):
 
         made = service.AddAllEligibleDisks(label="the first")
         self.assertIsNone(made["fault"])
+        self.assertTrue(made["task"])
         self.assertEqual([len(result.mapping.nonSsd) for result in made["result"]], [2, 2])
         self.assertEqual(self.groups(), {FLASH: ["naa.c1", "naa.c3"], FLASH2: ["naa.c2", "naa.c4"]})
 
@@ -119,8 +90,11 @@ class Story(ZeepTest):
         service.RemoveDiskMapping(mapping=mapping, passThrough="p", optionText="o", optionFirst=1, optionSecond=2)
         self.assertEqual(list(self.groups()), [FLASH2])
 
+        service.AddDisks(disks=[{"canonicalName": FLASH}, {"canonicalName": "naa.c1"}])
+        self.assertEqual(self.groups()[FLASH], ["naa.c1"])
+
     def test_a_typed_fault(self):
-        service = self.connect(HOST)
+        service = self.connect(self.through_a_bridge(HOST))
         disks = service.QueryDisksForKova()["result"]
         parted = {"ssd": self.find(disks, FLASH).disk, "nonSsd": [self.find(disks, PARTED).disk]}
         answer = service.InitializeDisks(mappings=[parted])
@@ -129,11 +103,10 @@ class Story(ZeepTest):
         with self.subTest("without a result"):
             fault = self.fault_of(service.InitializeDisks, mappings=[])
             self.assertEqual(self.type_of(fault), "InsufficientDisks")
+            self.assertIn("too few disks for a disk group", self.fault_text)
 
     def test_a_part_that_fails_and_a_part_that_does_not(self):
-        service = self.connect({**HOST, "faults": [
-            {"operation": "FormatDiskMapping", "call": 2, "exception": "KovaStorageException", "disk": "naa.c2",
-             "message": "it does not answer"}]})
+        service = self.connect(self.through_a_bridge(HALF_FAILS))
         answer = service.AddAllEligibleDisks()
         self.assertEqual(self.type_of(answer["fault"]), "SystemError")
         self.assertEqual(answer["fault"].reason, "it does not answer")
@@ -141,7 +114,7 @@ class Story(ZeepTest):
         self.assertEqual(list(self.groups()), [FLASH])
 
     def test_a_disk_that_has_left(self):
-        service = self.connect(HOST)
+        service = self.connect(self.through_a_bridge(HOST))
         service.AddAllEligibleDisks()
         self.assert_ended(self.ask_agent("sim", "set", "naa.c1", "--absent"), 0)
         disks = service.QueryDisksForKova()["result"]
@@ -152,7 +125,7 @@ class Story(ZeepTest):
         self.assertEqual(self.groups()[FLASH], ["naa.c3"])
 
     def test_a_request_that_the_gate_refuses(self):
-        service = self.connect(HOST)
+        service = self.connect(self.through_a_bridge(HOST))
         fault = self.fault_of(service.QueryDisksForKova, names=["naa.1\n"])
         self.assertEqual((self.type_of(fault), fault.argument), ("InvalidArgument", "names[0]"))
         self.assertEqual(self.type_of(self.fault_of(service.RemoveDisk, disk="naa.nothing")), "SystemError")

@@ -1,13 +1,10 @@
 // A client made from the service's description by a generator of another house. It is built and run by
 // gsoap_test.py, beside the generated code, and is no part of the product.
 //
-//   story SOCKET SCENE    ends with status 0 when everything was answered as it should be
+//   story SCENE [CERTIFICATE-AND-KEY CA]    ends with status 0 when everything was answered as it should be
+//
+// The address is the one that stands in the description.
 
-#include <sys/socket.h>
-#include <sys/un.h>
-#include <unistd.h>
-
-#include <cstring>
 #include <iostream>
 #include <map>
 #include <string>
@@ -18,7 +15,6 @@
 
 namespace {
 
-const char* socketPath = nullptr;
 int failures = 0;
 
 void Check(bool holds, const char* what, int line) {
@@ -29,24 +25,12 @@ void Check(bool holds, const char* what, int line) {
 }
 #define CHECK(condition) Check((condition), #condition, __LINE__)
 
-// Every connection goes to the agent's socket file, whatever the address says.
-SOAP_SOCKET OpenSocket(struct soap*, const char*, const char*, int) {
-  sockaddr_un address{};
-  address.sun_family = AF_UNIX;
-  std::strncpy(address.sun_path, socketPath, sizeof address.sun_path - 1);
-  const int number = socket(AF_UNIX, SOCK_STREAM, 0);
-  if (connect(number, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0) {
-    close(number);
-    return SOAP_INVALID_SOCKET;
-  }
-  return number;
-}
-
 class Client {
  public:
-  Client() {
-    _proxy.soap_endpoint = "http://localhost/soap";
-    _proxy.soap->fopen = &OpenSocket;
+  Client() = default;
+  Client(const char* certificate, const char* ca) {
+    CHECK(soap_ssl_client_context(_proxy.soap, SOAP_SSL_DEFAULT, certificate, nullptr, ca, nullptr,
+                                  nullptr) == SOAP_OK);
   }
   ~Client() { _proxy.destroy(); }
 
@@ -107,6 +91,7 @@ void TellTheStory(Client& client) {
 
   const auto& added = client.AddAll();
   CHECK(added.fault == nullptr && added.result.size() == 2);
+  CHECK(added.task != nullptr && !added.task->empty());
   CHECK((client.Groups() == Groups{{"naa.f1", 2}, {"naa.f2", 2}}));
 
   _ns1__GetConfigInfo configRequest;
@@ -169,6 +154,14 @@ void FailInPart(Client& client) {
   CHECK(fault != nullptr && fault->reason == "it does not answer");
 }
 
+void ReadOnly(Client& client) {
+  CHECK(client.Disks().size() == 8);
+  _ns1__ClaimUnmountedDiskgroup claim;
+  _ns1__ClaimUnmountedDiskgroupResponse claimed;
+  CHECK(client.Proxy().ClaimUnmountedDiskgroup(&claim, claimed) != SOAP_OK);
+  CHECK(client.FaultAs<ns1__NotPermitted>() != nullptr);
+}
+
 void MissADisk(Client& client) {
   ns1__KovaHostDiskResult* gone = nullptr;
   for (ns1__KovaHostDiskResult* result : client.Disks()) {
@@ -185,16 +178,22 @@ void MissADisk(Client& client) {
 const std::map<std::string, void (*)(Client&)> scenes = {{"story", &TellTheStory},
                                                          {"partitioned", &MeetAPartitionedDisk},
                                                          {"part", &FailInPart},
-                                                         {"absent", &MissADisk}};
+                                                         {"absent", &MissADisk},
+                                                         {"read", &ReadOnly}};
 
 }  // namespace
 
 int main(int argc, char** argv) {
-  if (argc != 3 || scenes.count(argv[2]) == 0) {
+  if ((argc != 2 && argc != 4) || scenes.count(argv[1]) == 0) {
     return 2;
   }
-  socketPath = argv[1];
-  Client client;
-  scenes.at(argv[2])(client);
+  soap_ssl_init();
+  if (argc == 2) {
+    Client client;
+    scenes.at(argv[1])(client);
+  } else {
+    Client client(argv[2], argv[3]);
+    scenes.at(argv[1])(client);
+  }
   return failures == 0 ? 0 : 1;
 }

@@ -3,8 +3,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <cstring>
 #include <stdexcept>
+#include <string>
 #include <vector>
 
 #include "kova/agentd/include/HostCtlException.h"
@@ -34,14 +34,34 @@ TEST_F(ManagerLife, MakesItsOwnLockThenTheProviderThenTheTwoLocks) {
                                               "make KovaManager.diskCache"));
 }
 
-TEST_F(ManagerLife, MakesItsHelperLastWithItsLogger) {
+// Notes with each event whether there is a helper, as its shared logger tells.
+class HelperLife : public ManagerLife {
+ protected:
+  HelperLife() {
+    _timeline.SetObserver([this](const std::string& event) {
+      _events.push_back(event + (Util::KovaUtil::_logger ? ", with a helper" : ""));
+    });
+  }
+  ~HelperLife() override { _timeline.SetObserver({}); }
+
+  std::vector<std::string> _events;
+};
+
+TEST_F(HelperLife, BeginsWhenAllElseIsMade) {
   Ref<Tessa::Service::Logger> logger = _logger;
-  OtxCtl::Kova::SetProviderFactory([this] {
-    EXPECT_FALSE(Util::KovaUtil::_logger);
-    return _kernel.MakeProvider();
-  });
   const auto manager = MakeRef<KovaManagerImpl>(logger);
   EXPECT_EQ(Util::KovaUtil::_logger, logger);
+  EXPECT_THAT(_events, ElementsAre("make KovaManager", "GetKovaInfo", "make KovaManager.operation",
+                                   "make KovaManager.diskCache"));
+}
+
+TEST_F(HelperLife, EndsBehindTheProviderAndTheLocks) {
+  auto manager = MakeManager();
+  _events.clear();
+  manager.Reset();
+  EXPECT_THAT(_events,
+              ElementsAre("delete provider, with a helper", "destroy KovaManager.diskCache, with a helper",
+                          "destroy KovaManager.operation, with a helper", "destroy KovaManager"));
 }
 
 TEST_F(ManagerLife, AsksTheKernelNothingWhenItIsMade) {
@@ -119,45 +139,6 @@ TEST_F(ManagerLife, IsALockableObjectWithALockOfItsOwn) {
   manager->Unlock();
   EXPECT_FALSE(manager->IsLocked());
 }
-
-#if defined(__x86_64__) && defined(__GXX_ABI_VERSION)
-// Where the operation stands in the table: a pointer to a virtual member holds its offset plus one.
-template <class Method>
-std::size_t SlotOf(Method method) {
-  std::size_t words[2] = {};
-  static_assert(sizeof method == sizeof words);
-  std::memcpy(words, &method, sizeof words);
-  EXPECT_EQ(words[0] % sizeof(void*), 1U) << "not virtual";
-  return words[0] / sizeof(void*);
-}
-
-TEST(ManagerOperationTable, HasTheNineteenOperationsInTheirOrderBehindTheBases) {
-  using M = KovaManagerImpl;
-  const std::vector<std::size_t> slots = {SlotOf(&M::AddDisks),
-                                          SlotOf(&M::InitializeDisks),
-                                          SlotOf(&M::RemoveDisk),
-                                          SlotOf(&M::RemoveDiskMapping),
-                                          SlotOf(&M::QueryDisksForKova),
-                                          SlotOf(&M::AddAllEligibleDisks),
-                                          SlotOf(&M::UnmountDiskMapping),
-                                          SlotOf(&M::GetStorageInfo),
-                                          SlotOf(&M::GetConfigInfo),
-                                          SlotOf(&M::ClaimUnmountedDiskgroup),
-                                          SlotOf(&M::GetKovaDiskMapping),
-                                          SlotOf(&M::InitializeDisksInt),
-                                          SlotOf(&M::ValidateDiskMapping),
-                                          SlotOf(&M::ValidateDiskMappings),
-                                          SlotOf(&M::DiskMappingExists),
-                                          SlotOf(&M::FormatDiskMapping),
-                                          SlotOf(&M::RestampDiskMapping),
-                                          SlotOf(&M::InitializeMapping),
-                                          SlotOf(&M::UnmountDiskMappingInt)};
-  for (std::size_t i = 1; i < slots.size(); ++i) {
-    EXPECT_EQ(slots[i], slots[0] + i) << "operation " << i + 1;
-  }
-  EXPECT_EQ(SlotOf(&Tessa::System::LockableObjectImpl::IsLocked) + 1, slots[0]);
-}
-#endif
 
 TEST_F(ManagerGroups, ReadsTheMountedGroupsBehindWhatTheListHoldsWithoutLockOrLine) {
   _kernel.groups = {AGroup("naa.1", {"naa.2"})};

@@ -5,6 +5,7 @@
 #pragma once
 
 #include <cstdio>
+#include <functional>
 #include <mutex>
 #include <string>
 #include <utility>
@@ -15,11 +16,20 @@ namespace TestSupport {
 class Timeline {
  public:
   void Note(std::string event) {
+    if (const auto observer = Observer()) {
+      observer(event);
+    }
     const std::lock_guard guard(_mutex);
     if (_echo) {
       std::fprintf(stderr, "%s\n", event.c_str());
     }
     _events.push_back(std::move(event));
+  }
+
+  // Called with each event before it is kept, on the thread that notes it.
+  void SetObserver(std::function<void(const std::string& event)> observer) {
+    const std::lock_guard guard(_mutex);
+    _observer = std::move(observer);
   }
 
   // From now on each event is also written to standard error: for tests in which a process ends.
@@ -40,7 +50,13 @@ class Timeline {
   }
 
  private:
-  mutable std::mutex _mutex;
+  std::function<void(const std::string&)> Observer() const {
+    const std::lock_guard guard(_mutex);
+    return _observer;
+  }
+
+  mutable std::mutex _mutex;  // guards all below
+  std::function<void(const std::string&)> _observer;
   std::vector<std::string> _events;
   bool _echo = false;
 };

@@ -234,6 +234,21 @@ TEST_F(NetworkMarshalling, LeavesOutAnInterfaceThatFailsAtAnyPoint) {
   }
 }
 
+// Its two texts differ.
+class LinkDown final : public HostCtlException {
+ public:
+  LinkDown() : HostCtlException("the message") {}
+  std::string Describe() const override { return "as it describes itself"; }
+  const char* what() const noexcept override { return "as what() says"; }
+};
+
+TEST_F(NetworkMarshalling, TellsAnInterfacesFailureAsItDescribesItself) {
+  SetNics({{"otx0", Ipv4("1"), Ipv4("2"), FakeNic::Getter::Name, [] { throw LinkDown(); }}});
+  Marshal();
+  EXPECT_THAT(_logger->Lines(), ElementsAre(LogLineIs(LogLevel::Warning, "%1: Error getting port info: %2",
+                                                      "MarshalNetworkInfo", "as it describes itself")));
+}
+
 TEST_F(NetworkMarshalling, HasAnEmptyListWhenEveryInterfaceFails) {
   SetNics({{"otx0", Ipv4("1"), Ipv4("2"), FakeNic::Getter::Name, [] { throw HostCtlException("x"); }}});
   Marshal();

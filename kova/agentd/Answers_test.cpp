@@ -9,6 +9,8 @@
 
 #include "nox/Faults.h"
 #include "nox/Kova.h"
+#include "orbis/TypeDescriptor.h"
+#include "orbis/Version.h"
 #include "tests/support/Matchers.h"
 #include "tests/support/PluginFixture.h"
 
@@ -92,6 +94,27 @@ TEST_F(Answers, OnlyReadTheResultAndTheFault) {
   EXPECT_EQ(_fault, fault);
   EXPECT_EQ(result->GetRefCount(), 2);
   EXPECT_EQ(fault->GetRefCount(), 2);
+}
+
+// Counts, while it is written, who refers to the version of the API that everything is written in.
+class WatchingFault final : public Nox::Fault::DiskIsUSB {
+ public:
+  const Orbis::TypeDescriptor& GetType() const override {
+    references = Orbis::FindVersionByTyrlName("nox.version.unstable")->GetRefCount();
+    return DiskIsUSB::GetType();
+  }
+  mutable int references = 0;
+};
+
+TEST_F(Answers, AreWrittenInTheVersionThatHasEverything) {
+  const auto fault = MakeRef<WatchingFault>();
+  fault->GetType();
+  const int idle = fault->references;
+  _fault = fault;
+  Serialize();
+  EXPECT_EQ(fault->references, idle + 1) << "held as long as it is written in";
+  fault->GetType();
+  EXPECT_EQ(fault->references, idle) << "and not longer";
 }
 
 TEST_F(Answers, TakeNoLock) {

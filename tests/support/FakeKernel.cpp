@@ -13,10 +13,11 @@ using HostCtl::Kova::RemovalOptions;
 
 namespace {
 
+// An empty name is printed as "", so that it is no empty list.
 std::string List(const std::vector<std::string>& names) {
   std::string text;
   for (const std::string& name : names) {
-    text += (text.empty() ? "" : ", ") + name;
+    text += (text.empty() ? "" : ", ") + (name.empty() ? "\"\"" : name);
   }
   return "[" + text + "]";
 }

@@ -18,6 +18,7 @@ struct RecordingLockFactory::State {
   std::vector<std::string> mistakes;
   std::string failingName;
   std::function<void()> failure;
+  std::function<void(const std::string&)> onTake;
   std::function<void(const std::string&)> onRelease;
 
   std::vector<std::string> Held() const {
@@ -49,6 +50,9 @@ class RecordingLock final : public Tessa::System::Lock {
   ~RecordingLock() override { _state->timeline.Note("destroy " + _name); }
 
   void Acquire() override {
+    if (const auto observer = TakeObserver()) {
+      observer(_name);
+    }
     const std::vector<std::string> held = _state->Held();
     if (Contains(held, _name)) {
       _state->AddMistake(_name + " taken twice by one thread");
@@ -84,6 +88,11 @@ class RecordingLock final : public Tessa::System::Lock {
   bool IsHeld() const noexcept override { return Contains(_state->Held(), _name); }
 
  private:
+  std::function<void(const std::string&)> TakeObserver() const {
+    const std::lock_guard guard(_state->mutex);
+    return _state->onTake;
+  }
+
   const std::shared_ptr<State> _state;
   const std::string _name;
   std::mutex _mutex;
@@ -110,6 +119,11 @@ void RecordingLockFactory::SetFailure(std::string name, std::function<void()> fa
   const std::lock_guard guard(_state->mutex);
   _state->failingName = std::move(name);
   _state->failure = std::move(failure);
+}
+
+void RecordingLockFactory::SetTakeObserver(std::function<void(const std::string& name)> observer) {
+  const std::lock_guard guard(_state->mutex);
+  _state->onTake = std::move(observer);
 }
 
 void RecordingLockFactory::SetReleaseObserver(std::function<void(const std::string& name)> observer) {

@@ -30,6 +30,10 @@ class RecordingLockFactory final : public Tessa::System::SystemFactory {
   // Making the lock of that name calls this, which should throw.
   void SetFailure(std::string name, std::function<void()> failure);
 
+  // Called with the lock's name when it is about to be taken, on the thread that takes it. For what another
+  // thread could do just before. It may take locks, and replace itself.
+  void SetTakeObserver(std::function<void(const std::string& name)> observer);
+
   // Called with the lock's name when it has just been released, on the thread that did. For what another
   // thread could do at that very moment. It may take locks, and replace itself.
   void SetReleaseObserver(std::function<void(const std::string& name)> observer);

@@ -7,6 +7,7 @@
 #include <string>
 
 #include "nox/Host.h"
+#include "orbis/Engine.h"
 
 namespace Kovasvc {
 namespace {
@@ -71,16 +72,20 @@ TEST(AbsentDiskStandIn, HasExactlyTheFieldsThatAreKnown) {
   EXPECT_EQ(disk->GetDisplayName(), "Absent KOVA Disk (KOVA UUID:" + uuid + ")");
 }
 
-TEST(AbsentDiskStandIn, LeavesEveryOtherFieldUnset) {
+TEST(AbsentDiskStandIn, LeavesEveryOtherFieldAsANewDiskHasIt) {
   Ref<ScsiDisk> disk;
   GeneratePDLScsiDisk(uuid, true, disk);
-  EXPECT_FALSE(disk->HasVendor());
-  EXPECT_FALSE(disk->HasModel());
-  EXPECT_FALSE(disk->HasSerialNumber());
-  EXPECT_FALSE(disk->HasLocal());
-  EXPECT_FALSE(disk->HasTransport());
-  EXPECT_FALSE(disk->GetKovaDiskInfo());
-  EXPECT_FALSE(disk->GetDurableName());
+  const auto expected = MakeRef<ScsiDisk>();
+  expected->SetDeviceName(disk->GetDeviceName());
+  expected->SetDeviceType(disk->GetDeviceType());
+  expected->SetUuid(disk->GetUuid());
+  expected->SetCanonicalName(disk->GetCanonicalName());
+  expected->SetDisplayName(disk->GetDisplayName());
+  expected->SetLunType(disk->GetLunType());
+  expected->SetOperationalState(disk->GetOperationalState());
+  expected->SetCapacity(disk->GetCapacity());
+  expected->SetSsd(disk->GetSsd());
+  EXPECT_TRUE(Orbis::Equal(disk.Get(), expected.Get())) << disk->ToString();
 }
 
 TEST(AbsentDiskStandIn, CarriesTheSsdFlagAsItIsGiven) {

@@ -161,6 +161,18 @@ TEST_F(AddAllEligibleDisks, LooksForNoGroupsThatAreNotMounted) {
   EXPECT_EQ(Plan(), "InitializeDisksInt([s: a], tag)");
 }
 
+TEST_F(AddAllEligibleDisks, CountsTheDisksThatTheInventoryHas) {
+  _kernel.records.push_back(ARecord("only the kernel's"));
+  AddAll();
+  EXPECT_THAT(_logger->Lines(), Contains(LogLineIs(LogLevel::Verbose, queried, "2")));
+}
+
+TEST_F(AddAllEligibleDisks, LooksForNoRepeatedNames) {
+  _kernel.records.push_back(ARecord("a"));
+  EXPECT_EQ(Plan(), "InitializeDisksInt([s: a a], tag)");
+  EXPECT_THAT(Fault(), NamesDevice("DuplicateDisks", "a")) << "as the check of every request says";
+}
+
 TEST_F(AddAllEligibleDisks, UsesACacheThatIsStillValid) {
   _manager->RefreshKovaDiskCache();
   Forget();

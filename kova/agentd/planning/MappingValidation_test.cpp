@@ -346,6 +346,7 @@ class GroupCheckThrows : public GroupCheck {
   GroupCheckThrows() {
     _result->SetMapping(_old);
     _result->SetError(_oldError);
+    _result->SetDiskResult(_oldDisks);
   }
   auto Checking(const Ref<DiskMapping>& mapping) {
     return [this, mapping] { _manager->ValidateDiskMapping(mapping, _result); };
@@ -354,10 +355,12 @@ class GroupCheckThrows : public GroupCheck {
   void ExpectResultUntouched() const {
     EXPECT_EQ(_result->GetMapping(), _old);
     EXPECT_EQ(_result->GetError(), _oldError);
+    EXPECT_EQ(_result->GetDiskResult(), _oldDisks);
   }
 
   const Ref<DiskMapping> _old = AMapping(Ssd("old"), {});
   const Ref<Orbis::MethodFault> _oldError = MakeRef<InsufficientDisks>();
+  const Ref<KovaManagerImpl::DiskResults> _oldDisks = MakeRef<KovaManagerImpl::DiskResults>();
 };
 
 TEST_F(GroupCheckThrows, WithoutANameOfEveryDisk) {

@@ -195,8 +195,35 @@ TEST_F(StorageInfo, ShowsStandInsForAbsentDisks) {
   EXPECT_EQ(mapping.GetSsd()->GetKovaDiskInfo()->GetKovaUuid(), uuid);
   EXPECT_FALSE((*mapping.GetNonSsd())[0]->GetSsd());
   EXPECT_EQ((*mapping.GetNonSsd())[0]->GetKovaDiskInfo()->GetKovaUuid(), "other");
-  EXPECT_THAT(_kernel.CallTexts(), Contains("QueryDisks([], false)"))
+  EXPECT_THAT(_kernel.CallTexts(), Contains("QueryDisks([\"\"], false)"))
       << "it is asked for under its empty name";
+}
+
+TEST_F(StorageInfo, NamesAnAbsentSsdByItsUuidWhenItsDisksAreUnknown) {
+  HostCtl::Kova::DiskMapping group = AGroup("", {"x"});
+  group.ssd.kovaUuid = uuid;
+  _kernel.groups = {group};
+  EXPECT_TRUE(HasNoGroups(*Ask()));
+  EXPECT_THAT(_logger->Lines(LogLevel::Info),
+              ElementsAre(LogLineIs(LogLevel::Info, marshalFailed, "kova:" + uuid)));
+}
+
+// Has groups of its own, whatever the kernel says.
+class ManagerWithGroups final : public KovaManagerImpl {
+ public:
+  using KovaManagerImpl::KovaManagerImpl;
+  void GetKovaDiskMapping(std::vector<HostCtl::Kova::DiskMapping>& mappings) override {
+    mappings.push_back(AGroup("s1", {"a"}));
+  }
+};
+
+TEST_F(StorageInfo, AsksADerivedManagerForTheGroups) {
+  SetGroup("s1", {"a"});
+  SetGroup("s2", {"b"});
+  Ref<Tessa::Service::Logger> logger = _logger;
+  _manager = MakeRef<ManagerWithGroups>(logger);
+  EXPECT_THAT(AskForGroups(), ElementsAre("s1: a"));
+  EXPECT_THAT(_kernel.CallTexts(), Not(Contains(StartsWith("GetDiskMappings"))));
 }
 
 TEST_F(StorageInfo, LeavesOutInSilenceAGroupWhoseSsdTheInventoryLacks) {

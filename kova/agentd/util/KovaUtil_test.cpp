@@ -4,6 +4,8 @@
 #include <gtest/gtest.h>
 
 #include <stdexcept>
+#include <string>
+#include <utility>
 #include <vector>
 
 #include "tests/support/Builders.h"
@@ -92,6 +94,52 @@ TEST_F(Session, IsTheSameOneTheSecondTimeWithoutAskingAnybody) {
   KovaUtil::GetSession(second);
   EXPECT_EQ(first, second);
   EXPECT_THAT(_timeline.Events(), IsEmpty());
+}
+
+// Counts how often it is handed out.
+class CountingAuthorization final : public Tessa::Authorize::AuthorizeManager {
+ public:
+  void IncRef() const override {
+    ++_references;
+    AuthorizeManager::IncRef();
+  }
+  void AddConnection(const Ref<Tessa::Session>&, const std::string&,
+                     const Ref<Tessa::System::AuthTokenHelper>&, bool) override {
+    ++connections;
+  }
+  int TakeReferences() const { return std::exchange(_references, 0); }
+
+  int connections = 0;
+
+ private:
+  mutable int _references = 0;
+};
+
+TEST_F(Session, AsksForTheAuthorizationManagerOnceAndNeverAgain) {
+  const auto authorization = MakeRef<CountingAuthorization>();
+  Tessa::Authorize::AuthorizeManager::SetInstance(authorization);
+  authorization->TakeReferences();
+  EXPECT_TRUE(Tessa::Authorize::AuthorizeManager::GetInstance());
+  const int once = authorization->TakeReferences();
+  Ref<Tessa::Session> session;
+  KovaUtil::GetSession(session);
+  EXPECT_EQ(authorization->TakeReferences(), once);
+  EXPECT_EQ(authorization->connections, 1);
+  KovaUtil::GetSession(session);
+  EXPECT_EQ(authorization->TakeReferences(), 0);
+}
+
+TEST_F(Session, IsNeverClosed) {
+  Ref<Logger> logger = _logger;
+  auto util = MakeRef<KovaUtil>(logger);
+  Ref<Tessa::Session> session;
+  KovaUtil::GetSession(session);
+  KovaUtil::GetSession(session);
+  EXPECT_FALSE(session->IsClosed());
+  util.Reset();
+  EXPECT_FALSE(session->IsClosed());
+  KovaUtil::_session.Reset();
+  EXPECT_FALSE(session->IsClosed());
 }
 
 TEST_F(Session, IsKeptByThePluginAlone) {

@@ -57,8 +57,7 @@ const std::map<std::string, Getter>& OptionalGetters() {
       {"KovaHostConfigInfoStorageInfo.autoClaim",
        [](DataObject& o) { As<Kova::Host::ConfigInfo::StorageInfo>(o).GetAutoClaim(); }},
       {"KovaDiskFault.device", [](DataObject& o) { As<Fault::KovaDiskFault>(o).GetDevice(); }},
-      {"InvalidArgument.argument",
-       [](DataObject& o) { As<Orbis::Fault::InvalidArgument>(o).GetArgument(); }},
+      {"InvalidArgument.argument", [](DataObject& o) { As<Orbis::Fault::InvalidArgument>(o).GetArgument(); }},
       {"LocalizableMessage.message", [](DataObject& o) { As<Orbis::LocalizableMessage>(o).GetMessage(); }},
   };
   return *getters;

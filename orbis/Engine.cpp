@@ -139,8 +139,7 @@ bool Equal(const Any* left, const Any* right) {
     case TypeKind::ObjectArray:
       return EqualArray(static_cast<const DataArrayBase&>(*left), static_cast<const DataArrayBase&>(*right));
     case TypeKind::StringArray:
-      return static_cast<const TextList&>(*left).Items() ==
-             static_cast<const TextList&>(*right).Items();
+      return static_cast<const TextList&>(*left).Items() == static_cast<const TextList&>(*right).Items();
     case TypeKind::Simple:
       break;
   }

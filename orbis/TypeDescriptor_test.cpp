@@ -28,9 +28,9 @@ TEST(FindType, KnowsTypesTheirListsAndAbstractOnes) {
 }
 
 TEST(FindType, KnowsNothingElse) {
-  for (const char* name : {"", "List", "ArrayOfKeyAnyValue", "ArrayOfString", "KeyAnyValueListList", "TextListList",
-                           "NothingList", "Nothing", "string", "int", "intList", "KeyAnyValuList",
-                           "keyAnyValue", "KeyAnyValue ", "Orbis::KeyAnyValue"}) {
+  for (const char* name : {"", "List", "ArrayOfKeyAnyValue", "ArrayOfString", "KeyAnyValueListList",
+                           "TextListList", "NothingList", "Nothing", "string", "int", "intList",
+                           "KeyAnyValuList", "keyAnyValue", "KeyAnyValue ", "Orbis::KeyAnyValue"}) {
     EXPECT_EQ(FindType(name), nullptr) << name;
   }
 }

@@ -165,8 +165,7 @@ TEST(AgentClient, GivesAFaultOfTheAgentAsAFault) {
   RunningServer server(Serving(service, tasks));
   const Host::Answer answer = AgentClient("unix:" + server.Path()).QueryDisksForKova({""});
   EXPECT_FALSE(answer.result);
-  EXPECT_EQ(dynamic_cast<const Orbis::Fault::InvalidArgument&>(*answer.fault).GetArgument(),
-            "names[0]");
+  EXPECT_EQ(dynamic_cast<const Orbis::Fault::InvalidArgument&>(*answer.fault).GetArgument(), "names[0]");
 }
 
 TEST(AgentClient, SaysThatNobodyAnswers) {

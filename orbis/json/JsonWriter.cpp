@@ -80,9 +80,8 @@ class JsonWriter {
   }
 
   static bool IsEmpty(const Any& list) {
-    return list.GetType().kind == TypeKind::StringArray
-               ? static_cast<const TextList&>(list).Items().empty()
-               : static_cast<const DataArrayBase&>(list).IsEmpty();
+    return list.GetType().kind == TypeKind::StringArray ? static_cast<const TextList&>(list).Items().empty()
+                                                        : static_cast<const DataArrayBase&>(list).IsEmpty();
   }
 
   void WriteList(const Any& list) {

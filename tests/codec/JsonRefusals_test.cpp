@@ -175,14 +175,13 @@ INSTANTIATE_TEST_SUITE_P(
                 "unknown type 'xsd:float'"},
         Refusal{"SimpleTypeWithoutPrefix", AnyValue("{\"@type\": \"int\", \"@value\": 1}"), "value.@type", 2,
                 "unknown type 'int'"},
-        Refusal{"ListOfLists", AnyValue("{\"@type\": \"TextListList\", \"@value\": []}"),
-                "value.@type", 2, "unknown type"},
+        Refusal{"ListOfLists", AnyValue("{\"@type\": \"TextListList\", \"@value\": []}"), "value.@type", 2,
+                "unknown type"},
         Refusal{"TypeWithBlanks", "{\"@type\": \"KovaHostIpConfig \"}", "@type", 1, "unknown type"},
         Refusal{"TypeThatIsNoText", "{\"@type\": 5}", "@type", 1, "wanted the name of a type"},
         Refusal{"AbstractType", Fault("\"cause\": {\"@type\": \"ServiceFault\"}"), "cause", 2,
                 "ServiceFault has no objects"},
-        Refusal{"AbstractByDeclaration", Fault("\"cause\": {}"), "cause", 2,
-                "MethodFault has no objects"},
+        Refusal{"AbstractByDeclaration", Fault("\"cause\": {}"), "cause", 2, "MethodFault has no objects"},
         Refusal{"UnrelatedType", Mapping(Disk("\"@type\": \"KovaHostIpConfig\",")), "ssd.@type", 2,
                 "KovaHostIpConfig is not a HostScsiDisk"},
         Refusal{"BaseWhereDerivedIsDeclared", Mapping(Disk("\"@type\": \"HostScsiLun\",")), "ssd.@type", 2,
@@ -233,8 +232,7 @@ TEST(DeclaredJson, NeedsNoTypeAtTheTop) {
   const TypeDescriptor& groups = Nox::Kova::Host::IpConfig::StaticType();
   EXPECT_EQ(&read("{\"masterGroup\": \"m\", \"agentGroup\": \"a\"}", groups)->GetType(), &groups);
   EXPECT_EQ(&read("[]", *groups.array)->GetType(), groups.array);
-  EXPECT_EQ(&read("[\"a\"]", Orbis::TextList::StaticType())->GetType(),
-            &Orbis::TextList::StaticType());
+  EXPECT_EQ(&read("[\"a\"]", Orbis::TextList::StaticType())->GetType(), &Orbis::TextList::StaticType());
   EXPECT_EQ(
       &read("{\"@type\": \"xsd:int\", \"@value\": 3}", Orbis::Boxed<std::int32_t>::StaticType())->GetType(),
       &Orbis::Boxed<std::int32_t>::StaticType());

@@ -8,7 +8,6 @@
 namespace Codec {
 namespace {
 
-using Orbis::TextList;
 using Orbis::Binary;
 using Orbis::Bytes;
 using Orbis::DataArrayBase;
@@ -18,6 +17,7 @@ using Orbis::FieldDescriptor;
 using Orbis::FieldKind;
 using Orbis::MakeRef;
 using Orbis::Presence;
+using Orbis::TextList;
 using Orbis::TypeKind;
 
 constexpr int deepest = 5;

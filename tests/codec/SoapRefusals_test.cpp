@@ -208,8 +208,7 @@ INSTANTIATE_TEST_SUITE_P(
         Refusal{"OptionalOutOfOrder",
                 Of("KovaHostConfigInfoClusterInfo", "\n<nodeUuid>n</nodeUuid>\n<clusterUuid>c</clusterUuid>"),
                 "/object/clusterUuid", 3, "'clusterUuid' is repeated or out of order"},
-        Refusal{"DerivedBeforeBase",
-                Of("DiskIsUSB", "\n<device>d</device>\n<cause xsi:type=\"DiskIsUSB\"/>"),
+        Refusal{"DerivedBeforeBase", Of("DiskIsUSB", "\n<device>d</device>\n<cause xsi:type=\"DiskIsUSB\"/>"),
                 "/object/cause", 3, "out of order"},
         Refusal{"ListTornApart",
                 Of("KovaHostDiskMapResult",
@@ -234,14 +233,13 @@ INSTANTIATE_TEST_SUITE_P(
         Refusal{"TextInATextList", Of("TextList", "hello"), "/object", 1, "unexpected text 'hello'"},
         Refusal{"ListOfAnotherElement", Of("TextList", "\n<item/>\n<items/>"), "/object/items", 3,
                 "unexpected element 'items'"},
-        Refusal{"ItemOfAnotherNamespace", Of("TextList", "\n<item xmlns=\"urn:other\"/>"),
-                "/object/item", 2, "in a list"},
+        Refusal{"ItemOfAnotherNamespace", Of("TextList", "\n<item xmlns=\"urn:other\"/>"), "/object/item", 2,
+                "in a list"},
         Refusal{"NilOnRequired", Groups("\n<masterGroup xsi:nil=\"true\"/>\n<agentGroup/>"),
                 "/object/masterGroup", 2, "xsi:nil"},
         Refusal{"NilOnOptional", Enabled("<enabled xsi:nil=\"1\"/>"), "/object/enabled", 2, "xsi:nil"},
         Refusal{"NilOnRoot", Of("KovaHostConfigInfo", "", " xsi:nil=\"true\""), "/object", 1, "xsi:nil"},
-        Refusal{"NilOnAnItem", Of("TextList", "\n<item xsi:nil=\"true\"/>"), "/object/item", 2,
-                "xsi:nil"},
+        Refusal{"NilOnAnItem", Of("TextList", "\n<item xsi:nil=\"true\"/>"), "/object/item", 2, "xsi:nil"},
         Refusal{"NilOnAnyValue", AnyValue("<value xsi:type=\"xsd:int\" xsi:nil=\"true\"/>"), "/object/value",
                 2, "xsi:nil"},
         Refusal{"NilNeitherTrueNorFalse", Enabled("<enabled xsi:nil=\"maybe\">true</enabled>"),
@@ -379,8 +377,7 @@ INSTANTIATE_TEST_SUITE_P(Types, CutSoap, ::testing::ValuesIn(TypeNames()),
 
 // A fault with so many causes behind it.
 std::string ChainOfCauses(std::size_t causes) {
-  return Of("DiskIsUSB",
-            Repeated("<cause xsi:type=\"DiskIsUSB\">", causes) + Repeated("</cause>", causes));
+  return Of("DiskIsUSB", Repeated("<cause xsi:type=\"DiskIsUSB\">", causes) + Repeated("</cause>", causes));
 }
 
 std::string PathOfCauses(std::size_t causes) {

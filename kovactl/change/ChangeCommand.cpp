@@ -20,7 +20,8 @@ void PrintSilence(const Host::ManagementApi& host, const Change& change, std::os
   const auto leftOver = offered ? ExplainLeftOvers(host, *offered) : std::vector<LeftOverDisk>();
   if (!leftOver.empty()) {
     out << "\n";
-    PrintLeftOvers(leftOver, out);
+    PrintLeftOverCounts(leftOver, out);
+    out << "\n`kovactl plan add` with --all-disks names them.\n";
   }
 }
 

@@ -17,6 +17,7 @@ namespace {
 
 using Testing::AGroup;
 using Testing::AGroupResult;
+using testing::AllOf;
 using Testing::AVerdict;
 using testing::ElementsAre;
 using testing::HasSubstr;
@@ -167,7 +168,8 @@ TEST_F(ChangeCommand, SaysWhyNothingWasAdded) {
   EXPECT_EQ(Run(AddEveryEligibleDisk()), ExitStatus::Done);
   EXPECT_THAT(_host.changes, ElementsAre("AddAllEligibleDisks"));
   EXPECT_THAT(_out.str(), HasSubstr("Nothing was added: no disk group can be made of the eligible disks.\n"));
-  EXPECT_THAT(_out.str(), HasSubstr("naa.1      no flash disk is free to be its cache"));
+  EXPECT_THAT(_out.str(), AllOf(HasSubstr("        1  no flash disk is free to be its cache"),
+                                HasSubstr("\n\n`kovactl plan add` with --all-disks names them.\n")));
 }
 
 TEST_F(ChangeCommand, SaysThatNothingWasAddedAlsoOnAHostThatCannotSayWhy) {

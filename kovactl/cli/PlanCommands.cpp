@@ -12,14 +12,17 @@ void AddPlanCommands(CLI::App& app, CommandLine& line) {
   auto* const plan = app.add_subcommand(
       "plan", "Show what a change would do, on a copy of a simulated host; changes nothing");
   plan->require_subcommand(1);
-  AddChanges(*plan, [&line](CLI::App& command, const MakeChange& make) {
-    command.callback([&line, make] {
-      line.action = [&line, make] {
+  const auto allDisks = std::make_shared<bool>(false);
+  plan->add_flag("--all-disks", *allDisks, "Name every disk that would be left over, not only count them");
+  AddChanges(*plan, [&line, allDisks](CLI::App& command, const MakeChange& make) {
+    command.callback([&line, make, allDisks] {
+      line.action = [&line, make, allDisks] {
         if (line.global.output == "soap") {
           throw BadInput("a plan is printed as a table or as json");
         }
         const ChangeRef change = make();
-        return RunPlan(*ConnectToCopy(line.global), *change, line.global.output, std::cout, std::cerr);
+        return RunPlan(*ConnectToCopy(line.global), *change, {line.global.output, *allDisks}, std::cout,
+                       std::cerr);
       };
     });
   });

@@ -1,5 +1,6 @@
 #include "kovactl/plan/LeftOvers.h"
 
+#include <algorithm>
 #include <array>
 #include <map>
 #include <optional>
@@ -127,15 +128,32 @@ std::vector<LeftOverDisk> ExplainLeftOvers(const Host::ManagementApi& host, cons
   return FindLeftOvers(host, OtxCtl::Sim::ParseHostDescription(description), offered, {});
 }
 
-void PrintLeftOvers(const std::vector<LeftOverDisk>& disks, std::ostream& out) {
-  if (disks.empty()) {
-    return;
+void PrintLeftOverCounts(const std::vector<LeftOverDisk>& disks, std::ostream& out) {
+  std::vector<std::pair<std::string, std::size_t>> counts;  // in the order in which the reasons come
+  for (const LeftOverDisk& disk : disks) {
+    const auto known = std::find_if(counts.begin(), counts.end(),
+                                    [&](const auto& count) { return count.first == disk.text; });
+    ++(known == counts.end() ? counts.emplace_back(disk.text, 0) : *known).second;
   }
-  Table table({{"LEFT OVER"}, {"WHY"}});
+  std::stable_sort(counts.begin(), counts.end(),
+                   [](const auto& one, const auto& other) { return one.second > other.second; });
+  Table table({{"LEFT OVER", Table::Align::Right}, {"WHY"}});
+  for (const auto& [reason, count] : counts) {
+    table.AddRow({std::to_string(count), reason});
+  }
+  if (!counts.empty()) {
+    table.Print(out);
+  }
+}
+
+void PrintLeftOverNames(const std::vector<LeftOverDisk>& disks, std::ostream& out) {
+  Table table({{"DISK LEFT OVER"}, {"WHY"}});
   for (const LeftOverDisk& disk : disks) {
     table.AddRow({disk.disk, disk.text});
   }
-  table.Print(out);
+  if (!disks.empty()) {
+    table.Print(out);
+  }
 }
 
 }  // namespace Kovactl

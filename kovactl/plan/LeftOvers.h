@@ -24,7 +24,10 @@ std::vector<LeftOverDisk> FindLeftOvers(const Host::ManagementApi& host,
 std::vector<LeftOverDisk> ExplainLeftOvers(const Host::ManagementApi& host,
                                            const std::vector<std::string>& offered);
 
-// A table of disks and reasons; nothing for an empty list.
-void PrintLeftOvers(const std::vector<LeftOverDisk>& disks, std::ostream& out);
+// How many have each reason, the most frequent first; nothing for an empty list.
+void PrintLeftOverCounts(const std::vector<LeftOverDisk>& disks, std::ostream& out);
+
+// Each with its reason; nothing for an empty list.
+void PrintLeftOverNames(const std::vector<LeftOverDisk>& disks, std::ostream& out);
 
 }  // namespace Kovactl

@@ -114,10 +114,27 @@ TEST_F(LeftOvers, AreExplainedOnlyOfASimulatedHost) {
 
 TEST_F(LeftOvers, ArePrintedWithTheirReasons) {
   std::ostringstream out;
-  PrintLeftOvers({{"naa.1", "noCacheDisk", "no flash disk"}}, out);
-  EXPECT_EQ(out.str(), "LEFT OVER  WHY\nnaa.1      no flash disk\n");
+  PrintLeftOverNames({{"naa.1", "noCacheDisk", "no flash disk"}}, out);
+  EXPECT_EQ(out.str(), "DISK LEFT OVER  WHY\nnaa.1           no flash disk\n");
   out.str("");
-  PrintLeftOvers({}, out);
+  PrintLeftOverNames({}, out);
+  EXPECT_EQ(out.str(), "");
+}
+
+TEST_F(LeftOvers, AreCountedByReasonTheMostFrequentFirst) {
+  std::ostringstream out;
+  PrintLeftOverCounts({{"naa.1", "notEligible", "too small"},
+                       {"naa.2", "notEligible", "attached by USB"},
+                       {"naa.3", "noCacheDisk", "no flash disk"},
+                       {"naa.4", "notEligible", "attached by USB"}},
+                      out);
+  EXPECT_EQ(out.str(),
+            "LEFT OVER  WHY\n"
+            "        2  attached by USB\n"
+            "        1  too small\n"
+            "        1  no flash disk\n");
+  out.str("");
+  PrintLeftOverCounts({}, out);
   EXPECT_EQ(out.str(), "");
 }
 

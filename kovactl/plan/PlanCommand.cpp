@@ -69,7 +69,23 @@ void AddGroup(Table& table, const PlannedGroup& group) {
   }
 }
 
-void PrintPlan(const Plan& plan, std::ostream& out) {
+// Of a large host they would fill many screens, so they are named for who asks for that.
+void PrintLeftOvers(const std::vector<LeftOverDisk>& disks, bool named, std::ostream& out) {
+  if (disks.empty()) {
+    return;
+  }
+  PrintLeftOverCounts(disks, out);
+  out << "\n";
+  if (named) {
+    PrintLeftOverNames(disks, out);
+    out << "\n";
+  } else {
+    out << disks.size() << (disks.size() == 1 ? " disk is" : " disks are") << " left over; --all-disks names "
+        << (disks.size() == 1 ? "it" : "them") << ".\n";
+  }
+}
+
+void PrintPlan(const Plan& plan, bool allDisks, std::ostream& out) {
   Table table({{"CHANGE"}, {"GROUP"}, {"ROLE"}, {"DISK"}});
   for (const PlannedGroup& group : plan.groups) {
     AddGroup(table, group);
@@ -78,10 +94,7 @@ void PrintPlan(const Plan& plan, std::ostream& out) {
     table.Print(out);
     out << "\n";
   }
-  PrintLeftOvers(plan.leftOver, out);
-  if (!plan.leftOver.empty()) {
-    out << "\n";
-  }
+  PrintLeftOvers(plan.leftOver, allDisks, out);
   out << (plan.groups.empty() ? "Nothing would change." : "This is a plan: nothing was changed.") << "\n";
 }
 
@@ -104,13 +117,13 @@ Plan MakePlan(const Host::ManagementApi& copy, Change& change) {
   return plan;
 }
 
-ExitStatus RunPlan(const Host::ManagementApi& copy, Change& change, const std::string& output,
+ExitStatus RunPlan(const Host::ManagementApi& copy, Change& change, const PlanOptions& options,
                    std::ostream& out, std::ostream& err) {
   const Plan plan = MakePlan(copy, change);
-  if (output == "json") {
+  if (options.output == "json") {
     out << ToJson(plan).dump(2) << "\n";
   } else {
-    PrintPlan(plan, out);
+    PrintPlan(plan, options.allDisks, out);
   }
   PrintGroupFaults(dynamic_cast<const GroupResults*>(plan.answer.result.Get()), plan.answer.fault.Get(), err);
   return plan.answer.fault ? ExitStatus::Fault : ExitStatus::Done;

@@ -14,8 +14,13 @@ namespace Kovactl {
 // change does, and for an answer that cannot be a simulated host's.
 Plan MakePlan(const Host::ManagementApi& copy, Change& change);
 
+struct PlanOptions {
+  std::string output = "table";
+  bool allDisks = false;  // in a table, whether disks that are left over are named; JSON always names them
+};
+
 // The same, printed. Fault when the host would answer with one.
-ExitStatus RunPlan(const Host::ManagementApi& copy, Change& change, const std::string& output,
+ExitStatus RunPlan(const Host::ManagementApi& copy, Change& change, const PlanOptions& options,
                    std::ostream& out, std::ostream& err);
 
 }  // namespace Kovactl

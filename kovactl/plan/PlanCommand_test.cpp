@@ -28,8 +28,8 @@ class PlanCommand : public testing::Test {
     _copy.descriptions = {OtxCtl::Sim::WriteHostDescription(before.Build()),
                           OtxCtl::Sim::WriteHostDescription(after.Build())};
   }
-  ExitStatus Run(const ChangeRef& change, const std::string& output = "table") {
-    return RunPlan(_copy, *change, output, _out, _err);
+  ExitStatus Run(const ChangeRef& change, const PlanOptions& options = {}) {
+    return RunPlan(_copy, *change, options, _out, _err);
   }
   static OtxCtl::Sim::HostBuilder Disks() { return AHost().WithSsd("ssd1").WithHdds({"hdd1", "hdd2"}); }
 
@@ -55,10 +55,36 @@ TEST_F(PlanCommand, ShowsTheGroupsAndWhatIsLeftOver) {
             "                capacity  hdd2\n"
             "\n"
             "LEFT OVER  WHY\n"
-            "hdd3       attached by USB\n"
+            "        1  attached by USB\n"
             "\n"
+            "1 disk is left over; --all-disks names it.\n"
             "This is a plan: nothing was changed.\n");
   EXPECT_EQ(_err.str(), "");
+}
+
+TEST_F(PlanCommand, NamesTheDisksLeftOverWhenItIsToldTo) {
+  CopyGoes(Disks(), Disks());
+  _copy.answer = Testing::WithList<Testing::DiskResult>(
+      {AVerdict("hdd3", "ineligible", Tessa::MakeRef<Nox::Fault::DiskIsUSB>("hdd3")),
+       AVerdict("hdd4", "ineligible", Tessa::MakeRef<Nox::Fault::DiskIsUSB>("hdd4"))});
+  EXPECT_EQ(Run(AddEveryEligibleDisk()), ExitStatus::Done);
+  EXPECT_EQ(_out.str(),
+            "LEFT OVER  WHY\n"
+            "        2  attached by USB\n"
+            "\n"
+            "2 disks are left over; --all-disks names them.\n"
+            "Nothing would change.\n");
+  _out.str("");
+  EXPECT_EQ(Run(AddEveryEligibleDisk(), {.allDisks = true}), ExitStatus::Done);
+  EXPECT_EQ(_out.str(),
+            "LEFT OVER  WHY\n"
+            "        2  attached by USB\n"
+            "\n"
+            "DISK LEFT OVER  WHY\n"
+            "hdd3            attached by USB\n"
+            "hdd4            attached by USB\n"
+            "\n"
+            "Nothing would change.\n");
 }
 
 TEST_F(PlanCommand, ShowsNoDisksLeftOverOfAChangeThatOffersNone) {
@@ -83,7 +109,7 @@ TEST_F(PlanCommand, PrintsForScripts) {
       {AGroupResult("ssd1", {"hdd1"}), AGroupResult("ssd2", {"hdd2"}, {}, fault)}, fault);
   _copy.answer = Testing::WithList<Testing::DiskResult>(
       {AVerdict("hdd3", "ineligible", Tessa::MakeRef<Nox::Fault::DiskTooSmall>("hdd3"))});
-  EXPECT_EQ(Run(AddTheseDisks({"ssd1", "hdd1", "hdd2", "hdd3"}), "json"), ExitStatus::Fault);
+  EXPECT_EQ(Run(AddTheseDisks({"ssd1", "hdd1", "hdd2", "hdd3"}), {"json"}), ExitStatus::Fault);
   EXPECT_EQ(nlohmann::json::parse(_out.str()), nlohmann::json::parse(R"({
     "groups": [{"change": "made", "ssd": "ssd1", "capacity": ["hdd1"], "allFlash": false},
                {"change": "failed", "ssd": "ssd2", "capacity": ["hdd2"],
@@ -95,7 +121,7 @@ TEST_F(PlanCommand, PrintsForScripts) {
 TEST_F(PlanCommand, PrintsNothingThatIsThereForScripts) {
   CopyGoes(Disks(), Disks());
   _copy.answer = Testing::WithGroups({});
-  EXPECT_EQ(Run(ClaimGroups(), "json"), ExitStatus::Done);
+  EXPECT_EQ(Run(ClaimGroups(), {"json"}), ExitStatus::Done);
   EXPECT_EQ(nlohmann::json::parse(_out.str()),
             nlohmann::json::parse(R"({"groups": [], "leftOver": [], "fault": null})"));
 }

@@ -64,8 +64,8 @@ class Changes:
         self.use({"disks": [disk("naa.h1"), disk("naa.usb", transport="usb")]})
         outcome = self.done("add", "--all", "--yes")
         self.assertTrue(outcome.out.startswith("Nothing was added: no disk group can be made"), outcome.out)
-        self.assertIn("naa.h1     no flash disk is free to be its cache", outcome.out)
-        self.assertIn("naa.usb    attached by USB\n", outcome.out)
+        self.assertIn("        1  no flash disk is free to be its cache", outcome.out)
+        self.assertIn("        1  attached by USB\n", outcome.out)
         self.assertEqual(self.done("-o", "json", "add", "--all", "--yes").json(), [])
         self.done("sim", "set", "naa.h1", "--partitions", "1")
         self.assertIn("no disk is eligible", self.done("add", "--all", "--yes").out)
@@ -238,7 +238,7 @@ class Changes:
                 ("remove", "naa.h1"): "reduced  hybrid  cache     naa.s1\n                 capacity  naa.h1\n\n",
                 ("unmount", "naa.s2"): "unmounted  hybrid  cache     naa.s2\n",
                 ("claim",): "Nothing would change.\n",
-                ("add", "--all"): "naa.usb    attached by USB\n",
+                ("add", "--all"): "        1  attached by USB\n",
         }.items():
             with self.subTest(command):
                 self.assertIn(told, self.plan(*command).out)

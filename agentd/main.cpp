@@ -14,6 +14,7 @@
 #include "agentd/http/HttpServer.h"
 #include "agentd/routes/Routes.h"
 #include "agentd/tasks/TaskQueue.h"
+#include "host/Build.h"
 #include "host/HostRuntime.h"
 #include "host/KovaService.h"
 #include "host/LogSink.h"
@@ -32,6 +33,7 @@ struct Options {
 };
 
 void AddOptions(CLI::App& cli, Options& options) {
+  cli.set_version_flag("--version", "agentd " + Host::VersionLine(), "Print version, build and API, and end");
   cli.add_option("--host", options.runtime.hostFile,
                  "Host description to serve; without one, an example host is served");
   cli.add_flag("--save", options.runtime.save, "Write every change of the host back to its description");

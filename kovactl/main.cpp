@@ -3,6 +3,7 @@
 #include <iostream>
 
 #include "agentd/http/HttpClient.h"
+#include "host/Build.h"
 #include "host/Text.h"
 #include "kovactl/cli/CommandLine.h"
 
@@ -45,6 +46,8 @@ ExitStatus Run(const CommandLine& line) {
 
 int main(int argc, char** argv) {
   CLI::App app("Look at a KOVA host and change it", "kovactl");
+  app.set_version_flag("--version", "kovactl " + Host::VersionLine(),
+                       "Print version, build and API, and end");
   app.require_subcommand(0, 1);  // a word that is no command is then named in the refusal
   app.fallthrough();
   CommandLine line;

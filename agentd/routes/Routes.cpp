@@ -17,6 +17,7 @@
 #include "agentd/routes/SoapAnswer.h"
 #include "agentd/routes/SoapEndpoint.h"
 #include "agentd/tasks/TaskQueue.h"
+#include "host/Build.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
 #include "host/Text.h"
@@ -78,7 +79,11 @@ void Ask(const Call& call, Query query) {
 }
 
 void Health(const Call& call) {
-  call.responder.Answer(PlainText(200, "ok"));
+  std::string text = "ok";
+  if (call.request.peer.role >= HttpRole::Read) {  // what it is, strangers need not know
+    text += "\nagentd " + Host::VersionLine();
+  }
+  call.responder.Answer(PlainText(200, text));
 }
 
 void GetMetrics(const Call& call) {

@@ -1,6 +1,6 @@
 // Which request calls which operation.
 //
-//   GET  /healthz                    "ok" while the agent serves
+//   GET  /healthz                    "ok" while the agent serves; to readers, in a second line, its version
 //   GET  /metrics                    what it has served, and what waits (see Metrics.h)
 //   GET  /api/v1/disks?names=N&..    QueryDisksForKova
 //   GET  /api/v1/groups              GetDiskGroups

@@ -6,6 +6,7 @@
 #include "agentd/tasks/TaskQueue.h"
 #include "agentd/testing/FakeService.h"
 #include "agentd/testing/RunningServer.h"
+#include "host/Build.h"
 #include "orbis/Types.h"
 
 namespace Agentd {
@@ -36,11 +37,15 @@ class Routes : public testing::Test {
   const Router _router{_service, _tasks};
 };
 
-TEST_F(Routes, HealthIsOk) {
+TEST_F(Routes, HealthIsOkAndTellsTheVersionToThoseWhoMayRead) {
   const HttpAnswer answer = Get("/healthz");
   EXPECT_EQ(answer.status, 200u);
   EXPECT_EQ(answer.contentType, "text/plain");
-  EXPECT_EQ(answer.body, "ok\n");
+  EXPECT_EQ(answer.body, "ok\nagentd " + Host::VersionLine() + "\n");
+  const auto handler = [this](const HttpRequest& asked, const HttpResponder& responder) {
+    _router.Serve(asked, responder);
+  };
+  EXPECT_EQ(Testing::AnswerOf(handler, {"GET", "/healthz", "", ""}, HttpRole::None).body, "ok\n");
   EXPECT_EQ(FakeHooks::calls, 0);
 }
 

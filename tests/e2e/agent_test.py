@@ -103,7 +103,11 @@ class AgentAnswersCurl(ProgramTest):
                          body)
 
     def test_that_it_is_well(self):
-        self.assertEqual(self.curl("/healthz"), (200, "ok\n"))
+        status, body = self.curl("/healthz")
+        version = self.agentd("--version")
+        self.assert_ended(version, 0)
+        self.assertRegex(version.out, r"^agentd \d+\.\d+\.\d+ \(build \S+, API nox\.version\.unstable\)\n$")
+        self.assertEqual((status, body), (200, "ok\n" + version.out))
 
     def test_with_all_disks_and_with_chosen_ones(self):
         status, body = self.curl("/api/v1/disks")

@@ -89,6 +89,11 @@ class OneProcess(ProgramTest):
             self.assertIn(f"\n  {command} ", self.kovactl("plan", "--help").out)
         self.assertIn("Exit status: 0 done", outcome.out)
 
+    def test_tells_its_version(self):
+        outcome = self.kovactl("--version")
+        self.assert_ended(outcome, 0)
+        self.assertRegex(outcome.out, r"^kovactl \d+\.\d+\.\d+ \(build \S+, API nox\.version\.unstable\)\n$")
+
     def test_lets_no_name_play_with_the_terminal(self):
         # A description may not hold such a name, so it can only come from the command line.
         outcome = self.kovactl("--host", self.write("host.json", TWO_DISKS), "disks", "\x1b[2J")

@@ -38,7 +38,9 @@ class NetworkTest(ProgramTest):
 
     def assert_roles(self, ask, reads, changes):
         """What a client may do: `ask` takes a path and what curl takes."""
-        self.assertEqual(ask("/healthz"), (200, "ok\n"))
+        status, health = ask("/healthz")
+        self.assertEqual(status, 200)
+        self.assertRegex(health, r"^ok\nagentd \S+ \(build \S+, API \S+\)\n$" if reads else r"^ok\n$")
         self.assert_permitted(ask("/api/v1/disks"), reads, "read")
         self.assert_permitted(ask("/api/v1/tasks"), reads, "read")
         self.assert_permitted(ask("/api/v1/host"), reads, "read")

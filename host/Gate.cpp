@@ -5,6 +5,8 @@
 #include "host/Text.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
+#include "otxctl/sim/HostDescription.h"
+#include "otxctl/sim/HostDescriptionError.h"
 
 namespace Host::Gate {
 
@@ -151,6 +153,14 @@ Ref<MappingList> AdmitGroups(const MappingList& mappings, const KnownDisks& know
 
 Ref<DiskMapping> AdmitGroup(const DiskMapping& mapping, const KnownDisks& known) {
   return AdmitMapping("mapping", &mapping, known, Unknown::LetIn);
+}
+
+void CheckHostChange(std::string_view change) {
+  try {
+    OtxCtl::Sim::CheckChange(change);
+  } catch (const OtxCtl::Sim::HostDescriptionError& refused) {
+    RefuseChange(refused.what());
+  }
 }
 
 void RefuseChange(const std::string& error) {

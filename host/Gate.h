@@ -9,6 +9,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "host/ManagementApi.h"
@@ -74,6 +75,9 @@ void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::K
 // UUID, as copies of one disk do, for the kernel would take out any of them, and a cache disk's group with
 // it. `place` is where the request names it. Nothing is asked about other disks.
 void DemandOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel);
+
+// The text of a change of a simulated host, whatever that host is like now.
+void CheckHostChange(std::string_view change);
 
 // A change of a simulated host that the host would not accept; `error` begins with the path.
 [[noreturn]] void RefuseChange(const std::string& error);

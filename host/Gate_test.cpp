@@ -310,6 +310,11 @@ TEST_F(GateWithHost, RefusesWhatItCannotFindOut) {
   }
 }
 
+TEST(GateForChanges, RefusesATextThatIsNoChangeWhateverTheHost) {
+  EXPECT_EQ(VerdictOn([] { CheckHostChange(R"({"disk": {"name": "nobody"}})"); }), "let in");
+  EXPECT_EQ(VerdictOn([] { CheckHostChange("[]"); }), "document | document: must be an object");
+}
+
 TEST(GateForChanges, NamesThePathThatTheErrorBeginsWith) {
   EXPECT_EQ(VerdictOn([] { RefuseChange("disks[1].ssd: must be true or false"); }),
             "disks[1].ssd | disks[1].ssd: must be true or false");

@@ -18,6 +18,7 @@
 #include "agentd/routes/SoapEndpoint.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "host/Build.h"
+#include "host/Gate.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
 #include "host/Text.h"
@@ -170,6 +171,7 @@ void GetHost(const Call& call) {
 
 // A task like any other: nothing changes the host while a request is at work on it.
 void PostHost(const Call& call) {
+  Host::Gate::CheckHostChange(call.request.body);
   Submit(
       call, "ChangeHost", ReadRequest(),
       [&api = call.api, change = call.request.body] { return api.ChangeHost(change); },

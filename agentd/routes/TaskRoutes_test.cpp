@@ -206,14 +206,22 @@ TEST_F(TaskRoutes, TooLargeAGroupOrTooLongANameIsRefusedBeforeItWaits) {
   EXPECT_THAT(_api.Asked(), IsEmpty());
 }
 
+TEST_F(TaskRoutes, AChangeOfTheHostThatIsNoneIsNoTask) {
+  for (const char* body : {"", "{", "[]", R"({"set": 1})", R"({"disk": {}})", R"({"colour": {}})"}) {
+    EXPECT_EQ(Post("host", body).status, 400u) << body;
+  }
+  EXPECT_THAT(_tasks.List(), IsEmpty());
+  EXPECT_THAT(_api.Asked(), IsEmpty());
+}
+
 TEST_F(TaskRoutes, ChangesOfTheHostCountByTheirBytesWhileTheyWait) {
   TaskQueue tasks({.waitingBytes = 1000});
   const Router router(_api, tasks);
   const auto change = [&router](std::size_t bytes) {
     const auto status = std::make_shared<std::atomic<unsigned>>(0);
-    router.Serve(
-        Testing::By(HttpRole::Change, {"POST", "/api/v1/host", "application/json", std::string(bytes, ' ')}),
-        HttpResponder([status](const HttpAnswer& given) { *status = given.status; }));
+    router.Serve(Testing::By(HttpRole::Change,
+                             {"POST", "/api/v1/host", "application/json", "{}" + std::string(bytes, ' ')}),
+                 HttpResponder([status](const HttpAnswer& given) { *status = given.status; }));
     return status->load();
   };
   _api.onChange = [this] { _gate.Enter(); };

@@ -122,6 +122,27 @@ TEST(HostChange, ATextThatIsNoChangeIsRefusedAndChangesNothing) {
   EXPECT_THAT(errorOf(R"({"set": {}, "set": {}})"), testing::HasSubstr("set"));
 }
 
+TEST(HostChange, ATextIsAChangeOrNotWhateverTheHost) {
+  const auto errorOf = [](std::string_view change) -> std::string {
+    try {
+      CheckChange(change);
+    } catch (const HostDescriptionError& error) {
+      return error.what();
+    }
+    return "a change";
+  };
+  EXPECT_EQ(errorOf("{}"), "a change");
+  EXPECT_EQ(errorOf(R"({"set": null, "disk": null})"), "a change");
+  EXPECT_EQ(errorOf(R"({"set": {"no": 1}, "disk": {"name": "naa.9", "no": 1}})"), "a change");
+  EXPECT_THAT(errorOf("{"), StartsWith("line 1"));
+  EXPECT_THAT(errorOf("[]"), StartsWith("document: "));
+  EXPECT_THAT(errorOf(R"({"": 1})"), StartsWith("'': is no known key"));
+  EXPECT_THAT(errorOf(R"({"set": []})"), StartsWith("set: "));
+  EXPECT_THAT(errorOf(R"({"disk": 1})"), StartsWith("disk: "));
+  EXPECT_THAT(errorOf(R"({"disk": {}})"), StartsWith("disk.name: "));
+  EXPECT_THAT(errorOf(R"({"disk": {"name": 1}})"), StartsWith("disk.name: "));
+}
+
 TEST(HostChange, TextsThatDidNotComeFromAFileAreCheckedToo) {
   HostDescription host = ThreeDisks();
   EXPECT_THROW(ApplyChange(host, json{{"faultDomain", "\xFF"}}, nullptr), HostDescriptionError);

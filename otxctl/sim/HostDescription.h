@@ -124,6 +124,8 @@ void ApplyChange(HostDescription& host, const nlohmann::json& set, const nlohman
 // The same for a text {"set": {..}, "disk": {..}} that nobody vouches for; either may be missing, other keys
 // are an error.
 void ApplyChange(HostDescription& host, std::string_view change);
+// Throws HostDescriptionError for a text that is no change, whatever the host.
+void CheckChange(std::string_view change);
 
 // Throws HostDescriptionError unless the description, written and read again, is accepted.
 void CheckHostDescription(const HostDescription& host);

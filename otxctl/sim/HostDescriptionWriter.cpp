@@ -91,21 +91,27 @@ bool IsGiven(const json& object, const char* what) {
   return true;
 }
 
-json& FindDisk(json& document, const json& change) {
+// Of the disk that is to be changed.
+const json& NameIn(const json& change) {
   const auto name = change.find("name");
   if (name == change.end() || !name->is_string()) {
     throw HostDescriptionError("disk.name: must be the name of the disk to change");
   }
+  return *name;
+}
+
+json& FindDisk(json& document, const json& change) {
+  const json& name = NameIn(change);
   json& disks = document["disks"];
   if (disks.is_array()) {
     for (json& disk : disks) {
-      if (disk.is_object() && disk.contains("name") && disk["name"] == *name) {
+      if (disk.is_object() && disk.contains("name") && disk["name"] == name) {
         return disk;
       }
     }
   }
   throw HostDescriptionError("disk.name: the host has no disk " +
-                             Quoted(CleanText(name->get_ref<const std::string&>())));
+                             Quoted(CleanText(name.get_ref<const std::string&>())));
 }
 
 }  // namespace
@@ -129,17 +135,37 @@ void ApplyChange(HostDescription& host, const json& set, const json& disk) {
   host = ReadHostDescription(document);
 }
 
-void ApplyChange(HostDescription& host, std::string_view change) {
-  const json document = ParseJsonText(change, JsonLimits{});
+namespace {
+
+// A text that is of a change's form, whatever host it is for.
+json ReadChange(std::string_view change) {
+  json document = ParseJsonText(change, JsonLimits{});
   if (!document.is_object()) {
     throw HostDescriptionError("document: must be an object");
   }
   const std::array<const char*, 2> keys = {"set", "disk"};
   for (const auto& [key, value] : document.items()) {
     if (std::find(keys.begin(), keys.end(), key) == keys.end()) {
-      throw HostDescriptionError(Shortened(CleanText(key)) + ": is no known key; a change has set and disk");
+      const std::string clean = Shortened(CleanText(key));
+      throw HostDescriptionError((clean.empty() ? "''" : clean) +
+                                 ": is no known key; a change has set and disk");
     }
   }
+  IsGiven(document.value("set", json()), "set");
+  if (const json disk = document.value("disk", json()); IsGiven(disk, "disk")) {
+    NameIn(disk);
+  }
+  return document;
+}
+
+}  // namespace
+
+void CheckChange(std::string_view change) {
+  ReadChange(change);
+}
+
+void ApplyChange(HostDescription& host, std::string_view change) {
+  const json document = ReadChange(change);
   ApplyChange(host, document.value("set", json()), document.value("disk", json()));
 }
 

@@ -2,9 +2,11 @@
 
 #include <iostream>
 
+#include "agentd/client/AgentClient.h"
 #include "agentd/http/HttpClient.h"
 #include "host/Build.h"
 #include "host/Text.h"
+#include "kovactl/Print.h"
 #include "kovactl/cli/CommandLine.h"
 
 namespace {
@@ -28,6 +30,9 @@ void AddEverything(CLI::App& app, CommandLine& line) {
 ExitStatus Run(const CommandLine& line) {
   try {
     return line.action();
+  } catch (const Agentd::RefusedByAgent& refused) {
+    Kovactl::PrintFault(refused.GetFault(), std::cerr);
+    return ExitStatus::Fault;
   } catch (const Agentd::TlsError& error) {
     std::cerr << "kovactl: " << Host::Printable(error.what()) << "\n";
     return ExitStatus::Unreachable;

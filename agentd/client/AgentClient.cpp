@@ -3,7 +3,10 @@
 #include <stdexcept>
 #include <utility>
 
+#include "host/HostError.h"
 #include "nox/Kova.h"
+#include "orbis/Excerpt.h"
+#include "orbis/FaultText.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
 #include "orbis/TypeDescriptor.h"
@@ -69,7 +72,27 @@ const Orbis::TypeDescriptor* GroupResults() {
 }
 constexpr const Orbis::TypeDescriptor* noResult = nullptr;
 
+// The agent is of another kind: it lacks the operation, or takes it in another form.
+bool IsUnserved(unsigned status) {
+  return status == 404 || status == 405 || status == 415;
+}
+
+std::string InALine(const Answer& answer) {
+  if (!answer.fault) {
+    return "it gives no reason";
+  }
+  for (const Orbis::LocalizableMessage* message : *answer.fault->GetFaultMessage()) {
+    if (message->HasMessage()) {
+      return message->GetMessage();
+    }
+  }
+  return Orbis::FaultText(*answer.fault);
+}
+
 }  // namespace
+
+RefusedByAgent::RefusedByAgent(Tessa::Ref<Orbis::MethodFault> fault)
+    : std::runtime_error(InALine({.result = nullptr, .fault = fault})), _fault(std::move(fault)) {}
 
 AgentClient::AgentClient(const std::string& url, TlsClientFiles files)
     : _address(ParseAgentAddress(url)), _files(std::move(files)) {}
@@ -122,7 +145,14 @@ Answer AgentClient::ClaimUnmountedDiskgroup() const {
 }
 
 std::string AgentClient::DescribeHost() const {
-  return Get("host");
+  try {
+    return Get("host");
+  } catch (const RefusedByAgent& refused) {
+    if (dynamic_cast<const Orbis::Fault::InvalidArgument*>(&refused.GetFault()) == nullptr) {
+      throw;
+    }
+    throw Host::HostError(refused.what());
+  }
 }
 
 Answer AgentClient::ChangeHost(const std::string& change) const {
@@ -142,6 +172,15 @@ Answer AgentClient::Ask(const std::string& operation, const std::string& body,
   const HttpAnswer http = Exchange(
       _address, {"POST", std::string(folder) + operation, std::string(jsonType), body}, patience, _files);
   DemandJson(http);
+  const Answer answer = Read(http, resultType);
+  if (IsUnserved(http.status)) {
+    throw ConnectionError("the agent on " + _address.Name() + " answered with status " +
+                          std::to_string(http.status) + ": " + InALine(answer));
+  }
+  return answer;
+}
+
+Answer AgentClient::Read(const HttpAnswer& http, const Orbis::TypeDescriptor* resultType) const {
   try {
     return Host::ReadJsonAnswer(http.body, resultType);
   } catch (const Orbis::ParseException& refused) {
@@ -153,13 +192,22 @@ Answer AgentClient::Ask(const std::string& operation, const std::string& body,
 std::string AgentClient::Get(const std::string& target) const {
   HttpAnswer http = Exchange(_address, {"GET", std::string(folder) + target, "", ""}, queryPatience, _files);
   DemandJson(http);
-  return std::move(http.body);
+  if (http.status == 200) {
+    return std::move(http.body);
+  }
+  const Answer answer = Read(http, noResult);
+  if (!answer.fault) {
+    throw ConnectionError("the agent on " + _address.Name() + " answered with status " +
+                          std::to_string(http.status) + " and without a reason");
+  }
+  throw RefusedByAgent(answer.fault);
 }
 
 void AgentClient::DemandJson(const HttpAnswer& http) const {
   if (http.contentType != jsonType) {
     throw ConnectionError("the agent on " + _address.Name() + " answered with status " +
-                          std::to_string(http.status) + ": " + http.body.substr(0, longestShown));
+                          std::to_string(http.status) + ": " +
+                          std::string(Orbis::Excerpt(http.body, longestShown)));
   }
 }
 

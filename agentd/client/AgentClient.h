@@ -2,6 +2,7 @@
 #pragma once
 
 #include <chrono>
+#include <stdexcept>
 #include <string>
 #include <vector>
 
@@ -10,11 +11,22 @@
 
 namespace Agentd {
 
+// The agent answers what has no room for a fault with one: the reader of tasks may not read them, a task is
+// forgotten. The text is the fault's in a line.
+class RefusedByAgent : public std::runtime_error {
+ public:
+  explicit RefusedByAgent(Tessa::Ref<Orbis::MethodFault> fault);
+  const Orbis::MethodFault& GetFault() const { return *_fault; }
+
+ private:
+  Tessa::Ref<Orbis::MethodFault> _fault;
+};
+
 // A change is waited for as long as it takes, within a day; a query for ten minutes.
 //
 // Threads: any; every call has a connection of its own. Errors: ConnectionError when the agent cannot be
-// reached or does not answer in the form it should. A fault of the gate, or Busy, is an answer like any
-// other.
+// reached, does not answer in the form it should, or does not serve what it is asked. A fault of the gate, or
+// Busy, is an answer like any other; only what answers with a text throws RefusedByAgent.
 class AgentClient final : public Host::ManagementApi {
  public:
   // A URL: "unix:/run/kova/agentd.sock", "tls:kova.example:9443" or "tcp:127.0.0.1:8080". Throws
@@ -35,6 +47,7 @@ class AgentClient final : public Host::ManagementApi {
   Host::Answer RemoveDiskMapping(const Nox::Kova::Host::DiskMapping& mapping,
                                  const Host::RemovalArguments& arguments) const override;
   Host::Answer ClaimUnmountedDiskgroup() const override;
+  // Throws Host::HostError when the agent's host is not simulated.
   std::string DescribeHost() const override;
   Host::Answer ChangeHost(const std::string& change) const override;
 
@@ -46,9 +59,10 @@ class AgentClient final : public Host::ManagementApi {
  private:
   Host::Answer Ask(const std::string& operation, const std::string& body,
                    const Orbis::TypeDescriptor* resultType, std::chrono::milliseconds patience) const;
-  // The body, which must be JSON.
+  // The body. Throws RefusedByAgent for a fault in its place.
   std::string Get(const std::string& target) const;
   void DemandJson(const HttpAnswer& http) const;
+  Host::Answer Read(const HttpAnswer& http, const Orbis::TypeDescriptor* resultType) const;
 
   HttpAddress _address;
   TlsClientFiles _files;

@@ -11,9 +11,11 @@
 #include "agentd/testing/FakeApi.h"
 #include "agentd/testing/FakeService.h"
 #include "agentd/testing/RunningServer.h"
+#include "host/HostError.h"
 #include "host/testing/Requests.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
+#include "orbis/TypeDescriptor.h"
 #include "orbis/Types.h"
 
 namespace Agentd {
@@ -154,9 +156,32 @@ TEST(AgentClient, FetchesTasksAndTheHostsDescriptionAsTheyAre) {
   client.AddAllEligibleDisks();
   EXPECT_THAT(client.Tasks(), HasSubstr("AddAllEligibleDisks"));
   EXPECT_THAT(client.Task(tasks.List().at(0).id), HasSubstr("\"result\":null"));
-  EXPECT_THROW(client.Task("task-1"), ConnectionError);
   api.description.clear();
-  EXPECT_THROW(client.DescribeHost(), ConnectionError);
+  EXPECT_THROW(client.DescribeHost(), Host::HostError);
+}
+
+TEST(AgentClient, ThrowsTheFaultThatComesInThePlaceOfAText) {
+  const Testing::FakeApi api;
+  TaskQueue tasks;
+  RunningServer server(Serving(api, tasks));
+  try {
+    AgentClient("unix:" + server.Path()).Task("task-1");
+    FAIL() << "there is no such task";
+  } catch (const RefusedByAgent& refused) {
+    EXPECT_NE(dynamic_cast<const Orbis::Fault::InvalidArgument*>(&refused.GetFault()), nullptr);
+    EXPECT_THAT(refused.what(), HasSubstr("no task of that id"));
+  }
+}
+
+TEST(AgentClient, TellsAnAgentThatLacksAnOperationFromAHostThatRefusesIt) {
+  const std::string body = R"({"result":null,"fault":{"@type":"InvalidArgument","faultMessage":)"
+                           R"([{"key":"k","message":"nothing is served here"}]}})";
+  for (const unsigned status : {404u, 405u, 415u}) {
+    EXPECT_THAT(WhyNot({status, "application/json", body}),
+                AllOf(HasSubstr(std::to_string(status)), HasSubstr("nothing is served here")));
+  }
+  RunningServer server([&body](const HttpRequest&) { return HttpAnswer{409, "application/json", body}; });
+  EXPECT_TRUE(AgentClient("unix:" + server.Path()).QueryDisksForKova({}).fault);
 }
 
 TEST(AgentClient, GivesAFaultOfTheAgentAsAFault) {

@@ -73,7 +73,7 @@ bool HasOnly(std::string_view text, std::string_view others) {
 }  // namespace
 
 HttpAnswer RefusedWith(unsigned status, const std::string& text) {
-  return {status, "text/plain", text + "\n"};
+  return {status, "text/plain; charset=utf-8", text + "\n"};
 }
 
 bool IsHost(std::string_view host) {

@@ -8,7 +8,7 @@ namespace Agentd {
 class HttpResponder::State {
  public:
   explicit State(Send send) : _send(std::move(send)) {}
-  ~State() { Answer({500, "text/plain", "the request was dropped\n"}); }
+  ~State() { Answer({500, "text/plain; charset=utf-8", "the request was dropped\n"}); }
   State(const State&) = delete;
   State& operator=(const State&) = delete;
 

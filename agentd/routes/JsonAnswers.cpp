@@ -51,7 +51,7 @@ HttpAnswer WithStatusOf(const Answer& answer) {
 }  // namespace
 
 HttpAnswer PlainText(unsigned status, const std::string& text) {
-  return {status, "text/plain", text + "\n"};
+  return {status, "text/plain; charset=utf-8", text + "\n"};
 }
 
 HttpAnswer ToHttp(const Answer& answer) {

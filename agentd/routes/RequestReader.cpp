@@ -31,6 +31,11 @@ void Demand(Kind kind, const char* wanted, const Value& value, const std::string
   }
 }
 
+// A key of the client's, in a place: '' for one without a letter.
+std::string Named(std::string_view key) {
+  return key.empty() ? "''" : Host::Printable(key);
+}
+
 std::string ReadText(const Value& value, const std::string& path) {
   Demand(Kind::String, "a text", value, path);
   return value.text;
@@ -79,7 +84,7 @@ Ref<DiskMapping> ReadMapping(const Value& value, const std::string& path) {
     Refuse(value, path + ".ssd", "is missing");
   }
   for (const auto& [key, member] : value.members) {
-    const std::string place = path + "." + Host::Printable(key);
+    const std::string place = path + "." + Named(key);
     if (key == "ssd") {
       mapping->SetSsd(ReadDisk(member, place));
     } else if (key == "nonSsd") {
@@ -185,7 +190,7 @@ ReadRequest ReadJsonRequest(const Operation& operation, std::string_view body) {
   ReadRequest request;
   for (const auto& [key, value] : root.members) {
     if (!Takes(operation, key)) {
-      Refuse(value, Host::Printable(key),
+      Refuse(value, Named(key),
              "unknown parameter; " + std::string(operation.name) + " takes " + ParametersOf(operation));
     }
     const auto reader = std::find_if(readers.begin(), readers.end(),

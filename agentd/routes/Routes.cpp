@@ -13,6 +13,7 @@
 #include "agentd/routes/Metrics.h"
 #include "agentd/routes/Operations.h"
 #include "agentd/routes/Permission.h"
+#include "agentd/routes/Refusals.h"
 #include "agentd/routes/RequestReader.h"
 #include "agentd/routes/SoapAnswer.h"
 #include "agentd/routes/SoapEndpoint.h"
@@ -32,6 +33,7 @@ using Host::ManagementApi;
 
 constexpr std::string_view jsonType = "application/json";
 constexpr std::string_view xmlType = "text/xml";
+constexpr std::string_view jsonFolder = "/api/v1";  // whoever may throw is below it
 
 // A request on its way: who serves it, what was asked, and the way back. Gone when it is served; an answer
 // that comes later keeps what it needs.
@@ -46,13 +48,18 @@ struct Call {
   std::string_view rest;  // of the path, behind the route's
 };
 
+void Refuse(const Call& call, unsigned status, const std::string& reason, const std::string& argument = {}) {
+  call.responder.Answer(RefusalAt(call.target.path, status, reason, argument));
+}
+
 // Refuses every parameter of the target but `known`. Whether the request may go on.
 bool HasOnly(std::string_view known, const Call& call) {
   for (const auto& [name, value] : call.target.parameters) {
     if (name != known) {
-      call.responder.Answer(PlainText(
-          400, "unknown parameter '" + Shown(name) + "'" +
-                   (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'")));
+      Refuse(call, 400,
+             "unknown parameter '" + Shown(name) + "'" +
+                 (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'"),
+             Shown(name));
       return false;
     }
   }
@@ -65,7 +72,7 @@ HttpAnswer Made(const Make& make) {
   try {
     return make();
   } catch (const Orbis::ParseException& refused) {
-    return PlainText(400, refused.what());
+    return RefusalAt(jsonFolder, refused);
   } catch (const Orbis::MethodFault::Exception& refused) {
     return ToHttp(Host::Answer{.result = nullptr, .fault = refused.GetFault()});
   } catch (const std::exception& mistake) {
@@ -153,9 +160,11 @@ void GetTasks(const Call& call) {
 }
 
 void GetTask(const Call& call) {
-  const std::optional<Task> task = call.tasks.Find(std::string(call.rest));
-  call.responder.Answer(task ? DescribeTask(200, *task)
-                             : PlainText(404, "no task of that id; those that ended long ago are forgotten"));
+  if (const std::optional<Task> task = call.tasks.Find(std::string(call.rest))) {
+    call.responder.Answer(DescribeTask(200, *task));
+  } else {
+    Refuse(call, 404, "no task of that id; those that ended long ago are forgotten");
+  }
 }
 
 void GetHost(const Call& call) {
@@ -165,7 +174,7 @@ void GetHost(const Call& call) {
   try {
     call.responder.Answer({200, std::string(jsonType), call.api.DescribeHost()});
   } catch (const Host::HostError& unknown) {
-    call.responder.Answer(PlainText(404, unknown.what()));
+    Refuse(call, 404, unknown.what());
   }
 }
 
@@ -252,7 +261,7 @@ void Follow(const Route& route, const Call& call) {
     return;
   }
   if (!route.bodyType.empty() && !IsOfType(route.bodyType, call.request.contentType)) {
-    call.responder.Answer(PlainText(415, "the body must be " + std::string(route.bodyType)));
+    Refuse(call, 415, "the body must be " + std::string(route.bodyType));
     return;
   }
   try {
@@ -290,7 +299,8 @@ Router::~Router() = default;
 void Router::Serve(const HttpRequest& request, const HttpResponder& responder) const {
   const std::optional<HttpTarget> target = ParseTarget(request.target);
   if (!target) {
-    Counted(_metrics, "none", responder).Answer(PlainText(400, "the target holds a broken escape"));
+    Counted(_metrics, "none", responder)
+        .Answer(RefusalAt(request.target, 400, "the target holds a broken escape"));
     return;
   }
   const std::string_view path = target->path;
@@ -308,8 +318,8 @@ void Router::Serve(const HttpRequest& request, const HttpResponder& responder) c
     pathKnown = true;
   }
   Counted(_metrics, "none", responder)
-      .Answer(pathKnown ? PlainText(405, "that method is not served here")
-                        : PlainText(404, "nothing is served here"));
+      .Answer(pathKnown ? RefusalAt(path, 405, "that method is not served here")
+                        : RefusalAt(path, 404, "nothing is served here"));
 }
 
 }  // namespace Agentd

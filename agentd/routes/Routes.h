@@ -18,9 +18,11 @@
 // has "task", its id. With "wait": false the answer is the task as it was taken on, with 202.
 //
 //   200  there is a result, perhaps beside a fault; or neither: done, nothing to say
-//   400  a request that cannot be read (text), or an InvalidArgument
-//   403  NotPermitted        404, 405, 415  the path, the method or the type of the body (text)
+//   400  InvalidArgument, also for what cannot be read
+//   403  NotPermitted        404, 405, 415  the path, the method or the type of the body: an InvalidArgument
 //   500  any other fault, and every SOAP fault     503            Busy, with Retry-After
+//
+// Outside of /api/v1 a refusal is a line of text.
 //
 // A request takes the role read, or change if it changes something; /healthz takes none. A client without the
 // role is answered with NotPermitted.

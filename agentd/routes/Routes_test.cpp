@@ -40,7 +40,7 @@ class Routes : public testing::Test {
 TEST_F(Routes, HealthIsOkAndTellsTheVersionToThoseWhoMayRead) {
   const HttpAnswer answer = Get("/healthz");
   EXPECT_EQ(answer.status, 200u);
-  EXPECT_EQ(answer.contentType, "text/plain");
+  EXPECT_EQ(answer.contentType, "text/plain; charset=utf-8");
   EXPECT_EQ(answer.body, "ok\nagentd " + Host::VersionLine() + "\n");
   const auto handler = [this](const HttpRequest& asked, const HttpResponder& responder) {
     _router.Serve(asked, responder);
@@ -136,8 +136,8 @@ TEST_F(Routes, AnUnknownParameterIsRefusedByName) {
   const HttpAnswer inBody = Query(R"({"name": []})");
   EXPECT_EQ(inBody.status, 400u);
   EXPECT_THAT(inBody.body, HasSubstr("name"));
-  EXPECT_THAT(Get("/api/v1/disks?a%1b%0ab=1").body, HasSubstr("'a\\x1b\\x0ab'"));
-  EXPECT_THAT(Query(R"({"a\u001bb": []})").body, HasSubstr("a\\x1bb, line 1: unknown parameter"));
+  EXPECT_THAT(Get("/api/v1/disks?a%1b%0ab=1").body, HasSubstr(R"('a\\x1b\\x0ab')"));
+  EXPECT_THAT(Query(R"({"a\u001bb": []})").body, HasSubstr(R"(a\\x1bb, line 1: unknown parameter)"));
   EXPECT_EQ(FakeHooks::calls, 0);
 }
 

@@ -33,7 +33,7 @@ struct Place {
     if (index != noIndex) {
       return path + "[" + std::to_string(index) + "]";
     }
-    return path + (path.empty() ? "" : ".") + std::string(name);
+    return path + (path.empty() ? "" : ".") + (name.empty() ? "''" : std::string(name));
   }
 };
 

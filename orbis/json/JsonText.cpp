@@ -53,6 +53,13 @@ class LineCounter {
   Progress* _progress;
 };
 
+// The library's words, which end in all that it read of a broken value, perhaps in the middle of a character.
+std::string Readable(std::string_view words) {
+  constexpr std::size_t most = 200;
+  const Library cut(std::string(Excerpt(words, most)));
+  return Library::parse(cut.dump(-1, ' ', false, Library::error_handler_t::replace)).get<std::string>();
+}
+
 // Builds the tree from the library's events and refuses what passes the limits.
 class Builder final : public Library::json_sax_t {
  public:
@@ -107,7 +114,7 @@ class Builder final : public Library::json_sax_t {
     const std::size_t place = text.find("column ");
     const std::string_view mark = place == std::string::npos ? "] " : ": ";
     const std::size_t reason = text.find(mark, place == std::string::npos ? 0 : place);
-    Refuse(reason == std::string::npos ? text : text.substr(reason + 2));
+    Refuse(Readable(reason == std::string::npos ? text : std::string_view(text).substr(reason + 2)));
   }
 
  private:

@@ -173,8 +173,8 @@ class RefusedChanges(ChangesTest):
                                       ("AddDisks", {"disks": [None]}, "disks[0]"), ("AddDisks", "{", ""),
                                       ("RemoveDisk", {"disk": "a", "optionFirst": 1 << 31}, "optionFirst")):
             status, answer = self.agent.ask("POST", "/api/v1/" + operation, body)
-            self.assertEqual(status, 400)
-            self.assertIn(told, answer)
+            self.assertEqual((status, answer["fault"]["@type"]), (400, "InvalidArgument"))
+            self.assertIn(told, answer["fault"]["faultMessage"][0]["message"])
         self.assertEqual(self.agent.get("tasks"), (200, {"tasks": []}))
 
 

@@ -1,0 +1,42 @@
+#include "agentd/routes/Refusals.h"
+
+#include <algorithm>
+
+#include "agentd/routes/JsonAnswers.h"
+#include "host/Refusal.h"
+#include "orbis/ParseException.h"
+#include "orbis/Types.h"
+
+namespace Agentd {
+namespace {
+
+constexpr std::string_view jsonFolder = "/api/v1";
+
+bool IsForPrograms(std::string_view path) {
+  const std::string_view rest = path.substr(std::min(jsonFolder.size(), path.size()));
+  return path.substr(0, jsonFolder.size()) == jsonFolder &&
+         (rest.empty() || rest.front() == '/' || rest.front() == '?');
+}
+
+}  // namespace
+
+HttpAnswer RefusalAt(std::string_view path, unsigned status, const std::string& reason,
+                     const std::string& argument) {
+  if (!IsForPrograms(path)) {
+    return PlainText(status, reason);
+  }
+  const auto fault = Tessa::MakeRef<Orbis::Fault::InvalidArgument>();
+  if (!argument.empty()) {
+    fault->SetArgument(argument);
+  }
+  Host::Explain(*fault, Host::invalidArgumentKey, reason);
+  HttpAnswer http = ToHttp(Host::Answer{.result = nullptr, .fault = fault});
+  http.status = status;
+  return http;
+}
+
+HttpAnswer RefusalAt(std::string_view path, const Orbis::ParseException& refused) {
+  return RefusalAt(path, 400, refused.what(), refused.GetPath());
+}
+
+}  // namespace Agentd

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <CLI/CLI.hpp>
+#include <chrono>
 #include <csignal>
 #include <cstdio>
 #include <cstdlib>
@@ -22,7 +23,8 @@
 
 namespace {
 
-constexpr int unfinishedStatus = 1;  // stopped while requests were still handled
+constexpr std::chrono::seconds lastQueryTime(10);  // for a query at work that no client waits for
+constexpr int unfinishedStatus = 1;                // stopped while requests were still handled
 
 struct Options {
   Host::RuntimeOptions runtime;
@@ -104,7 +106,7 @@ void Serve(Options& options) {
   }
   const bool isDrained = server.Run();
   tasks.Finish();  // whatever the time: a change is never left in its middle
-  if (!isDrained) {
+  if (!isDrained || !router.WaitUntilIdle(lastQueryTime)) {
     // A handler hangs, and may never come back: nothing that it could still use is taken down.
     Log(LogLevel::Warning, "Stopped with requests unfinished");
     Host::FlushLogs();

@@ -1,5 +1,6 @@
 #include "host/Answer.h"
 
+#include "nox/Kova.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
 #include "orbis/Soap.h"
@@ -37,7 +38,35 @@ void AppendOrNull(const Ref<T>& value, std::string& out) {
   }
 }
 
+using GroupResults = Orbis::DataArray<Nox::Kova::Host::DiskMapResult>;
+
+bool HoldsNothing(const Ref<Orbis::Any>& result) {
+  const auto* const list = dynamic_cast<const Orbis::DataArrayBase*>(result.Get());
+  return !result || (list != nullptr && list->IsEmpty());
+}
+
 }  // namespace
+
+bool IsFaultAlone(const Answer& answer) {
+  return answer.fault && HoldsNothing(answer.result);
+}
+
+Outcome OutcomeOf(const Answer& answer) {
+  if (IsFaultAlone(answer)) {
+    return Outcome::Failed;
+  }
+  const auto* const groups = dynamic_cast<const GroupResults*>(answer.result.Get());
+  if (groups != nullptr && !groups->IsEmpty()) {
+    std::size_t failed = 0;
+    for (const Nox::Kova::Host::DiskMapResult* group : *groups) {
+      failed += group->GetError() ? 1 : 0;
+    }
+    if (failed != 0) {
+      return failed == groups->Size() ? Outcome::Failed : Outcome::Partly;
+    }
+  }
+  return answer.fault ? Outcome::Partly : Outcome::Done;
+}
 
 Answer Read(const WrittenAnswer& answer) {
   try {

@@ -4,6 +4,7 @@
 #include <string>
 #include <string_view>
 
+#include "host/Outcome.h"
 #include "orbis/Any.h"
 #include "orbis/Types.h"
 
@@ -19,6 +20,13 @@ struct WrittenAnswer {
   std::string result;                    // a SOAP text; empty: none
   Tessa::Ref<Orbis::MethodFault> fault;  // null: none
 };
+
+// Whether it is a fault and nothing else: without a result, or with a list that holds nothing.
+bool IsFaultAlone(const Answer& answer);
+
+// Failed: a fault alone, or each disk group of the request failed. Partly: a fault beside a result, or some
+// of the groups failed.
+Outcome OutcomeOf(const Answer& answer);
 
 // A result that cannot be read, which would be a mistake of the plug-in, becomes a SystemError.
 Answer Read(const WrittenAnswer& answer);

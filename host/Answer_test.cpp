@@ -129,5 +129,55 @@ TEST(Answer, ThatFailedIsASystemErrorWithTheReason) {
   EXPECT_EQ(dynamic_cast<const SystemError&>(*answer.fault).GetReason(), "the cable is out");
 }
 
+// A disk group of a request, and whether it failed.
+Ref<DataArray<Nox::Kova::Host::DiskMapResult>> Groups(const std::vector<bool>& failed) {
+  const auto groups = MakeRef<DataArray<Nox::Kova::Host::DiskMapResult>>();
+  for (const bool hasFailed : failed) {
+    const auto group = MakeRef<Nox::Kova::Host::DiskMapResult>();
+    if (hasFailed) {
+      group->SetError(MakeRef<SystemError>("no"));
+    }
+    groups->Append(group);
+  }
+  return groups;
+}
+
+TEST(Outcome, IsFailedWithAFaultAlone) {
+  const auto fault = MakeRef<SystemError>("no");
+  for (const Answer& answer :
+       {Answer{.result = nullptr, .fault = fault}, Answer{.result = Groups({}), .fault = fault}}) {
+    EXPECT_TRUE(IsFaultAlone(answer));
+    EXPECT_EQ(OutcomeOf(answer), Outcome::Failed);
+  }
+}
+
+TEST(Outcome, IsPartlyWithAFaultBesideAResult) {
+  const Answer answer{.result = OneDisk(), .fault = MakeRef<SystemError>("no")};
+  EXPECT_FALSE(IsFaultAlone(answer));
+  EXPECT_EQ(OutcomeOf(answer), Outcome::Partly);
+  EXPECT_EQ(OutcomeOf({.result = Groups({false}), .fault = answer.fault}), Outcome::Partly);
+}
+
+TEST(Outcome, GoesByTheGroupsOfAChange) {
+  EXPECT_EQ(OutcomeOf({.result = Groups({false, false}), .fault = nullptr}), Outcome::Done);
+  EXPECT_EQ(OutcomeOf({.result = Groups({true, false}), .fault = nullptr}), Outcome::Partly);
+  EXPECT_EQ(OutcomeOf({.result = Groups({true, true}), .fault = nullptr}), Outcome::Failed);
+  EXPECT_EQ(OutcomeOf({.result = Groups({true}), .fault = MakeRef<SystemError>("no")}), Outcome::Failed);
+}
+
+TEST(Outcome, IsDoneWithoutAFault) {
+  for (const Answer& answer : {Answer{}, Answer{.result = OneDisk(), .fault = nullptr},
+                               Answer{.result = Groups({}), .fault = nullptr}}) {
+    EXPECT_FALSE(IsFaultAlone(answer));
+    EXPECT_EQ(OutcomeOf(answer), Outcome::Done);
+  }
+}
+
+TEST(Outcome, HasAName) {
+  EXPECT_EQ(NameOf(Outcome::Done), "done");
+  EXPECT_EQ(NameOf(Outcome::Partly), "partly");
+  EXPECT_EQ(NameOf(Outcome::Failed), "failed");
+}
+
 }  // namespace
 }  // namespace Host

@@ -184,6 +184,24 @@ TEST(AgentClient, TellsAnAgentThatLacksAnOperationFromAHostThatRefusesIt) {
   EXPECT_TRUE(AgentClient("unix:" + server.Path()).QueryDisksForKova({}).fault);
 }
 
+TEST(AgentClient, GivesAFaultWhateverItsStatus) {
+  Testing::FakeApi api;
+  TaskQueue tasks;
+  RunningServer server(Serving(api, tasks));
+  const AgentClient client("unix:" + server.Path());
+  const std::vector<Tessa::Ref<Orbis::MethodFault>> faults = {
+      Tessa::MakeRef<Nox::Fault::InsufficientDisks>("naa.1"), Tessa::MakeRef<Nox::Fault::DuplicateDisks>(),
+      Tessa::MakeRef<Nox::Fault::HostChanged>(), Tessa::MakeRef<Nox::Fault::NotPermitted>(),
+      Tessa::MakeRef<Orbis::Fault::SystemError>("no")};
+  for (const auto& fault : faults) {
+    api.answer = {.result = Tessa::MakeRef<Orbis::DataArray<Nox::Kova::Host::DiskMapResult>>(),
+                  .fault = fault};
+    const Host::Answer answer = client.AddAllEligibleDisks();
+    EXPECT_EQ(&answer.fault->GetType(), &fault->GetType());
+    EXPECT_TRUE(answer.result);
+  }
+}
+
 TEST(AgentClient, GivesAFaultOfTheAgentAsAFault) {
   const Host::KovaService service = Testing::AFakeService();
   TaskQueue tasks;

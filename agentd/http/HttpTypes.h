@@ -6,6 +6,8 @@
 #include <string>
 #include <string_view>
 
+#include "host/Outcome.h"
+
 namespace Agentd {
 
 // What a client may ask for. Each role includes those before it.
@@ -41,6 +43,8 @@ struct HttpAnswer {
   std::string contentType = "application/json";
   std::string body;
   int retryAfterSeconds = 0;  // 0: the header is not sent
+  // Of what was asked for, where the status does not tell; not sent.
+  Host::Outcome outcome = Host::Outcome::Done;
 };
 
 // What a connection may cost before it is refused.

@@ -24,11 +24,14 @@ constexpr FaultStatus faultStatuses[] = {
     {&IsA<Orbis::Fault::InvalidArgument>, 400},
     {&IsA<Nox::Fault::NotPermitted>, 403},
     {&IsA<Nox::Fault::Busy>, 503},
+    {&IsA<Nox::Fault::DuplicateDisks>, 400},  // whatever the host is like
+    {&IsA<Nox::Fault::HostChanged>, 409},
+    {&IsA<Nox::Fault::KovaFault>, 409},  // the disks, as they are now, do not allow it
 };
 constexpr unsigned faultOfTheHost = 500;
 
 unsigned StatusOf(const Answer& answer) {
-  if (answer.result || !answer.fault) {
+  if (!Host::IsFaultAlone(answer)) {
     return 200;
   }
   for (const FaultStatus& row : faultStatuses) {
@@ -42,6 +45,7 @@ unsigned StatusOf(const Answer& answer) {
 HttpAnswer WithStatusOf(const Answer& answer) {
   HttpAnswer http;
   http.status = StatusOf(answer);
+  http.outcome = Host::OutcomeOf(answer);
   if (const auto* const busy = dynamic_cast<const Nox::Fault::Busy*>(answer.fault.Get())) {
     http.retryAfterSeconds = busy->GetRetryAfterSeconds();
   }
@@ -52,6 +56,11 @@ HttpAnswer WithStatusOf(const Answer& answer) {
 
 HttpAnswer PlainText(unsigned status, const std::string& text) {
   return {status, "text/plain; charset=utf-8", text + "\n"};
+}
+
+Host::Outcome OutcomeOf(const HttpAnswer& http) {
+  constexpr unsigned firstOfFailures = 400;
+  return http.status < firstOfFailures ? http.outcome : Host::Outcome::Failed;
 }
 
 HttpAnswer ToHttp(const Answer& answer) {

@@ -12,8 +12,11 @@ namespace Agentd {
 
 HttpAnswer PlainText(unsigned status, const std::string& text);
 
-// {"result": .., "fault": ..}; with the status that the fault alone would have. 200 with a result, or without
-// both.
+// What the request came to: Failed with every status that says so, otherwise as the answer has it.
+Host::Outcome OutcomeOf(const HttpAnswer& http);
+
+// {"result": .., "fault": ..}. A fault alone, or beside an empty list, has the status of its kind; everything
+// else has 200.
 HttpAnswer ToHttp(const Host::Answer& answer);
 
 // The same of a result that is still a text.

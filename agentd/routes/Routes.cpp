@@ -9,6 +9,7 @@
 
 #include "agentd/http/HttpTarget.h"
 #include "agentd/http/Shown.h"
+#include "agentd/routes/HostWatch.h"
 #include "agentd/routes/JsonAnswers.h"
 #include "agentd/routes/Metrics.h"
 #include "agentd/routes/Operations.h"
@@ -42,6 +43,7 @@ struct Call {
   TaskQueue& tasks;
   QueryQueue& queries;
   const Metrics& metrics;
+  HostWatch& watch;
   const HttpTarget& target;
   const HttpRequest& request;
   const HttpResponder& responder;
@@ -83,7 +85,12 @@ HttpAnswer Made(const Make& make) {
 // Answers with what the query makes, once there is a place for it.
 template <class Query>
 void Ask(const Call& call, Query query) {
-  call.queries.Run([responder = call.responder, query = std::move(query)] { responder.Answer(Made(query)); });
+  call.queries.Run([responder = call.responder, query = std::move(query)] {
+    HttpAnswer made = Made(query);
+    const Host::Outcome outcome = OutcomeOf(made);
+    responder.Answer(std::move(made));
+    return outcome;
+  });
 }
 
 void Health(const Call& call) {
@@ -95,10 +102,14 @@ void Health(const Call& call) {
 }
 
 void GetMetrics(const Call& call) {
-  if (HasOnly("", call)) {
-    call.responder.Answer({200, "text/plain; version=0.0.4; charset=utf-8",
-                           call.metrics.Text(call.tasks.Now(), call.queries.Now())});
+  if (!HasOnly("", call)) {
+    return;
   }
+  const TaskQueue::Load changes = call.tasks.Now();
+  call.responder.Answer(
+      {200, "text/plain; version=0.0.4; charset=utf-8",
+       call.metrics.Text({.changes = changes, .queries = call.queries.Now(), .host = call.watch.Last()})});
+  call.watch.Refresh(changes.ended.Total());  // for the next who asks: this answer waits for nobody
 }
 
 void GetDisks(const Call& call) {
@@ -293,8 +304,13 @@ Router::Router(const ManagementApi& api, TaskQueue& tasks, const QueryLimits& li
     : _api(api),
       _tasks(tasks),
       _queries(std::make_unique<QueryQueue>(limits)),
+      _watch(std::make_unique<HostWatch>(api, *_queries)),
       _metrics(std::make_shared<Metrics>()) {}
 Router::~Router() = default;
+
+bool Router::WaitUntilIdle(std::chrono::milliseconds patience) const {
+  return _queries->WaitUntilIdle(patience);
+}
 
 void Router::Serve(const HttpRequest& request, const HttpResponder& responder) const {
   const std::optional<HttpTarget> target = ParseTarget(request.target);
@@ -312,7 +328,7 @@ void Router::Serve(const HttpRequest& request, const HttpResponder& responder) c
     if (request.method == (route.bodyType.empty() ? "GET" : "POST")) {
       const std::string_view rest = path.substr(route.path.size());
       const HttpResponder counted = Counted(_metrics, NameOf(route, rest), responder);
-      Follow(route, {_api, _tasks, *_queries, *_metrics, *target, request, counted, rest});
+      Follow(route, {_api, _tasks, *_queries, *_metrics, *_watch, *target, request, counted, rest});
       return;
     }
     pathKnown = true;

@@ -18,11 +18,13 @@
 // has "task", its id. With "wait": false the answer is the task as it was taken on, with 202.
 //
 //   200  there is a result, perhaps beside a fault; or neither: done, nothing to say
-//   400  InvalidArgument, also for what cannot be read
+//   400  InvalidArgument, also for what cannot be read; DuplicateDisks
 //   403  NotPermitted        404, 405, 415  the path, the method or the type of the body: an InvalidArgument
-//   500  any other fault, and every SOAP fault     503            Busy, with Retry-After
+//   409  HostChanged, and other faults of the storage service: the host, as it is, does not allow it
+//   500  SystemError, and every SOAP fault         503            Busy, with Retry-After
 //
-// Outside of /api/v1 a refusal is a line of text.
+// Those from 400 on are for a fault alone, or beside an empty list. Outside of /api/v1 a refusal is a line of
+// text.
 //
 // A request takes the role read, or change if it changes something; /healthz takes none. A client without the
 // role is answered with NotPermitted.
@@ -33,6 +35,7 @@
 // here.
 #pragma once
 
+#include <chrono>
 #include <memory>
 
 #include "agentd/http/HttpResponder.h"
@@ -45,6 +48,7 @@ class ManagementApi;
 
 namespace Agentd {
 
+class HostWatch;
 class Metrics;
 class TaskQueue;
 
@@ -57,10 +61,14 @@ class Router {
   // Threads: any. Throws nothing that a client could bring about.
   void Serve(const HttpRequest& request, const HttpResponder& responder) const;
 
+  // Waits until no query is at work, not even one that nobody waits for; whether that came about in time.
+  bool WaitUntilIdle(std::chrono::milliseconds patience) const;
+
  private:
   const Host::ManagementApi& _api;
   TaskQueue& _tasks;
   const std::unique_ptr<QueryQueue> _queries;
+  const std::unique_ptr<HostWatch> _watch;
   const std::shared_ptr<Metrics> _metrics;  // answers that come late are still counted
 };
 

@@ -71,11 +71,6 @@ constexpr std::array<Row, 10> rows = {{
     {"ClaimUnmountedDiskgroup", &Respond<Op::ClaimUnmountedDiskgroupResponse>},
 }};
 
-bool IsNothing(const Ref<Orbis::Any>& result) {
-  const auto* const list = dynamic_cast<const Orbis::DataArrayBase*>(result.Get());
-  return !result || (list != nullptr && list->IsEmpty());
-}
-
 // Whose the fault is: the host's, or the request's.
 const char* CodeOf(const MethodFault& fault) {
   const bool server = dynamic_cast<const Orbis::Fault::SystemError*>(&fault) != nullptr ||
@@ -103,10 +98,11 @@ HttpAnswer TypedFault(const MethodFault& fault, std::string_view task = {}) {
 }
 
 HttpAnswer ToSoap(std::string_view operation, const Told& told) {
-  if (told.answer.fault && IsNothing(told.answer.result)) {
+  if (Host::IsFaultAlone(told.answer)) {
     return TypedFault(*told.answer.fault, told.task);
   }
   HttpAnswer http = Xml(200);
+  http.outcome = Host::OutcomeOf(told.answer);
   for (const Row& row : rows) {
     if (row.operation == operation) {
       const Ref<Orbis::DataObject> response = row.respond(told);

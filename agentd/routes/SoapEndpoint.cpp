@@ -54,7 +54,12 @@ void Ask(const SoapService& service, SoapRequest& read, const HttpResponder& res
     return operation.callWritten != nullptr ? ToSoap(operation.name, operation.callWritten(api, arguments))
                                             : ToSoap(operation.name, operation.call(api, arguments));
   };
-  service.queries.Run([answer = std::move(answer), responder] { responder.Answer(Made(answer)); });
+  service.queries.Run([answer = std::move(answer), responder] {
+    HttpAnswer made = Made(answer);
+    const Host::Outcome outcome = OutcomeOf(made);
+    responder.Answer(std::move(made));
+    return outcome;
+  });
 }
 
 }  // namespace

@@ -11,6 +11,7 @@
 #include "agentd/testing/FakeApi.h"
 #include "agentd/testing/RunningServer.h"
 #include "nox/Faults.h"
+#include "nox/Kova.h"
 #include "orbis/json/JsonText.h"
 
 namespace Agentd {
@@ -89,7 +90,14 @@ TEST_F(TaskRoutes, AFaultAloneHasItsStatus) {
   _api.answer.fault = Tessa::MakeRef<Nox::Fault::NotPermitted>();
   EXPECT_EQ(Post("ClaimUnmountedDiskgroup", "{}").status, 403u);
   _api.answer.fault = Tessa::MakeRef<Nox::Fault::DiskHasPartitions>("naa.1");
-  EXPECT_EQ(Post("AddDisks", R"({"disks": []})").status, 500u);
+  EXPECT_EQ(Post("AddDisks", R"({"disks": []})").status, 409u);
+}
+
+TEST_F(TaskRoutes, AChangeThatFailedAsAWholeIsNoSuccessThoughItHasAList) {
+  _api.answer.result = Tessa::MakeRef<Orbis::DataArray<Nox::Kova::Host::DiskMapResult>>();
+  _api.answer.fault = Tessa::MakeRef<Nox::Fault::InsufficientDisks>();
+  EXPECT_EQ(Post("AddDisks", R"({"disks": []})").status, 409u);
+  EXPECT_EQ(_tasks.List().at(0).state, TaskState::Failed);
 }
 
 TEST_F(TaskRoutes, AQueryIsNoTask) {

@@ -13,8 +13,7 @@ void QueryQueue::Run(Query query) {
     return;
   }
   do {
-    query();
-    query = Next();
+    query = Next(query());
   } while (query);
 }
 
@@ -34,10 +33,13 @@ bool QueryQueue::TakePlace(Query& query) {
   return false;
 }
 
-QueryQueue::Query QueryQueue::Next() {
+QueryQueue::Query QueryQueue::Next(Host::Outcome ofTheLast) {
   const std::lock_guard guard(_mutex);
+  _ended.Add(ofTheLast);
   if (_waiting.empty()) {
-    --_running;
+    if (--_running == 0) {
+      _idle.notify_all();
+    }
     return {};
   }
   Query next = std::move(_waiting.front());
@@ -47,7 +49,12 @@ QueryQueue::Query QueryQueue::Next() {
 
 QueryQueue::Load QueryQueue::Now() const {
   const std::lock_guard guard(_mutex);
-  return {_running, _waiting.size()};
+  return {_running, _waiting.size(), _ended};
+}
+
+bool QueryQueue::WaitUntilIdle(std::chrono::milliseconds patience) {
+  std::unique_lock lock(_mutex);
+  return _idle.wait_for(lock, patience, [this] { return _running == 0; });
 }
 
 }  // namespace Agentd

@@ -7,10 +7,14 @@
 // Threads: every function from any thread.
 #pragma once
 
+#include <chrono>
+#include <condition_variable>
 #include <cstddef>
 #include <deque>
 #include <functional>
 #include <mutex>
+
+#include "agentd/tasks/OutcomeCounts.h"
 
 namespace Agentd {
 
@@ -21,8 +25,8 @@ struct QueryLimits {
 
 class QueryQueue {
  public:
-  // Must not throw.
-  using Query = std::function<void()>;
+  // Tells what it came to. Must not throw.
+  using Query = std::function<Host::Outcome()>;
 
   explicit QueryQueue(const QueryLimits& limits = {}) : _limits(limits) {}
 
@@ -33,17 +37,23 @@ class QueryQueue {
   struct Load {
     std::size_t running = 0;
     std::size_t waiting = 0;
+    OutcomeCounts ended = {};  // since the queue was made
   };
   Load Now() const;
+
+  // Waits until none runs; whether that came about in time.
+  bool WaitUntilIdle(std::chrono::milliseconds patience);
 
  private:
   bool TakePlace(Query& query);
   // The one that has waited longest, in the place of one that has ended; none: the place is free again.
-  Query Next();
+  Query Next(Host::Outcome ofTheLast);
 
   const QueryLimits _limits;
   mutable std::mutex _mutex;  // guards what follows
+  std::condition_variable _idle;
   std::size_t _running = 0;
+  OutcomeCounts _ended;
   std::deque<Query> _waiting;
 };
 

@@ -17,11 +17,19 @@ using testing::ElementsAre;
 using Testing::Gate;
 using testing::IsEmpty;
 
+// A query that does this and comes to that.
+QueryQueue::Query Done(std::function<void()> work, Host::Outcome outcome = Host::Outcome::Done) {
+  return [work = std::move(work), outcome] {
+    work();
+    return outcome;
+  };
+}
+
 // A query that runs on a thread of its own until it is let go.
 class SlowQuery {
  public:
   explicit SlowQuery(QueryQueue& queue)
-      : _run(std::async(std::launch::async, [this, &queue] { queue.Run([this] { _gate.Enter(); }); })) {
+      : _run(std::async(std::launch::async, [this, &queue] { queue.Run(Done([this] { _gate.Enter(); })); })) {
     _gate.WaitUntilEntered();
   }
   void LetGo() {
@@ -37,7 +45,7 @@ class SlowQuery {
 TEST(QueryQueue, RunsAQueryOnTheCallingThread) {
   QueryQueue queue;
   std::thread::id thread;
-  queue.Run([&thread] { thread = std::this_thread::get_id(); });
+  queue.Run(Done([&thread] { thread = std::this_thread::get_id(); }));
   EXPECT_EQ(thread, std::this_thread::get_id());
   EXPECT_EQ(queue.Now().running, 0u);
 }
@@ -47,8 +55,8 @@ TEST(QueryQueue, AQueryThatFindsNoPlaceHoldsUpNobody) {
   SlowQuery first(queue);
   SlowQuery second(queue);
   std::vector<int> ran;
-  queue.Run([&ran] { ran.push_back(1); });
-  queue.Run([&ran] { ran.push_back(2); });
+  queue.Run(Done([&ran] { ran.push_back(1); }));
+  queue.Run(Done([&ran] { ran.push_back(2); }));
   EXPECT_THAT(ran, IsEmpty());
   EXPECT_EQ(queue.Now().running, 2u);
   EXPECT_EQ(queue.Now().waiting, 2u);
@@ -64,8 +72,8 @@ TEST(QueryQueue, AQueryThatFindsNoPlaceHoldsUpNobody) {
 TEST(QueryQueue, APlaceThatHasBecomeFreeIsTaken) {
   QueryQueue queue({.atOnce = 1, .waiting = 1});
   int ran = 0;
-  queue.Run([&ran] { ++ran; });
-  queue.Run([&ran] { ++ran; });
+  queue.Run(Done([&ran] { ++ran; }));
+  queue.Run(Done([&ran] { ++ran; }));
   EXPECT_EQ(ran, 2);
 }
 
@@ -73,9 +81,9 @@ TEST(QueryQueue, MoreThanMayWaitAreRefusedAndNotRun) {
   QueryQueue queue({.atOnce = 1, .waiting = 1});
   SlowQuery slow(queue);
   int ran = 0;
-  queue.Run([&ran] { ++ran; });
+  queue.Run(Done([&ran] { ++ran; }));
   try {
-    queue.Run([&ran] { ran += 10; });
+    queue.Run(Done([&ran] { ran += 10; }));
     FAIL() << "it was taken on";
   } catch (const Nox::Fault::Busy::Exception& refused) {
     const auto& busy = dynamic_cast<const Nox::Fault::Busy&>(*refused.GetFault());
@@ -98,6 +106,7 @@ TEST(QueryQueue, RunsAtMostSoManyAtOnceWhoeverAsks) {
     std::this_thread::yield();
     --running;
     ++ran;
+    return Host::Outcome::Done;
   };
   std::vector<std::future<void>> clients;
   for (int client = 0; client < 8; ++client) {
@@ -112,6 +121,27 @@ TEST(QueryQueue, RunsAtMostSoManyAtOnceWhoeverAsks) {
   }
   EXPECT_EQ(ran, 8 * queries) << "whoever ends runs those that wait, so none is left";
   EXPECT_EQ(tooMany, 0);
+}
+
+TEST(QueryQueue, CountsWhatQueriesCameTo) {
+  QueryQueue queue;
+  queue.Run(Done([] {}));
+  queue.Run(Done([] {}, Host::Outcome::Failed));
+  queue.Run(Done([] {}));
+  const OutcomeCounts ended = queue.Now().ended;
+  EXPECT_EQ(ended.Of(Host::Outcome::Done), 2u);
+  EXPECT_EQ(ended.Of(Host::Outcome::Partly), 0u);
+  EXPECT_EQ(ended.Of(Host::Outcome::Failed), 1u);
+}
+
+TEST(QueryQueue, IsIdleWhenTheLastQueryHasEnded) {
+  QueryQueue queue;
+  EXPECT_TRUE(queue.WaitUntilIdle(std::chrono::milliseconds(0)));
+  SlowQuery slow(queue);
+  EXPECT_FALSE(queue.WaitUntilIdle(std::chrono::milliseconds(0)));
+  auto idle = std::async(std::launch::async, [&queue] { return queue.WaitUntilIdle(std::chrono::hours(1)); });
+  slow.LetGo();
+  EXPECT_TRUE(idle.get());
 }
 
 }  // namespace

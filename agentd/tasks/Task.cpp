@@ -34,8 +34,13 @@ void AppendValue(const char* key, const Orbis::Any* value, std::string& out) {
 }  // namespace
 
 const char* NameOf(TaskState state) {
-  static constexpr std::array<const char*, 4> names = {"waiting", "running", "done", "failed"};
+  static constexpr std::array<const char*, 5> names = {"waiting", "running", "done", "partly", "failed"};
   return names.at(static_cast<std::size_t>(state));
+}
+
+TaskState StateAfter(Host::Outcome outcome) {
+  static constexpr std::array<TaskState, 3> states = {TaskState::Done, TaskState::Partly, TaskState::Failed};
+  return states.at(static_cast<std::size_t>(outcome));
 }
 
 void WriteJson(const Task& task, bool withResult, std::string& out) {

@@ -12,9 +12,13 @@ namespace Agentd {
 enum class TaskState {
   Waiting,  // for the requests before it
   Running,
-  Done,    // answered without a fault
-  Failed,  // answered with one, perhaps beside a result
+  Done,  // and the others: it has ended, with that outcome
+  Partly,
+  Failed,
 };
+
+// The state of one that has ended.
+TaskState StateAfter(Host::Outcome outcome);
 
 struct Task {
   std::string id;     // made by the agent; the kernel knows the request by it
@@ -30,7 +34,7 @@ struct Task {
   bool resultForgotten = false;  // the answer had a result, which was too large to be kept for long
 };
 
-// "waiting", "running", "done", "failed".
+// "waiting", "running", "done", "partly", "failed".
 const char* NameOf(TaskState state);
 
 // Appends the task as a JSON object; `withResult` for the result of one that has ended, which may be long.

@@ -121,10 +121,7 @@ TaskQueue::Load TaskQueue::Now() const {
   const std::lock_guard guard(_mutex);
   const auto isRunning = [](const auto& entry) { return entry->task.state == TaskState::Running; };
   const auto running = std::count_if(_entries.begin(), _entries.end(), isRunning);
-  return {.waiting = _waiting.size(),
-          .running = static_cast<std::size_t>(running),
-          .done = _done,
-          .failed = _failed};
+  return {.waiting = _waiting.size(), .running = static_cast<std::size_t>(running), .ended = _ended};
 }
 
 void TaskQueue::Close() {
@@ -192,10 +189,11 @@ void TaskQueue::End(Entry& entry, Host::Answer answer) {
   Listener onEnded;
   Task ended;
   const std::size_t resultBytes = SizeOf(answer.result);
+  const Host::Outcome outcome = Host::OutcomeOf(answer);
   {
     const std::lock_guard guard(_mutex);
-    entry.task.state = answer.fault ? TaskState::Failed : TaskState::Done;
-    ++(answer.fault ? _failed : _done);
+    entry.task.state = StateAfter(outcome);
+    _ended.Add(outcome);
     entry.task.ended = _clock();
     entry.task.answer = std::move(answer);
     entry.work = {};  // and what it holds of the request

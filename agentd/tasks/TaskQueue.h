@@ -17,6 +17,7 @@
 #include <thread>
 #include <vector>
 
+#include "agentd/tasks/OutcomeCounts.h"
 #include "agentd/tasks/Task.h"
 
 namespace Agentd {
@@ -57,9 +58,8 @@ class TaskQueue {
 
   struct Load {
     std::size_t waiting = 0;
-    std::size_t running = 0;  // 0 or 1
-    std::size_t done = 0;     // since the queue was made; without a fault
-    std::size_t failed = 0;   // with one
+    std::size_t running = 0;   // 0 or 1
+    OutcomeCounts ended = {};  // since the queue was made
   };
   Load Now() const;
 
@@ -92,8 +92,7 @@ class TaskQueue {
   std::deque<std::shared_ptr<Entry>> _entries;  // in order of creation
   std::deque<std::shared_ptr<Entry>> _waiting;
   std::size_t _created = 0;
-  std::size_t _done = 0;
-  std::size_t _failed = 0;
+  OutcomeCounts _ended;
   std::size_t _waitingBytes = 0;
   std::size_t _resultBytes = 0;  // of all entries
   bool _closed = false;

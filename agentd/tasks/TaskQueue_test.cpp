@@ -71,6 +71,19 @@ TEST(TaskQueue, CarriesATaskOutAndKeepsItsAnswer) {
   EXPECT_EQ(Await(queue, &Nothing).state, TaskState::Done);
 }
 
+TEST(TaskQueue, TellsAPartFromTheWholeInStatesAndCounts) {
+  TaskQueue queue;
+  const auto texts = Tessa::MakeRef<Orbis::TextList>(std::vector<std::string>{"a"});
+  Await(queue, &Nothing);
+  Await(queue, [texts]() -> Answer { return {.result = texts, .fault = Host::FailedWith("b").fault}; });
+  Await(queue, [] { return Host::FailedWith("no luck"); });
+  EXPECT_THAT(States(queue), ElementsAre("Op done", "Op partly", "Op failed"));
+  const OutcomeCounts ended = queue.Now().ended;
+  for (const Host::Outcome outcome : OutcomeCounts::all) {
+    EXPECT_EQ(ended.Of(outcome), 1u) << Host::NameOf(outcome);
+  }
+}
+
 TEST(TaskQueue, TellsWhatItTookOn) {
   TaskQueue queue;
   const Task task = queue.Submit("AddDisks", "mine", &Nothing);

@@ -60,10 +60,17 @@ TEST(Task, ThatHasEndedCarriesItsAnswer) {
   EXPECT_TRUE(Json(task).find(R"("result":null,"resultForgotten":true,"fault":null})") != std::string::npos);
 }
 
+TEST(Task, EndsInTheStateOfItsOutcome) {
+  for (const Host::Outcome outcome : {Host::Outcome::Done, Host::Outcome::Partly, Host::Outcome::Failed}) {
+    EXPECT_EQ(NameOf(StateAfter(outcome)), Host::NameOf(outcome));
+  }
+}
+
 TEST(Task, StatesHaveNames) {
   EXPECT_STREQ(NameOf(TaskState::Waiting), "waiting");
   EXPECT_STREQ(NameOf(TaskState::Running), "running");
   EXPECT_STREQ(NameOf(TaskState::Done), "done");
+  EXPECT_STREQ(NameOf(TaskState::Partly), "partly");
   EXPECT_STREQ(NameOf(TaskState::Failed), "failed");
 }
 

@@ -18,7 +18,9 @@ namespace Agentd::Testing {
 class FakeApi final : public Host::ManagementApi {
  public:
   // Set before the operation is called.
-  Host::Answer answer;             // of every operation
+  Host::Answer answer;  // of every operation
+  // Instead of it, where the answers differ; is given the operation as Asked lists it.
+  std::function<Host::Answer(const std::string& asked)> answerTo;
   std::function<void()> onChange;  // called first by every operation that changes disks; may wait or throw
   std::function<void()> onQuery;   // the same by every other
   std::string description;         // empty: the host is not simulated
@@ -75,7 +77,7 @@ class FakeApi final : public Host::ManagementApi {
   Host::Answer Note(const std::string& asked) const {
     const std::lock_guard guard(_mutex);
     _asked.push_back(asked);
-    return answer;
+    return answerTo ? answerTo(asked) : answer;
   }
   Host::Answer Change(const std::string& asked) const {
     if (onChange) {

@@ -156,13 +156,13 @@ class RefusedChanges(ChangesTest):
     def test_of_what_the_plug_in_itself_refuses_are_faults_too(self):
         process = self.serve(HOST)
         self.done("AddDisks", disks=["naa.s1", "naa.h1"])
-        self.refused(500, "DiskIsLastRemainingNonSSD", "RemoveDisk", disk="naa.h1")
+        self.refused(409, "DiskIsLastRemainingNonSSD", "RemoveDisk", disk="naa.h1")
         self.refused(400, "InvalidArgument", "RemoveDiskMapping", mapping={"ssd": "naa.s1", "nonSsd": ["naa.x"]})
         self.refused(400, "InvalidArgument", "RemoveDiskMapping", mapping={"ssd": "naa.s1"})
         status, answer = self.agent.post("UnmountDiskMapping", mappings=[{"ssd": "naa.x", "nonSsd": ["naa.y"]}])
         self.assertEqual((status, answer["result"][0]["error"]["@type"]), (200, "InvalidArgument"))
         status, answer = self.agent.post("AddDisks", disks=[])
-        self.assertEqual((status, answer["result"], answer["fault"]["@type"]), (200, [], "InsufficientDisks"))
+        self.assertEqual((status, answer["result"], answer["fault"]["@type"]), (409, [], "InsufficientDisks"))
         for name in ("kova:", "kova:" + LOST_UUID, "KOVA:" + LOST_UUID, "kova:" + LOST_UUID + "0", "../x", "--x"):
             self.assertEqual(self.agent.post("RemoveDisk", disk=name)[0], 500, name)
         self.assertIsNone(process.poll())

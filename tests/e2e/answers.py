@@ -7,7 +7,8 @@ from lxml import etree
 
 ENVELOPE = "{http://schemas.xmlsoap.org/soap/envelope/}"
 API = "{urn:nox}"
-FAULT_STATUSES = {"InvalidArgument": 400, "NotPermitted": 403, "Busy": 503}  # any other: 500
+FAULT_STATUSES = {"InvalidArgument": 400, "DuplicateDisks": 400, "NotPermitted": 403, "Busy": 503, "SystemError": 500}
+OTHER_FAULT = 409  # the disks, as they are now, do not allow it
 MAPPING_RESULTS = ("AddDisks", "AddAllEligibleDisks", "InitializeDisks", "UnmountDiskMapping")
 # Operations that may end with neither result nor fault.
 SILENT = ("AddAllEligibleDisks", "RemoveDisk", "RemoveDiskMapping", "ClaimUnmountedDiskgroup")
@@ -47,8 +48,9 @@ class Checker:
             return Answer(None)
         demand(set(answer) - {"task"} == {"result", "fault"}, f"the answer has {list(answer)}")
         read = self.read(operation, answer)
-        failed = read.fault is not None and answer["result"] is None
-        demand(status == (FAULT_STATUSES.get(read.fault, 500) if failed else 200), f"{status} with {read.fault}")
+        failed = read.fault is not None and not answer["result"]
+        wanted = FAULT_STATUSES.get(read.fault, OTHER_FAULT) if failed else 200
+        demand(status == wanted, f"{status} with {read.fault}")
         return read
 
     def read(self, operation, answer):

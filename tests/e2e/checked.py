@@ -64,8 +64,8 @@ class CheckedTest(ProgramTest):
 
     def ended(self, task):
         """The task when it has ended."""
-        described = {"state": ""}
-        while described["state"] not in ("done", "failed"):
+        described = {}
+        while "ended" not in described:
             described = self.agent.get("tasks/" + task)[1]
         return described
 

@@ -19,7 +19,7 @@ TASK = {
         "id": {"type": "string"},
         "label": {"type": "string", "description": "The client's own."},
         "operation": {"type": "string"},
-        "state": {"enum": ["waiting", "running", "done", "failed"]},
+        "state": {"enum": ["waiting", "running", "done", "partly", "failed"]},
         "created": SIMPLE["dateTime"],
         "started": SIMPLE["dateTime"],
         "ended": SIMPLE["dateTime"],
@@ -137,6 +137,7 @@ def responses(answer, waits=False):
         "400": {"description": "A request that cannot be read (text), or does not fit the host (fault).",
                 "content": {**content(FAULT), **PLAIN["content"]}},
         "403": {"description": "The caller's role does not allow it.", "content": content(FAULT)},
+        "409": {"description": "The host, as it is now, does not allow it.", "content": content(FAULT)},
         "500": {"description": "Any other fault.", "content": content(FAULT)},
     }
     if waits:

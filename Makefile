@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test clients check bench growth soak build format-check format asan tsan clang tidy fuzz clean
+.PHONY: help demo test clients check api-check bench growth soak build format-check format asan tsan clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -11,6 +11,7 @@ help:
 	@echo "make test    build and run every test but those of make clients"
 	@echo "make clients tests with SOAP clients whose tools are large (Java)"
 	@echo "make check   format, second compiler, clang-tidy on what changed, sanitizers, fuzzing"
+	@echo "make api-check  the OpenAPI description before two judges, and a client's types of it; needs npm"
 	@echo "make bench   benchmarks"
 	@echo "make growth  instructions per disk of planning, among few disks and among many"
 	@echo "make soak    an agent under mixed clients for SECONDS (180): its memory must stay flat"
@@ -61,6 +62,14 @@ tidy:
 	@cmake --preset dev >/dev/null
 	@cmake --build --preset dev -j $(JOBS)
 	@tools/lint/tidy_changed.sh build/dev $(BASE)
+
+# The tools come by npm, in the versions of the lock file.
+api-check:
+	@$(SETUP) build
+	@command -v npm >/dev/null || $(SETUP) api
+	@cmake --preset dev >/dev/null
+	@cmake --build --preset dev --target nox_openapi
+	@tools/openapi/check.sh build/dev/share/openapi.json build/api-check
 
 asan:
 	@$(SETUP) build test

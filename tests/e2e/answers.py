@@ -66,7 +66,10 @@ class Checker:
         if key not in self.validators:
             described = self.description["paths"]["/api/v1/" + operation]["post"]["responses"]
             demand(str(status) in described, f"status {status} is not described")
-            schema = described[str(status)]["content"]["application/json"]["schema"]
+            response = described[str(status)]
+            if "$ref" in response:
+                response = self.description["components"]["responses"][response["$ref"].rsplit("/", 1)[1]]
+            schema = response["content"]["application/json"]["schema"]
             self.validators[key] = jsonschema.Draft202012Validator(
                 {**schema, "components": self.description["components"]})
         error = next(self.validators[key].iter_errors(answer), None)

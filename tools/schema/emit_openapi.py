@@ -1,6 +1,9 @@
 """Writes the description of the agent's JSON API: OpenAPI 3.1."""
 
 import json
+import re
+
+from openapi_examples import EXAMPLES, FAULTS, WAITING
 
 SIMPLE = {
     "boolean": {"type": "boolean"},
@@ -11,6 +14,29 @@ SIMPLE = {
     "base64": {"type": "string", "contentEncoding": "base64"},
     "any": {"description": "A value that names its type: an object by @type, a simple one as {@type, @value}."},
 }
+DISK, REPORTED_DISK, STORAGE = "HostScsiDisk", "ReportedDisk", "KovaHostConfigInfoStorageInfo"
+GROUPS = "The disk groups of the host, those that are not mounted too"
+ABOUT = """Looks at the disks of a host and makes disk groups of them.
+
+Every answer of an operation is `{"result": .., "fault": ..}`. A fault without a result has a status that fits its kind;
+a result beside a fault has 200: a part failed. Changes are tasks, carried out one after the other."""
+SERVERS = [
+    {"url": "/", "description": "The agent that gave this description out: on its Unix socket, or on TCP."},
+    {"url": "https://{host}:{port}", "description": "An agent on the network.", "variables": {
+        "host": {"default": "localhost", "description": "A name that the agent goes by."},
+        "port": {"default": "9443", "description": "That it listens on."}}},
+]
+CERTIFICATE = {"type": "mutualTLS",
+               "description": "On the network, a client certificate whose name has a role. On a Unix socket the caller's "
+                              "user and groups count instead; on TCP without TLS everybody may read."}
+TAGS = {
+    "reports": "What the host is like, by GET.",
+    "operations": "The operations of the management API, by name.",
+    "tasks": "What became of changes.",
+    "simulation": "Simulated hosts only.",
+    "agent": "The agent itself.",
+}
+NOT_KNOWN = {"lunType": [""]}  # of a disk that has left
 # Read by nobody's program name, written by every request that changes disks.
 TASK = {
     "type": "object",
@@ -19,7 +45,7 @@ TASK = {
         "id": {"type": "string"},
         "label": {"type": "string", "description": "The client's own."},
         "operation": {"type": "string"},
-        "state": {"enum": ["waiting", "running", "done", "partly", "failed"]},
+        "state": {"type": "string", "enum": ["waiting", "running", "done", "partly", "failed"]},
         "created": SIMPLE["dateTime"],
         "started": SIMPLE["dateTime"],
         "ended": SIMPLE["dateTime"],
@@ -51,37 +77,67 @@ def kinds(schema, type_):
 
 
 def declared(schema, name):
-    """What may stand where a type is declared."""
+    """What may stand where a type is declared, in an answer."""
+    if name == DISK:
+        return ref(REPORTED_DISK)
     return ref(f"Any{name}" if schema.derived(schema.types[name]) else name)
 
 
-def value_of(schema, f):
+def values_of(type_, f):
+    """The values that the type's constants name for the field; none where it may hold any text.
+
+    A constant is named for its field: SCSILUNTYPE_DISK for lunType, STATE_OK for operationalState.
+    """
+    def names_field(constant):
+        prefix, name = constant.split("_")[0].lower(), f.name.lower()
+        return prefix.endswith(name) or name.endswith(prefix)
+    return [value for constant, value in type_.constants if f.type == "string" and names_field(constant)]
+
+
+def value_of(schema, f, type_=None):
     value = SIMPLE[f.type] if f.type in SIMPLE else declared(schema, f.type)
+    values = values_of(type_, f) if type_ else []
+    if values:
+        value = {**value, "enum": values + NOT_KNOWN.get(f.name, [])}
     return {"type": "array", "items": value} if f.list else value
 
 
-def object_of(schema, type_):
-    fields = schema.all_fields(type_)
+def required_of(schema, type_):
+    return ["@type"] + [f.name for f in schema.all_fields(type_) if not f.optional and not f.list]
+
+
+def object_of(schema, type_, required=None):
+    properties = {"@type": {"type": "string", "const": type_.name}}
+    for owner in [*reversed(list(schema.ancestors(type_))), type_]:
+        properties |= {f.name: described(f.doc, value_of(schema, f, owner)) for f in owner.fields}
     return described(type_.doc, {
         "type": "object",
-        "properties": {"@type": {"const": type_.name},
-                       **{f.name: described(f.doc, value_of(schema, f)) for f in fields}},
-        "required": ["@type"] + [f.name for f in fields if not f.optional and not f.list],
+        "properties": properties,
+        "required": required or required_of(schema, type_),
         "additionalProperties": False,
     })
 
 
-def arguments(schema):
-    """Disks and groups as requests name them."""
-    disk = object_of(schema, schema.types["HostScsiDisk"])
-    disk["required"] = ["canonicalName"]
-    disk["description"] = "What is left out has defaults. A disk that the host knows is taken as the host knows it."
-    disk_argument = {"anyOf": [{"type": "string", "description": "The disk's canonical name."}, disk]}
+def disks(schema):
+    """The one type of a disk: what a request must say of it is little, what an answer tells is more."""
+    disk = schema.types[DISK]
+    reported = ["canonicalName"] + required_of(schema, disk)
     return {
-        "DiskArgument": disk_argument,
+        DISK: {**object_of(schema, disk, ["canonicalName"]),
+               "description": disk.doc + " In a request its name is enough: what the host knows of it counts."},
+        REPORTED_DISK: {"description": "A disk as answers tell of it. It may be handed back in a request as it came.",
+                        "allOf": [ref(DISK)], "required": reported},
+    }
+
+
+def arguments():
+    """Disks and groups as requests name them."""
+    return {
+        "DiskArgument": {"anyOf": [{"type": "string", "description": "The disk's canonical name."}, ref(DISK)]},
         "MappingArgument": {
             "type": "object",
-            "properties": {"@type": {"const": "KovaHostDiskMapping"}, "ssd": ref("DiskArgument"),
+            "description": "A disk group; one of an answer may be handed back as it came.",
+            "properties": {"@type": {"type": "string", "const": "KovaHostDiskMapping"}, "ssd": ref("DiskArgument"),
                            "nonSsd": {"type": "array", "items": ref("DiskArgument")}},
             "required": ["ssd"],
             "additionalProperties": False,
@@ -90,7 +146,7 @@ def arguments(schema):
 
 
 def argument_of(f):
-    value = {"HostScsiDisk": ref("DiskArgument"), "KovaHostDiskMapping": ref("MappingArgument")}.get(f.type)
+    value = {DISK: ref("DiskArgument"), "KovaHostDiskMapping": ref("MappingArgument")}.get(f.type)
     value = value or SIMPLE[f.type]
     return {"type": "array", "items": value} if f.list else value
 
@@ -123,86 +179,161 @@ def answer_of(schema, returns, many, task):
     return {"type": "object", "properties": properties, "required": list(properties), "additionalProperties": False}
 
 
-def content(schema):
-    return {"application/json": {"schema": schema}}
+def content(schema, example):
+    return {"application/json": {"schema": schema, "example": example}}
 
 
-PLAIN = {"content": {"text/plain": {"schema": {"type": "string"}}}}
-FAULT = {"anyOf": [{"type": "object", "properties": {"fault": ref("AnyMethodFault")}, "required": ["fault"]}]}
+def plain(example):
+    return {"text/plain": {"schema": {"type": "string"}, "example": example}}
 
 
-def responses(answer, waits=False):
-    found = {
-        "200": {"description": "A result, perhaps beside a fault; or neither: done.", "content": content(answer)},
-        "400": {"description": "A request that cannot be read (text), or does not fit the host (fault).",
-                "content": {**content(FAULT), **PLAIN["content"]}},
-        "403": {"description": "The caller's role does not allow it.", "content": content(FAULT)},
-        "409": {"description": "The host, as it is now, does not allow it.", "content": content(FAULT)},
-        "500": {"description": "Any other fault.", "content": content(FAULT)},
-    }
-    if waits:
-        found["202"] = {"description": "Taken on; asked for without waiting.", "content": content(ref("Task"))}
-        found["503"] = {"description": "Too many changes wait.", "content": content(FAULT),
-                        "headers": {"Retry-After": {"schema": {"type": "integer"}}}}
+# Why a request is refused as a whole, by status.
+REFUSALS = {
+    "400": "It cannot be read, or is wrong whatever the host is like: InvalidArgument, DuplicateDisks.",
+    "403": "The caller's role does not allow it: NotPermitted.",
+    "404": "There is no such thing.",
+    "409": "The host, as it is now, does not allow it: HostChanged, or a fault of the storage service.",
+    "415": "The body is not application/json.",
+    "500": "Something in the host failed: SystemError.",
+    "503": "Too many changes or queries wait: Busy.",
+}
+OTHERWISE = "RefusedOtherwise"
+OTHER_REFUSALS = {
+    "description": "It is no request that is served: 405 for another method; 408, 413, 417, 421 and 431 by the server.",
+    "content": {**content({"$ref": "#/components/schemas/Refusal"}, FAULTS["400"]), **plain("the body is too large\n")},
+}
+READ = ["400", "403"]
+ASKED = READ + ["409", "500", "503"]  # of the host
+REFUSAL = {"type": "object", "description": "An answer that is a fault and nothing else.",
+           "properties": {"task": {"type": "string"}, "result": {"description": "null, or an empty list."},
+                          "fault": {"$ref": "#/components/schemas/AnyMethodFault"}},
+           "required": ["result", "fault"], "additionalProperties": False}
+
+
+def refusals():
+    found = {"Refused" + status: {"description": why, "content": content(ref("Refusal"), FAULTS[status])}
+             for status, why in REFUSALS.items()}
+    found["Refused503"]["headers"] = {
+        "Retry-After": {"description": "Seconds after which to ask again.", "schema": {"type": "integer"}}}
+    return {**found, OTHERWISE: OTHER_REFUSALS}
+
+
+def operation(operation_id, tag, summary, answer, refused, **more):
+    """One operation. `answer` is its schema, none: a text; `refused` the statuses of its refusals."""
+    body, example = EXAMPLES[operation_id]
+    if "requestBody" in more:
+        more["requestBody"] = {"required": True, "content": content(more["requestBody"], body)}
+    done = "A result, perhaps beside a fault where a part failed; or neither: done."
+    return {
+        "operationId": operation_id, "tags": [tag], "summary": summary, **more,
+        "responses": {
+            "200": {"description": done if answer else summary,
+                    "content": content(answer, example) if answer else plain(example)},
+            **{status: {"$ref": "#/components/responses/Refused" + status} for status in sorted(refused)},
+            "4XX": {"$ref": "#/components/responses/" + OTHERWISE}}}
+
+
+def change(operation_id, tag, summary, answer, body):
+    found = operation(operation_id, tag, summary, answer, ASKED + ["415"], requestBody=body)
+    taken_on = {"description": "Taken on; asked for without waiting.", "content": content(ref("Task"), WAITING)}
+    found["responses"] = {"200": found["responses"].pop("200"), "202": taken_on, **found["responses"]}
     return found
 
 
-def query(summary, answer, parameters=()):
-    found = {"summary": summary, "responses": responses(answer)}
-    return {"get": {**found, "parameters": list(parameters)} if parameters else found}
-
-
-def fixed_paths(schema):
-    """What the agent serves beside the operations of the schema."""
-    groups = answer_of(schema, "KovaHostConfigInfoStorageInfo", False, False)
-    task_id = {"name": "id", "in": "path", "required": True, "schema": {"type": "string"}}
-    names = {"name": "names", "in": "query", "description": "Canonical names; none: every disk.",
-             "schema": {"type": "array", "items": {"type": "string"}}, "explode": True}
-    host = {"type": "object", "description": "A host description, as a file holds it."}
-    change = {"type": "object", "additionalProperties": False, "properties": {
-        "set": {"type": "object", "description": "Top-level keys of the description to replace."},
-        "disk": {"type": "object", "description": "Keys of one disk to replace.", "required": ["name"]}}}
-    tasks = {"type": "object", "properties": {"tasks": {"type": "array", "items": ref("Task")}}, "required": ["tasks"]}
+def reports(schema):
+    """What GET asks of the host."""
+    names = {"name": "names", "in": "query", "description": "Canonical names; none: every disk.", "explode": True,
+             "schema": {"type": "array", "items": {"type": "string"}}}
     return {
-        "/api/v1/disks": query("QueryDisksForKova", answer_of(schema, "KovaHostDiskResult", True, False), [names]),
-        "/api/v1/groups": query("The disk groups of the host, those that are not mounted too", groups),
-        "/api/v1/config": query("GetConfigInfo", answer_of(schema, "KovaHostConfigInfo", False, False)),
-        "/api/v1/GetDiskGroups": {"post": {
-            "summary": "The disk groups of the host, those that are not mounted too",
-            "requestBody": {"required": True, "content": content({"type": "object", "additionalProperties": False})},
-            "responses": responses(groups)}},
-        "/api/v1/tasks": query("What became of the requests that change disks", tasks),
-        "/api/v1/tasks/{id}": query("One of them, with its result", ref("Task"), [task_id]),
-        "/api/v1/host": {
-            **query("The description of a simulated host", host),
-            "post": {"summary": "Changes a simulated host",
-                     "requestBody": {"required": True, "content": content(change)},
-                     "responses": responses(answer_of(schema, "", False, True), waits=True)}},
-        "/healthz": {"get": {"summary": "Whether the agent serves", "responses": {"200": {"description": "ok", **PLAIN}}}},
-        "/metrics": {"get": {"summary": "What the agent has served and what waits, in the text format of Prometheus",
-                             "responses": {"200": {"description": "Metrics", **PLAIN}}}},
+        "/api/v1/disks": {"get": operation(
+            "listDisks", "reports", "Which disks the service could use, and why it cannot use the others",
+            answer_of(schema, "KovaHostDiskResult", True, False), ASKED, parameters=[names])},
+        "/api/v1/groups": {"get": operation(
+            "listGroups", "reports", GROUPS, answer_of(schema, STORAGE, False, False), ASKED)},
+        "/api/v1/config": {"get": operation(
+            "readConfig", "reports", "The host's cluster, network and fault domain",
+            answer_of(schema, "KovaHostConfigInfo", False, False), ASKED)},
+        "/api/v1/GetDiskGroups": {"post": operation(
+            "GetDiskGroups", "operations", GROUPS, answer_of(schema, STORAGE, False, False), ASKED + ["415"],
+            requestBody={"type": "object", "additionalProperties": False})},
     }
 
 
-def openapi(schema):
-    paths = fixed_paths(schema)
+def tasks():
+    every = {"type": "object", "properties": {"tasks": {"type": "array", "items": ref("Task")}}, "required": ["tasks"]}
+    task_id = {"name": "id", "in": "path", "required": True, "description": "As the answer to the change told it.",
+               "schema": {"type": "string"}}
+    return {
+        "/api/v1/tasks": {"get": operation("listTasks", "tasks", "What became of the requests that change disks",
+                                           every, READ)},
+        "/api/v1/tasks/{id}": {"get": operation("readTask", "tasks", "One of them, with its result", ref("Task"),
+                                                READ + ["404"], parameters=[task_id])},
+    }
+
+
+def simulated_host(schema):
+    host = {"type": "object", "description": "A host description, as a file holds it."}
+    body = {"type": "object", "additionalProperties": False, "properties": {
+        "set": {"type": "object", "description": "Top-level keys of the description to replace."},
+        "disk": {"type": "object", "description": "Keys of one disk to replace.", "required": ["name"],
+                 "properties": {"name": {"type": "string"}}, "additionalProperties": True}}}
+    return {"/api/v1/host": {
+        "get": operation("readHost", "simulation", "The description of a simulated host", host, READ + ["404"]),
+        "post": change("changeHost", "simulation", "Changes a simulated host", answer_of(schema, "", False, True), body)}}
+
+
+def about_the_agent():
+    return {
+        "/healthz": {"get": operation("readHealth", "agent", "Whether the agent serves, and who may read: its version",
+                                      None, [], security=[])},
+        "/metrics": {"get": operation(
+            "readMetrics", "agent", "What the agent has served and what waits, in the text format of Prometheus", None,
+            READ)},
+    }
+
+
+def operations(schema):
+    paths = {}
     for o in schema.operations:
-        paths[f"/api/v1/{o.name}"] = {"post": {
-            "operationId": o.name,
-            "summary": o.doc,
-            "requestBody": {"required": True, "content": content(body_of(o))},
-            "responses": responses(answer_of(schema, o.returns, o.returns_list, changes(o)), waits=changes(o)),
-        }}
-    components = {}
+        answer = answer_of(schema, o.returns, o.returns_list, changes(o))
+        paths["/api/v1/" + o.name] = {"post": change(o.name, "operations", o.doc, answer, body_of(o)) if changes(o) else
+                                      operation(o.name, "operations", o.doc, answer, ASKED + ["415"], requestBody=body_of(o))}
+    return paths
+
+
+def types_of(schema):
+    found = {}
     for type_ in schema.types.values():
         if not type_.abstract:
-            components[type_.name] = object_of(schema, type_)
+            found[type_.name] = object_of(schema, type_)
         if schema.derived(type_):
-            components[f"Any{type_.name}"] = {"oneOf": [ref(name) for name in kinds(schema, type_)]}
+            found["Any" + type_.name] = {"description": type_.doc, "oneOf": [ref(name) for name in kinds(schema, type_)],
+                                         "discriminator": {"propertyName": "@type"}}
+    return {**found, **disks(schema), **arguments(), "Task": TASK, "Refusal": REFUSAL}
+
+
+def used(types, *roots):
+    """Those of the types that the roots lead to, in their order."""
+    names, at = set(), list(roots)
+    while at:
+        text = json.dumps(at.pop())
+        for name in set(re.findall(r'"#/components/schemas/([^"]*)"', text)) - names:
+            names.add(name)
+            at.append(types[name])
+    return {name: value for name, value in types.items() if name in names}
+
+
+def openapi(schema):
+    paths = {**reports(schema), **operations(schema), **tasks(), **simulated_host(schema), **about_the_agent()}
+    responses = refusals()
     document = {
         "openapi": "3.1.0",
-        "info": {"title": "KOVA host agent", "version": "1"},
+        "info": {"title": "KOVA host agent", "version": "1", "description": ABOUT},
+        "servers": SERVERS,
+        "security": [{"certificate": []}, {}],
+        "tags": [{"name": name, "description": what} for name, what in TAGS.items()],
         "paths": paths,
-        "components": {"schemas": {**components, **arguments(schema), "Task": TASK}},
+        "components": {"schemas": used(types_of(schema), paths, responses), "responses": responses,
+                       "securitySchemes": {"certificate": CERTIFICATE}},
     }
     return json.dumps(document, indent=1).split("\n")

@@ -345,7 +345,32 @@ class Documents(unittest.TestCase):
         defined = document["components"]["schemas"]
         references = re.findall(r'"#/components/schemas/([^"]*)"', json.dumps(document))
         self.assertEqual(set(references) - set(defined), set())
-        self.assertEqual({n for n, t in self.schema.types.items() if not t.abstract} - set(defined), set())
+        referred = set(references)
+        self.assertEqual(set(defined) - referred, set(), "types that nothing leads to")
+        self.assertEqual({n for n, t in self.schema.types.items() if t.fault and not t.abstract} - referred, set())
+
+    def test_the_json_description_names_every_operation_once(self):
+        document = json.loads("\n".join(emit_openapi.openapi(self.schema)))
+        names = [o["operationId"] for path in document["paths"].values() for o in path.values()]
+        self.assertEqual(len(names), len(set(names)))
+        self.assertLess({o.name for o in self.schema.operations}, set(names))
+
+    def test_the_json_description_lists_the_values_of_a_field_that_has_some(self):
+        for type_ in self.schema.types.values():
+            found = [value for f in type_.fields for value in emit_openapi.values_of(type_, f)]
+            self.assertEqual(sorted(found), sorted(value for _, value in type_.constants), type_.name)
+        types = json.loads("\n".join(emit_openapi.openapi(self.schema)))["components"]["schemas"]
+        disk = types["HostScsiDisk"]["properties"]
+        self.assertEqual(disk["lunType"]["enum"], ["disk", "tape", "cdrom", "enclosure", "unknown", ""])
+        self.assertEqual(disk["operationalState"]["items"]["enum"], ["ok", "off", "error"])
+        self.assertEqual(types["KovaHostDiskResult"]["properties"]["state"]["enum"], ["inUse", "eligible", "ineligible"])
+
+    def test_the_json_description_has_one_type_of_disk_for_both_ways(self):
+        types = json.loads("\n".join(emit_openapi.openapi(self.schema)))["components"]["schemas"]
+        disk = {"$ref": "#/components/schemas/HostScsiDisk"}
+        self.assertIn(disk, types["DiskArgument"]["anyOf"])
+        self.assertEqual(types["ReportedDisk"]["allOf"], [disk])
+        self.assertEqual(types["HostScsiDisk"]["required"], ["canonicalName"])
 
     def test_the_json_description_names_the_kinds_of_a_type_where_it_is_declared(self):
         document = json.loads("\n".join(emit_openapi.openapi(self.schema)))

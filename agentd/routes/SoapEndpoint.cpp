@@ -10,6 +10,7 @@
 #include "agentd/routes/SoapRequest.h"
 #include "agentd/tasks/QueryQueue.h"
 #include "agentd/tasks/TaskQueue.h"
+#include "host/Build.h"
 #include "nox/Documents.h"
 #include "orbis/ParseException.h"
 
@@ -87,7 +88,8 @@ HttpAnswer DescribeService(const HttpRequest& request, const HttpTarget& target)
   if (target.parameters.size() == 1) {
     const auto& [name, value] = target.parameters.front();
     if (name == "wsdl" && value.empty()) {
-      return {200, "text/xml; charset=utf-8", Nox::WsdlText(AddressFor(request), "")};
+      return {200, "text/xml; charset=utf-8",
+              Nox::WsdlText(AddressFor(request), " Served by agentd " + Host::VersionLine() + ".")};
     }
     if (name == "xsd" && value == schemaFile) {
       return {200, "text/xml; charset=utf-8", std::string(Nox::XsdText())};

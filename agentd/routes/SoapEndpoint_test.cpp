@@ -8,6 +8,7 @@
 #include "agentd/tasks/TaskQueue.h"
 #include "agentd/testing/FakeApi.h"
 #include "agentd/testing/RunningServer.h"
+#include "host/Build.h"
 #include "nox/Faults.h"
 #include "nox/Operations.h"
 
@@ -241,7 +242,9 @@ TEST_F(SoapEndpoint, DescribesItself) {
   const HttpAnswer wsdl = Serve({"GET", "/soap?wsdl", "", ""});
   EXPECT_EQ(wsdl.status, 200u);
   EXPECT_EQ(wsdl.contentType, "text/xml; charset=utf-8");
-  EXPECT_THAT(wsdl.body, AllOf(StartsWith("<?xml"), Not(HasSubstr("schemaLocation"))));
+  EXPECT_THAT(wsdl.body,
+              AllOf(StartsWith("<?xml"), Not(HasSubstr("schemaLocation")),
+                    HasSubstr(" Served by agentd " + Host::VersionLine() + ".</wsdl:documentation>")));
   const HttpAnswer xsd = Serve({"GET", "/soap?xsd=nox.xsd", "", ""});
   EXPECT_EQ(xsd.status, 200u);
   EXPECT_THAT(xsd.body, HasSubstr("targetNamespace=\"urn:nox\""));

@@ -151,16 +151,12 @@ def argument_of(f):
     return {"type": "array", "items": value} if f.list else value
 
 
-def changes(operation):
-    return not operation.name.startswith(("Query", "Get"))
-
-
 def body_of(operation):
-    properties = {f.name: argument_of(f) for f in operation.parameters if f.name != "label"}
+    properties = {f.name: described(f.doc, argument_of(f)) for f in operation.parameters if f.name != "label"}
     # A list that changes something is never left out; one that only asks may be.
     required = [f.name for f in operation.parameters
-                if f.name in properties and not f.optional and (not f.list or changes(operation))]
-    if changes(operation):
+                if f.name in properties and not f.optional and (not f.list or operation.changes)]
+    if operation.changes:
         properties["label"] = {"type": "string", "maxLength": 256, "description": "The client's own, kept with the task."}
         properties["wait"] = {"type": "boolean", "default": True,
                               "description": "false: the answer is the task as it was taken on, with 202."}
@@ -295,8 +291,8 @@ def about_the_agent():
 def operations(schema):
     paths = {}
     for o in schema.operations:
-        answer = answer_of(schema, o.returns, o.returns_list, changes(o))
-        paths["/api/v1/" + o.name] = {"post": change(o.name, "operations", o.doc, answer, body_of(o)) if changes(o) else
+        answer = answer_of(schema, o.returns, o.returns_list, o.changes)
+        paths["/api/v1/" + o.name] = {"post": change(o.name, "operations", o.doc, answer, body_of(o)) if o.changes else
                                       operation(o.name, "operations", o.doc, answer, ASKED + ["415"], requestBody=body_of(o))}
     return paths
 

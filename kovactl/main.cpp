@@ -33,7 +33,7 @@ ExitStatus Run(const CommandLine& line) {
   } catch (const Agentd::RefusedByAgent& refused) {
     Kovactl::PrintFault(refused.GetFault(), std::cerr);
     return ExitStatus::Fault;
-  } catch (const Agentd::TlsError& error) {
+  } catch (const Agentd::AnswerError& error) {
     std::cerr << "kovactl: " << Host::Printable(error.what()) << "\n";
     return ExitStatus::Unreachable;
   } catch (const Agentd::ConnectionError& error) {

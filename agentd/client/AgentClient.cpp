@@ -184,8 +184,7 @@ Answer AgentClient::Read(const HttpAnswer& http, const Orbis::TypeDescriptor* re
   try {
     return Host::ReadJsonAnswer(http.body, resultType);
   } catch (const Orbis::ParseException& refused) {
-    throw ConnectionError("the answer of the agent on " + _address.Name() +
-                          " cannot be read: " + refused.what());
+    throw AnswerError("the answer of the agent on " + _address.Name() + " cannot be read: " + refused.what());
   }
 }
 
@@ -205,9 +204,9 @@ std::string AgentClient::Get(const std::string& target) const {
 
 void AgentClient::DemandJson(const HttpAnswer& http) const {
   if (http.contentType != jsonType) {
-    throw ConnectionError("the agent on " + _address.Name() + " answered with status " +
-                          std::to_string(http.status) + ": " +
-                          std::string(Orbis::Excerpt(http.body, longestShown)));
+    throw AnswerError("the agent on " + _address.Name() + " answered with status " +
+                      std::to_string(http.status) + ": " +
+                      std::string(Orbis::Excerpt(http.body, longestShown)));
   }
 }
 

@@ -25,8 +25,9 @@ class RefusedByAgent : public std::runtime_error {
 // A change is waited for as long as it takes, within a day; a query for ten minutes.
 //
 // Threads: any; every call has a connection of its own. Errors: ConnectionError when the agent cannot be
-// reached, does not answer in the form it should, or does not serve what it is asked. A fault of the gate, or
-// Busy, is an answer like any other; only what answers with a text throws RefusedByAgent.
+// reached, AnswerError when it refuses the connection, does not answer in the form it should, or does not
+// serve what it is asked. A fault of the gate, or Busy, is an answer like any other; only what answers with a
+// text throws RefusedByAgent.
 class AgentClient final : public Host::ManagementApi {
  public:
   // A URL: "unix:/run/kova/agentd.sock", "tls:kova.example:9443" or "tcp:127.0.0.1:8080". Throws

@@ -68,7 +68,9 @@ class Exchanger {
       }
       _stream.close();  // the next one may be of another family
     }
-    Demand(result, "no agent answers on");
+    if (result) {
+      throw ConnectionError("no agent answers on " + _address.Name() + ": " + result.message());
+    }
     if (_tls) {
       Secure();
     }
@@ -131,9 +133,9 @@ class Exchanger {
     return result;
   }
 
-  void Demand(error_code result, const char* failure, const std::string& guess = "") const {
+  void Demand(error_code result, const char* failure, const std::string& guess) const {
     if (result) {
-      throw ConnectionError(std::string(failure) + " " + _address.Name() + ": " + result.message() + guess);
+      throw AnswerError(std::string(failure) + " " + _address.Name() + ": " + result.message() + guess);
     }
   }
 

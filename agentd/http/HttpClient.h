@@ -16,11 +16,18 @@ class ConnectionError : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
-// Somebody answers, but TLS comes to nothing: one side does not trust the other, or does not speak it. The
-// text says whose fault it is, and names the file where it is a file's.
-class TlsError : public ConnectionError {
+// Somebody answers, but not as an agent that serves: it refuses to, hangs up, or says what cannot be
+// understood. To start another would not help.
+class AnswerError : public ConnectionError {
  public:
   using ConnectionError::ConnectionError;
+};
+
+// TLS comes to nothing: one side does not trust the other, or does not speak it. The text says whose fault it
+// is, and names the file where it is a file's.
+class TlsError : public AnswerError {
+ public:
+  using AnswerError::AnswerError;
 };
 
 // Files in PEM form, for an address with TLS.

@@ -4,8 +4,10 @@
 #include <openssl/x509v3.h>
 
 #include <memory>
+#include <stdexcept>
 
 #include "agentd/http/TlsContext.h"
+#include "agentd/http/TlsSessions.h"
 
 namespace Agentd {
 namespace {
@@ -44,18 +46,28 @@ void AddDnsNames(const X509* certificate, std::vector<std::string>& names) {
   }
 }
 
-// No session outlives its connection: what a certificate was worth is found out anew each time.
-void ForgetSessions(SSL_CTX* context) {
-  SSL_CTX_set_session_cache_mode(context, SSL_SESS_CACHE_OFF);
-  SSL_CTX_set_num_tickets(context, 0);
-  SSL_CTX_set_options(context, SSL_OP_NO_TICKET | SSL_OP_NO_RENEGOTIATION);
+// Of TLS 1.2, only what keeps a recorded conversation closed when the server's key is found later, and cannot
+// be changed under way. What 1.3 has is all of that kind.
+constexpr const char* suites12 =
+    "ECDHE-ECDSA-AES256-GCM-SHA384:ECDHE-RSA-AES256-GCM-SHA384:"
+    "ECDHE-ECDSA-CHACHA20-POLY1305:ECDHE-RSA-CHACHA20-POLY1305:"
+    "ECDHE-ECDSA-AES128-GCM-SHA256:ECDHE-RSA-AES128-GCM-SHA256";
+constexpr const char* groups = "X25519:P-256:P-384:P-521";
+
+void ChooseSuites(SSL_CTX* context) {
+  if (SSL_CTX_set_cipher_list(context, suites12) != 1 || SSL_CTX_set1_groups_list(context, groups) != 1) {
+    throw std::runtime_error("this system's library lacks every suite of TLS that the agent speaks");
+  }
+  SSL_CTX_set_options(context,
+                      SSL_OP_CIPHER_SERVER_PREFERENCE | SSL_OP_NO_RENEGOTIATION | SSL_OP_NO_COMPRESSION);
 }
 
 }  // namespace
 
 ssl::context MakeTlsContext(const TlsFiles& files) {
   ssl::context context = MakeTlsContext(ssl::context::tls_server);
-  ForgetSessions(context.native_handle());
+  ChooseSuites(context.native_handle());
+  ResumeSessions(context.native_handle());
   UseCertificate(context, files.certificate, files.key);
   UseCa(context, files.clientCa, "of clients");
   // Tells clients whose certificates are wanted.

@@ -25,6 +25,9 @@ class Certificates {
   std::string Pem(const std::string& name) const { return _folder + "/" + name + ".pem"; }
   std::string Key(const std::string& name) const { return _folder + "/" + name + ".key"; }
 
+  inline static const std::string newKey = "-newkey ec -pkeyopt ec_paramgen_curve:P-256 -nodes";
+  inline static const std::string newRsaKey = "-newkey rsa:2048 -nodes";
+
   // One that others are issued by.
   void MakeCa(const std::string& name) const {
     Run("req -x509 " + newKey + " -days 2 -subj /CN=" + name + " -keyout " + Key(name) + " -out " +
@@ -32,10 +35,10 @@ class Certificates {
   }
   // `subjectNames` as in "DNS:kova.example,IP:127.0.0.1".
   void Issue(const std::string& name, const std::string& ca, const std::string& subjectNames,
-             const std::string& days = "2") const {
+             const std::string& days = "2", const std::string& key = newKey) const {
     const std::string request = _folder + "/" + name + ".csr";
     std::ofstream(_folder + "/names") << "subjectAltName=" << subjectNames << "\n";
-    Run("req " + newKey + " -subj /CN=" + name + " -keyout " + Key(name) + " -out " + request);
+    Run("req " + key + " -subj /CN=" + name + " -keyout " + Key(name) + " -out " + request);
     Run("x509 -req -in " + request + " -CA " + Pem(ca) + " -CAkey " + Key(ca) + " -CAcreateserial -days " +
         days + " -extfile " + _folder + "/names -out " + Pem(name));
   }
@@ -45,7 +48,6 @@ class Certificates {
   }
 
  private:
-  inline static const std::string newKey = "-newkey ec -pkeyopt ec_paramgen_curve:P-256 -nodes";
   inline static std::atomic<int> count{0};
 
   static void Run(const std::string& command) {

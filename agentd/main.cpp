@@ -94,11 +94,14 @@ void Serve(Options& options) {
   Host::HostRuntime& runtime = Host::HostRuntime::Start(options.runtime);
   const Host::KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
   Agentd::TaskQueue tasks;
-  const Agentd::Router router(service, tasks);
+  Agentd::Router router(service, tasks);
   Agentd::HttpServer server(
-      http, [&router](const Agentd::HttpRequest& request, const Agentd::HttpResponder& responder) {
+      http,
+      [&router](const Agentd::HttpRequest& request, const Agentd::HttpResponder& responder) {
         router.Serve(request, responder);
-      });
+      },
+      [&router](const Agentd::HttpRequest& head) { return router.Admit(head); });
+  router.OnLoad([&server] { return server.Now(); });
   server.OnStopping([&tasks] { tasks.Close(); });
   WriteReadyFile(options.readyFile, server.Addresses());
   for (const Agentd::HttpAddress& address : server.Addresses()) {

@@ -1,5 +1,6 @@
 #include "agentd/http/HttpConnection.h"
 
+#include <algorithm>
 #include <boost/asio/buffer.hpp>
 #include <boost/asio/post.hpp>
 #include <boost/asio/write.hpp>
@@ -18,42 +19,17 @@ constexpr std::chrono::milliseconds discardTime = std::chrono::seconds(2);
 constexpr std::size_t bodyPiece = 64 << 10;  // read at a time
 constexpr std::string_view goOn = "HTTP/1.1 100 Continue\r\n\r\n";
 
-// What a request that could not be read is answered with; nothing when the client has gone.
-std::optional<HttpAnswer> Refusal(const error_code& error) {
-  if (error == http::error::body_limit) {
-    return RefusedWith(413, "the body is too large");
-  }
-  if (error == http::error::header_limit) {
-    return RefusedWith(431, "the header is too large");
-  }
-  if (error == http::error::buffer_overflow) {
-    return RefusedWith(431, "the header of a chunk is too large");
-  }
-  const bool gone = error == http::error::end_of_stream ||
-                    error.category() != http::make_error_code(http::error::end_of_stream).category();
-  return gone ? std::nullopt : std::optional(RefusedWith(400, "not a request: " + error.message()));
-}
-
-HttpRequest FromHeader(const HttpHeader& header, const HttpDoor& door, const HttpPeer& peer) {
-  return {.method = std::string(header.method_string()),
-          .target = std::string(header.target()),
-          .contentType = std::string(header[http::field::content_type]),
-          .body = {},
-          .soapAction = std::string(header["SOAPAction"]),
-          .hasOrigin = header.count(http::field::origin) != 0,
-          .peer = peer,
-          .scheme = door.isTls ? "https" : "http",
-          .authority = std::string(header[http::field::host])};
-}
+constexpr int readersPart = 4;  // those who may not change get that part of the memory for bodies
 
 }  // namespace
 
-HttpConnection::HttpConnection(HttpContext& context, HttpDoor door, HttpPeer peer, HttpStream::Socket socket,
-                               asio::ssl::context* tls)
+HttpConnection::HttpConnection(HttpContext& context, HttpDoor door, HttpPeer peer, HttpPlaces::Place place,
+                               HttpStream::Socket socket)
     : _context(context),
       _door(std::move(door)),
+      _place(std::move(place)),
       _peer(std::move(peer)),
-      _stream(std::move(socket), tls),
+      _stream(std::move(socket), _door.isTls ? &*context.tls : nullptr),
       _deadline(context.network),
       _buffer(context.limits.headerBytes + bodyPiece) {
   _context.connections.insert(this);
@@ -67,12 +43,12 @@ HttpConnection::~HttpConnection() {
 }
 
 void HttpConnection::Start(std::optional<HttpAnswer> refusal) {
-  SetDeadline(_context.limits.readTime);
   _waiting = true;
   if (_stream.Secured() == nullptr) {
     Begin(std::move(refusal));
     return;
   }
+  SetDeadline(_context.limits.handshakeTime);
   _stream.Secured()->async_handshake(
       HttpStream::Tls::server,
       [self = shared_from_this(), refusal = std::move(refusal)](error_code error) mutable {
@@ -82,6 +58,12 @@ void HttpConnection::Start(std::optional<HttpAnswer> refusal) {
 
 void HttpConnection::OnHandshake(Error error, std::optional<HttpAnswer> refusal) {
   if (error) {
+    if (!_context.draining) {
+      _context.onRefused(HttpRefusal::Handshake, _peer.identity);
+    }
+    if (_stream.Bare().IsExpired()) {
+      return;
+    }
     // The client may still be sending: closed at once, it might never read what is wrong with its
     // certificate.
     SetDeadline(discardTime);
@@ -100,6 +82,7 @@ void HttpConnection::Begin(std::optional<HttpAnswer> refusal) {
   if (refusal) {
     Refuse(std::move(*refusal));
   } else {
+    SetDeadline(_context.limits.readTime);
     Read(shared_from_this());
   }
 }
@@ -109,7 +92,7 @@ void HttpConnection::Read(std::shared_ptr<HttpConnection> self) {
   connection._waiting = true;
   connection._parser.emplace();
   connection._parser->header_limit(static_cast<std::uint32_t>(connection._context.limits.headerBytes));
-  connection._parser->body_limit(connection._context.limits.bodyBytes);
+  connection._parser->body_limit(boost::none);  // until the header is known
   http::async_read_header(connection._stream, connection._buffer, *connection._parser,
                           [self = std::move(self)](error_code error, std::size_t) { self->OnHeader(error); });
 }
@@ -120,14 +103,39 @@ void HttpConnection::OnHeader(Error error) {
     return;
   }
   const HttpHeader& header = _parser->get();
-  _version = header.version();
-  _withBody = header.method() != http::verb::head;
+  _form = {header.version(), header.method() != http::verb::head, _parser->keep_alive()};
   if (auto refusal = RefusalOf(header, _door)) {
     Refuse(std::move(*refusal));
     return;
   }
-  _request = FromHeader(header, _door, _peer);
-  if (_parser->is_done() || !WantsContinue(header)) {
+  _request = RequestOf(header, _door, _peer);
+  Admit();
+}
+
+void HttpConnection::Admit() {
+  HttpAdmission admission = _context.admit ? _context.admit(_request) : HttpAdmission();
+  if (admission.refusal) {
+    Decline(std::move(*admission.refusal));
+    return;
+  }
+  const HttpLimits& limits = _context.limits;
+  const std::size_t most = std::min(admission.bodyBytes, limits.bodyBytes);
+  const std::uint64_t length = _parser->content_length().value_or(0);
+  const bool mayChange = _peer.role == HttpRole::Change;
+  auto& share = _parser->get().body().share;
+  share.emplace(_context.bodies, mayChange ? limits.allBodyBytes : limits.allBodyBytes / readersPart);
+  if (length > most) {
+    GiveUp(http::error::body_limit);
+  } else if (!share->Hold(length)) {
+    GiveUp(HttpBody::BeyondBudget());
+  } else {
+    _parser->body_limit(most);
+    GoOn();
+  }
+}
+
+void HttpConnection::GoOn() {
+  if (_parser->is_done() || !WantsContinue(_parser->get())) {
     ReadBody();
     return;
   }
@@ -158,18 +166,22 @@ void HttpConnection::OnBody(Error error) {
 
 void HttpConnection::GiveUp(Error error) {
   const bool tooLate = _stream.Bare().IsExpired() && error == asio::error::operation_aborted && HasBegun();
-  if (auto refusal = tooLate ? RefusedWith(408, "the request took too long") : Refusal(error)) {
+  if (tooLate) {
+    _context.onRefused(HttpRefusal::Slow, _peer.identity);
+  } else if (HttpBody::IsBeyondBudget(error)) {
+    _context.onRefused(HttpRefusal::Bodies, _peer.identity);
+  }
+  if (auto refusal = tooLate ? RefusedWith(408, "the request took too long") : RefusalOf(error)) {
     Refuse(std::move(*refusal));
   }
 }
 
 void HttpConnection::PassOn() {
-  http::request<http::string_body> message = _parser->release();
-  _keepAlive = message.keep_alive();
-  _request.body = std::move(message.body());
-  asio::post(_context.workers, [self = shared_from_this(), request = std::move(_request)]() mutable {
-    Handle(std::move(self), request);
-  });
+  HttpBody::value_type body = _parser->release().body();
+  _request.body = std::move(body.text);
+  asio::post(_context.workers,
+             [self = shared_from_this(), request = std::move(_request),
+              share = std::move(*body.share)]() mutable { Handle(std::move(self), request); });
 }
 
 void HttpConnection::Handle(std::shared_ptr<HttpConnection> self, const HttpRequest& request) {
@@ -195,18 +207,8 @@ void HttpConnection::Answer(std::shared_ptr<HttpConnection> self, HttpAnswer ans
 }
 
 void HttpConnection::Compose(HttpAnswer answer) {
-  _keepAlive = _keepAlive && !_context.draining;
-  _response.emplace(static_cast<http::status>(answer.status), _version);
-  _response->set(http::field::content_type, answer.contentType);
-  _response->set("X-Content-Type-Options", "nosniff");  // a browser must take no answer for a page
-  if (answer.retryAfterSeconds > 0) {
-    _response->set(http::field::retry_after, std::to_string(answer.retryAfterSeconds));
-  }
-  _response->content_length(answer.body.size());
-  if (_withBody) {
-    _response->body() = std::move(answer.body);
-  }
-  _response->keep_alive(_keepAlive);
+  _form.keepAlive = _form.keepAlive && !_context.draining;
+  _response.emplace(ResponseOf(std::move(answer), _form));
   _unsent.emplace(*_response);
 }
 
@@ -224,7 +226,7 @@ bool HttpConnection::SendAtOnce() {
 bool HttpConnection::GiveBack(std::shared_ptr<HttpConnection>& self) {
   HttpContext& context = self->_context;
   const std::lock_guard guard(context.givingBack);
-  if (!self->_keepAlive || context.draining) {
+  if (!self->_form.keepAlive || context.draining) {
     return false;
   }
   self->SetDeadline(context.limits.readTime);
@@ -232,9 +234,19 @@ bool HttpConnection::GiveBack(std::shared_ptr<HttpConnection>& self) {
   return true;
 }
 
+void HttpConnection::Decline(HttpAnswer answer) {
+  if (!_parser->is_done()) {
+    Refuse(std::move(answer));
+    return;
+  }
+  _waiting = false;
+  Compose(std::move(answer));
+  Write();
+}
+
 void HttpConnection::Refuse(HttpAnswer answer) {
   _waiting = false;
-  _keepAlive = false;
+  _form.keepAlive = false;
   _refused = true;
   Compose(std::move(answer));
   Write();
@@ -254,7 +266,7 @@ void HttpConnection::OnWritten(Error error) {
   if (error) {
     return;
   }
-  if (_keepAlive && !_context.draining) {
+  if (_form.keepAlive && !_context.draining) {
     SetDeadline(_context.limits.readTime);
     Read(shared_from_this());
   } else {

@@ -22,7 +22,10 @@
 #include <optional>
 #include <set>
 
-#include "agentd/http/HttpHeaderRules.h"
+#include "agentd/http/BodyBudget.h"
+#include "agentd/http/HttpBody.h"
+#include "agentd/http/HttpMessages.h"
+#include "agentd/http/HttpPlaces.h"
 #include "agentd/http/HttpServer.h"
 #include "agentd/http/HttpStream.h"
 
@@ -36,10 +39,13 @@ struct HttpContext {
   AccessRules access;
   std::optional<boost::asio::ssl::context> tls;
   HttpDeferringHandler handler;
+  HttpAdmit admit;                                                     // may be empty
+  std::function<void(HttpRefusal, const std::string& who)> onRefused;  // told on the network's thread
   boost::asio::io_context& network;
   boost::asio::thread_pool& workers;
   std::function<void()> onLastGone;  // told when the last connection has gone
   std::set<HttpConnection*> connections = {};
+  BodyBudget bodies = {};
   std::atomic<bool> draining{false};  // answers are the last on their connection
   // Held by a worker while it gives a connection back; and by the network to begin draining, which must not
   // miss that one, and before it lets the time of one be over.
@@ -48,10 +54,9 @@ struct HttpContext {
 
 class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
  public:
-  // `peer` is who connects; with TLS, its role and name are those of the certificate instead. `tls` may be
-  // null.
-  HttpConnection(HttpContext& context, HttpDoor door, HttpPeer peer, HttpStream::Socket socket,
-                 boost::asio::ssl::context* tls);
+  // `peer` is who connects; with TLS, its role and name are those of the certificate instead.
+  HttpConnection(HttpContext& context, HttpDoor door, HttpPeer peer, HttpPlaces::Place place,
+                 HttpStream::Socket socket);
   ~HttpConnection();
 
   // Agrees on the secrets of TLS, if there is any. Then answers with the refusal and closes or, without one,
@@ -68,6 +73,9 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
   // Waits for the next request, within the time that runs already. Takes the reference along, as Handle does.
   static void Read(std::shared_ptr<HttpConnection> self);
   void OnHeader(Error error);
+  // What may be told of the request by its header; the body is then read, or the request refused.
+  void Admit();
+  void GoOn();
   void ReadBody();
   void OnBody(Error error);
   // Answers what could not be read to its end, if there is still somebody to answer.
@@ -84,6 +92,8 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
   bool SendAtOnce();
   // Reads on, and takes the reference; or leaves it, when the connection has to end.
   static bool GiveBack(std::shared_ptr<HttpConnection>& self);
+  // Answers a request that is not handled. Closes if it has a body, of which nothing has been read.
+  void Decline(HttpAnswer answer);
   // Answers without having read a request to its end, and closes.
   void Refuse(HttpAnswer answer);
   // What is left of the answer.
@@ -100,20 +110,19 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
 
   HttpContext& _context;
   const HttpDoor _door;
+  const HttpPlaces::Place _place;
   HttpPeer _peer;
   HttpStream _stream;
   boost::asio::steady_timer _deadline;
   std::atomic<unsigned> _deadlines{0};  // set or cleared so far; only the last counts
   boost::beast::flat_buffer _buffer;
-  std::optional<boost::beast::http::request_parser<boost::beast::http::string_body>> _parser;
-  std::optional<boost::beast::http::response<boost::beast::http::string_body>> _response;
+  std::optional<boost::beast::http::request_parser<HttpBody>> _parser;
+  std::optional<HttpResponse> _response;
   // How much of the answer has been sent.
   std::optional<boost::beast::http::response_serializer<boost::beast::http::string_body>> _unsent;
   std::array<char, 16384> _discarded;
-  HttpRequest _request;  // what the header says; the fields behind a body in chunks change nothing of it
-  unsigned _version = 11;
-  bool _keepAlive = true;
-  bool _withBody = true;  // the answer's body is sent: not to HEAD
+  HttpRequest _request;   // what the header says; the fields behind a body in chunks change nothing of it
+  HttpForm _form;         // of the answer
   bool _waiting = false;  // for a request, or for its end
   bool _refused = false;  // the client may still be sending
 };

@@ -76,6 +76,21 @@ HttpAnswer RefusedWith(unsigned status, const std::string& text) {
   return {status, "text/plain; charset=utf-8", text + "\n"};
 }
 
+HttpAsked WhatIsAsked(const HttpHeader& header) {
+  const std::string_view target = header.target();
+  for (const std::string_view scheme : {"http://", "https://"}) {
+    if (!beast::iequals(target.substr(0, scheme.size()), scheme)) {
+      continue;
+    }
+    const std::string_view rest = target.substr(scheme.size());
+    const std::size_t end = std::min(rest.find_first_of("/?"), rest.size());
+    const std::string_view path = rest.substr(end);
+    return {std::string(rest.substr(0, end)),
+            (path.empty() || path.front() == '?' ? "/" : "") + std::string(path)};
+  }
+  return {std::string(header[http::field::host]), std::string(target)};
+}
+
 bool IsHost(std::string_view host) {
   const auto [name, port] = Split(host);
   const bool bracketed = name.size() > 2 && name.front() == '[' && name.back() == ']';
@@ -99,10 +114,14 @@ std::optional<HttpAnswer> RefusalOf(const HttpHeader& header, const HttpDoor& do
   if (HasTwice(header)) {
     return RefusedWith(400, "a header field that may stand there once stands there twice");
   }
-  if (!IsHost(header[http::field::host])) {
+  if (header.version() >= 11 && header.count(http::field::host) == 0) {
+    return RefusedWith(400, "the Host header is missing");
+  }
+  const std::string host = WhatIsAsked(header).authority;
+  if (!IsHost(host)) {
     return RefusedWith(400, "the Host header is not written as a host is");
   }
-  if (door.tcpPort && !IsOwnHost(header[http::field::host], door)) {
+  if (door.tcpPort && !IsOwnHost(host, door)) {
     return RefusedWith(421, "the Host header does not name this agent");
   }
   if (!SaysOnly(header, http::field::transfer_encoding, "chunked")) {

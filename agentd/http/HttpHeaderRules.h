@@ -23,6 +23,14 @@ struct HttpDoor {
   bool isTls = false;
 };
 
+// Whom a request is for, and what it asks of it. A target in its absolute form
+// ("http://kova.example/healthz") names both, and the Host header then counts no more.
+struct HttpAsked {
+  std::string authority;
+  std::string target;  // "/healthz"
+};
+HttpAsked WhatIsAsked(const HttpHeader& header);
+
 // Nothing when the request may be read on.
 std::optional<HttpAnswer> RefusalOf(const HttpHeader& header, const HttpDoor& door);
 
@@ -32,11 +40,12 @@ bool WantsContinue(const HttpHeader& header);
 // Whether that is how a host is written, with a port or without: "kova.example:9443", "[::1]", or nothing.
 bool IsHost(std::string_view host);
 
-// Whether a Host header means this server: a name or address of loopback with the port
+// Whether a host means this server: a name or address of loopback with the port
 // (needless where it is the one that everybody assumes), or one of the
 // server's own names. A page of a stranger whose name was made to lead here still bears its own.
 bool IsOwnHost(std::string_view host, const HttpDoor& door);
 
+// A line of text.
 HttpAnswer RefusedWith(unsigned status, const std::string& text);
 
 }  // namespace Agentd

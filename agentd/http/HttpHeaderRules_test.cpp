@@ -14,7 +14,7 @@ const HttpDoor tcpDoor{port, {"kova.example", "10.0.0.5", "[fd00::5]"}};
 
 HttpHeader AHeader(const std::vector<std::pair<std::string, std::string>>& fields) {
   HttpHeader header;
-  header.version(11);
+  header.version(10);  // which leaves it to the client whether there is a Host header
   for (const auto& [name, value] : fields) {
     header.insert(name, value);
   }
@@ -87,6 +87,47 @@ TEST(HttpHeaderRules, TheHostIsLookedAtOnTcpOnly) {
   EXPECT_EQ(StatusOf(AHeader({{"Host", "localhost:8080"}}), tcpDoor), 0u);
 }
 
+TEST(HttpHeaderRules, ARequestOfTheCurrentVersionBearsAHost) {
+  HttpHeader header = AHeader({});
+  EXPECT_EQ(StatusOf(header), 0u);
+  header.version(11);
+  EXPECT_EQ(StatusOf(header), 400u);
+  EXPECT_EQ(StatusOf(header, tcpDoor), 400u);
+  header.insert("Host", "");
+  EXPECT_EQ(StatusOf(header), 0u);
+  EXPECT_EQ(StatusOf(header, tcpDoor), 421u);
+}
+
+HttpAsked Asked(const std::string& target, const std::string& host = "kova.example") {
+  HttpHeader header = AHeader({{"Host", host}});
+  header.target(target);
+  return WhatIsAsked(header);
+}
+
+TEST(HttpHeaderRules, ATargetMayNameTheHostToo) {
+  EXPECT_EQ(Asked("/a?b").target, "/a?b");
+  EXPECT_EQ(Asked("/a?b").authority, "kova.example");
+  for (const char* target : {"http://other.example:8/a?b=/", "HTTPS://other.example:8/a?b=/"}) {
+    EXPECT_EQ(Asked(target).target, "/a?b=/") << target;
+    EXPECT_EQ(Asked(target).authority, "other.example:8") << target;
+  }
+  EXPECT_EQ(Asked("http://a").target, "/");
+  EXPECT_EQ(Asked("http://a?b").target, "/?b");
+  EXPECT_EQ(Asked("ftp://a/b").target, "ftp://a/b") << "which is served nowhere";
+  EXPECT_EQ(Asked("*").target, "*");
+}
+
+TEST(HttpHeaderRules, TheHostThatATargetNamesIsTheOneThatCounts) {
+  HttpHeader header = AHeader({{"Host", "kova.example"}});
+  header.target("http://evil.example/a");
+  EXPECT_EQ(StatusOf(header, tcpDoor), 421u);
+  header.target("http://user@kova.example/a");
+  EXPECT_EQ(StatusOf(header, tcpDoor), 400u);
+  header.set("Host", "evil.example");
+  header.target("http://kova.example/a");
+  EXPECT_EQ(StatusOf(header, tcpDoor), 0u);
+}
+
 TEST(HttpHeaderRules, WhatMayStandThereOnceMustNotStandThereTwice) {
   for (const char* field : {"Host", "Content-Length", "Transfer-Encoding", "Content-Type", "Expect"}) {
     EXPECT_EQ(StatusOf(AHeader({{field, "chunked"}, {field, "chunked"}})), 400u) << field;
@@ -104,7 +145,8 @@ TEST(HttpHeaderRules, ABodyIsReadAsItIsOrInChunks) {
 }
 
 TEST(HttpHeaderRules, OnlyOneThingCanBeExpected) {
-  HttpHeader header = AHeader({{"Expect", "100-Continue"}});
+  HttpHeader header = AHeader({{"Host", "a"}, {"Expect", "100-Continue"}});
+  header.version(11);
   EXPECT_EQ(StatusOf(header), 0u);
   EXPECT_TRUE(WantsContinue(header));
   header.version(10);

@@ -68,8 +68,9 @@ void HttpListener::BindTcp() {
   _address.port = real.port();
 }
 
-void HttpListener::Accept(Welcome welcome) {
+void HttpListener::Accept(Welcome welcome, Failed failed) {
   _welcome = std::move(welcome);
+  _failed = std::move(failed);
   AcceptNext();
 }
 
@@ -83,10 +84,11 @@ void HttpListener::OnAccept(error_code error, Protocol::socket socket) {
     return;
   }
   if (!error) {
-    _welcome(*this, std::move(socket));
+    _welcome(std::move(socket));
     AcceptNext();
     return;
   }
+  _failed(error);
   // No descriptors left, for one: trying again at once would only burn the processor.
   _pause.expires_after(acceptPause);
   _pause.async_wait([this](error_code cancelled) {

@@ -16,7 +16,8 @@ namespace Agentd {
 class HttpListener {
  public:
   using Protocol = boost::asio::generic::stream_protocol;
-  using Welcome = std::function<void(const HttpListener& listener, Protocol::socket socket)>;
+  using Welcome = std::function<void(Protocol::socket socket)>;
+  using Failed = std::function<void(boost::system::error_code error)>;
 
   // Binds; a Unix socket has mode 0660. Throws std::runtime_error that names the address.
   HttpListener(boost::asio::io_context& network, const HttpAddress& address);
@@ -27,8 +28,8 @@ class HttpListener {
   // The address as it is answered on: with the port that was found.
   const HttpAddress& Address() const { return _address; }
 
-  // Until Close, every client is welcomed.
-  void Accept(Welcome welcome);
+  // Until Close, every client is welcomed. `failed` is told when one cannot be accepted; it may be later.
+  void Accept(Welcome welcome, Failed failed);
   // Accepts no more; the file of a Unix socket goes.
   void Close();
 
@@ -42,6 +43,7 @@ class HttpListener {
   boost::asio::basic_socket_acceptor<Protocol> _acceptor;
   boost::asio::steady_timer _pause;
   Welcome _welcome;
+  Failed _failed;
 };
 
 }  // namespace Agentd

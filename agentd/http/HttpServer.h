@@ -6,12 +6,17 @@
 // that says which (see HttpLimits), and those that could come from a stranger's page, or that leave open what
 // they mean, with the reason. Each request says who asks: a process on a Unix socket by its user and groups,
 // a client of TLS by its certificate (see AccessRules); whoever else reaches a TCP port may read.
+//
+// What is refused is refused early, and costs others nothing: each address has its own places for
+// connections, a request that will not be served is answered before its body is read, and the memory of all
+// bodies is bounded. Whom the server turns away is counted (see HttpLoad), and logged in a line now and then.
 #pragma once
 
 #include <functional>
 #include <memory>
 #include <vector>
 
+#include "agentd/http/HttpLoad.h"
 #include "agentd/http/HttpOptions.h"
 #include "agentd/http/HttpResponder.h"
 
@@ -22,17 +27,25 @@ using HttpHandler = std::function<HttpAnswer(const HttpRequest&)>;
 // The same, for answers that may come later and from another thread.
 using HttpDeferringHandler = std::function<void(const HttpRequest&, const HttpResponder&)>;
 
+// What becomes of a request, told from its header: its body is then read, within bounds, or not at all.
+// Called on the thread in Run, which waits for it.
+using HttpAdmit = std::function<HttpAdmission(const HttpRequest& head)>;
+
 class HttpServer {
  public:
   // Binds the addresses (Unix sockets with mode 0660) and listens; from here on SIGTERM and SIGINT are the
-  // server's. Throws std::runtime_error that names the address or the file.
-  HttpServer(const HttpOptions& options, HttpHandler handler);
-  HttpServer(const HttpOptions& options, HttpDeferringHandler handler);
+  // server's. Throws std::runtime_error that names the address or the file, or says that this process may not
+  // have as many files open as the limits allow connections. Without `admit`, every body is read.
+  HttpServer(const HttpOptions& options, HttpHandler handler, HttpAdmit admit = {});
+  HttpServer(const HttpOptions& options, HttpDeferringHandler handler, HttpAdmit admit = {});
   // Waits for handlers that still run. Whoever holds a responder must have let go of it by then.
   ~HttpServer();
 
   // As they are answered on, in the order of the options: with the ports that were found.
   std::vector<HttpAddress> Addresses() const;
+
+  // Any thread.
+  HttpLoad Now() const;
 
   // Told, on the thread in Run, when the server stops accepting, and before it waits for what is in flight.
   // Set before Run.

@@ -84,21 +84,23 @@ TEST_P(NoRequest, IsRefusedAndTheConnectionClosed) {
   EXPECT_TRUE(client.IsClosed());
 }
 
-INSTANTIATE_TEST_SUITE_P(Texts, NoRequest,
-                         testing::Values("rubbish\r\n\r\n", "GET /\r\n\r\n", "GET / HTTP/3.0\r\n\r\n",
-                                         "GET / HTTP/1.1\r\nno colon\r\n\r\n", "\x16\x03\x01 hello\r\n\r\n",
-                                         "POST / HTTP/1.1\r\nContent-Length: -1\r\n\r\n",
-                                         "POST / HTTP/1.1\r\nContent-Length: 1\r\nContent-Length: 2\r\n\r\n",
-                                         "POST / HTTP/1.1\r\nTransfer-Encoding: chunked\r\n\r\nzz\r\n",
-                                         "POST / HTTP/1.1\r\nContent-Length: 9\r\n\r\nhalf"));
+INSTANTIATE_TEST_SUITE_P(
+    Texts, NoRequest,
+    testing::Values("rubbish\r\n\r\n", "GET /\r\n\r\n", "GET / HTTP/3.0\r\n\r\n",
+                    "GET / HTTP/1.1\r\nno colon\r\n\r\n", "\x16\x03\x01 hello\r\n\r\n",
+                    "POST / HTTP/1.1\r\nContent-Length: -1\r\n\r\n",
+                    "POST / HTTP/1.1\r\nContent-Length: 1\r\nContent-Length: 2\r\n\r\n",
+                    "POST / HTTP/1.1\r\nHost: x\r\nTransfer-Encoding: chunked\r\n\r\nzz\r\n",
+                    "POST / HTTP/1.1\r\nHost: x\r\nContent-Length: 9\r\n\r\nhalf"));
 
 TEST(HttpServerLimits, ARequestThatTakesTooLongIsAnsweredWith408) {
   HttpLimits limits;
   limits.readTime = std::chrono::milliseconds(20);
   RunningServer server(&Testing::Echo, limits);
   RawClient client(server.Path());
-  client.Send("POST / HTTP/1.1\r\nContent-Length: 10\r\n\r\nhalf");
+  client.Send("POST / HTTP/1.1\r\nHost: x\r\nContent-Length: 10\r\n\r\nhalf");
   EXPECT_EQ(client.Receive().status, 408u);
+  EXPECT_EQ(server.Now().refused[static_cast<std::size_t>(HttpRefusal::Slow)], 1u);
   EXPECT_TRUE(client.IsClosed());
 }
 

@@ -62,17 +62,6 @@ TEST(HttpServerTcp, ListensOnVersionSixToo) {
   EXPECT_THAT(Get(server.Address()).body, testing::StartsWith("read [::1]:"));
 }
 
-TEST(HttpServerTcp, CountsTheClientsOfAllAddressesTogether) {
-  RunningServer server(
-      {.listen = {UnixAddress(Testing::FreshSocketPath()), anyPort}, .limits = {.connections = 1}},
-      &Testing::Echo);
-  RawClient first(server.Address(0).place);
-  first.Send("GET / HTTP/1.1\r\nHost: x\r\n\r\n");
-  EXPECT_EQ(first.Receive().status, 200u);
-  RawClient second(server.Address(1));
-  EXPECT_EQ(second.Receive().status, 503u);
-}
-
 TEST(HttpServerTcp, AnAddressThatCannotBeUsedIsNamedAndNothingIsLeftBehind) {
   const std::string path = Testing::FreshSocketPath();
   RunningServer other({.listen = {anyPort}}, &Testing::Echo);
@@ -111,6 +100,15 @@ TEST(HttpServerTcp, ARequestMeantForAnotherHostIsRefusedBeforeItsBodyIsRead) {
   RawClient named(server.Address());
   named.Send("GET / HTTP/1.1\r\nHost: kova.example\r\n\r\n");
   EXPECT_EQ(named.Receive().status, 200u);
+}
+
+TEST(HttpServerTcp, ATargetInItsAbsoluteFormIsServedAsAnyOther) {
+  RunningServer server({.listen = {anyPort}, .serverNames = {"kova.example"}}, &Testing::Echo);
+  RawClient client(server.Address());
+  client.Send("GET http://kova.example/a?b HTTP/1.1\r\nHost: evil.example\r\n\r\n");
+  EXPECT_EQ(client.Receive().body, "GET /a?b ");
+  client.Send("GET http://evil.example/a HTTP/1.1\r\nHost: kova.example\r\n\r\n");
+  EXPECT_EQ(client.Receive().status, 421u);
 }
 
 TEST(HttpServerTcp, TellsTheHandlerOfAPageInABrowser) {
@@ -183,7 +181,7 @@ TEST(HttpServerTls, AClientThatNeverAgreesOnTheSecretsIsGivenUp) {
   const Testing::Certificates certificates;
   certificates.MakeCa("a");
   RunningServer server({.listen = {anyPort},
-                        .limits = {.readTime = std::chrono::milliseconds(50)},
+                        .limits = {.handshakeTime = std::chrono::milliseconds(50)},
                         .tls = certificates.ServerFiles("a", "a")},
                        &Testing::Echo);
   RawClient silent(server.Address());
@@ -191,6 +189,7 @@ TEST(HttpServerTls, AClientThatNeverAgreesOnTheSecretsIsGivenUp) {
   RawClient plain(server.Address());
   plain.Send("GET / HTTP/1.1\r\nHost: localhost\r\n\r\n");
   EXPECT_EQ(plain.Receive().status, 0u);
+  EXPECT_EQ(server.Now().refused[static_cast<std::size_t>(HttpRefusal::Handshake)], 2u);
 }
 
 }  // namespace

@@ -138,7 +138,7 @@ TEST(HttpServer, ASlowRequestHoldsUpNobodyElse) {
 
 TEST(HttpServer, GoesOnAfterAClientThatLeftInTheMiddle) {
   RunningServer server;
-  { RawClient(server.Path()).Send("POST / HTTP/1.1\r\nContent-Length: 10\r\n\r\nhalf"); }
+  { RawClient(server.Path()).Send("POST / HTTP/1.1\r\nHost: x\r\nContent-Length: 10\r\n\r\nhalf"); }
   { RawClient(server.Path()).Send(get); }  // left before its answer
   RawClient client(server.Path());
   client.Send(get);

@@ -9,6 +9,7 @@
 
 #include "agentd/http/HttpTarget.h"
 #include "agentd/http/Shown.h"
+#include "agentd/routes/DoorMetrics.h"
 #include "agentd/routes/HostWatch.h"
 #include "agentd/routes/JsonAnswers.h"
 #include "agentd/routes/Metrics.h"
@@ -35,6 +36,7 @@ using Host::ManagementApi;
 constexpr std::string_view jsonType = "application/json";
 constexpr std::string_view xmlType = "text/xml";
 constexpr std::string_view jsonFolder = "/api/v1";  // whoever may throw is below it
+constexpr std::size_t readersBody = 1 << 20;  // of those who may not change
 
 // A request on its way: who serves it, what was asked, and the way back. Gone when it is served; an answer
 // that comes later keeps what it needs.
@@ -44,6 +46,7 @@ struct Call {
   QueryQueue& queries;
   const Metrics& metrics;
   HostWatch& watch;
+  const std::function<HttpLoad()>& load;
   const HttpTarget& target;
   const HttpRequest& request;
   const HttpResponder& responder;
@@ -108,7 +111,8 @@ void GetMetrics(const Call& call) {
   const TaskQueue::Load changes = call.tasks.Now();
   call.responder.Answer(
       {200, "text/plain; version=0.0.4; charset=utf-8",
-       call.metrics.Text({.changes = changes, .queries = call.queries.Now(), .host = call.watch.Last()})});
+       call.metrics.Text({.changes = changes, .queries = call.queries.Now(), .host = call.watch.Last()}) +
+           DescribeDoors(call.load())});
   call.watch.Refresh(changes.ended.Total());  // for the next who asks: this answer waits for nobody
 }
 
@@ -142,10 +146,6 @@ void Submit(const Call& call, const std::string& operation, const ReadRequest& r
 
 void PostOperation(const Call& call) {
   const Operation& operation = *FindOperation(call.rest);
-  if (const auto refusal = RefusalOf(call.request, operation.changes ? HttpRole::Change : HttpRole::Read)) {
-    call.responder.Answer(ToHttp(*refusal));
-    return;
-  }
   ReadRequest request = ReadJsonRequest(operation, call.request.body);
   Bound(request.arguments);
   if (!operation.changes) {
@@ -262,19 +262,12 @@ bool IsOfType(std::string_view wanted, std::string_view contentType) {
   return type == wanted;
 }
 
-void Refuse(const Route& route, const Call& call, const Host::Answer& refusal) {
-  call.responder.Answer(route.bodyType == xmlType ? ToSoap("", refusal) : ToHttp(refusal));
+HttpRole RoleFor(const Route& route, std::string_view rest) {
+  const Operation* const operation = route.takes == &IsOperation ? FindOperation(rest) : nullptr;
+  return operation == nullptr ? route.role : operation->changes ? HttpRole::Change : HttpRole::Read;
 }
 
 void Follow(const Route& route, const Call& call) {
-  if (const auto refusal = RefusalOf(call.request, route.role)) {
-    Refuse(route, call, *refusal);
-    return;
-  }
-  if (!route.bodyType.empty() && !IsOfType(route.bodyType, call.request.contentType)) {
-    Refuse(call, 415, "the body must be " + std::string(route.bodyType));
-    return;
-  }
   try {
     route.serve(call);
   } catch (...) {
@@ -285,6 +278,66 @@ void Follow(const Route& route, const Call& call) {
 // Of the route, for people who count: an operation stands with its name, a task without its id.
 std::string NameOf(const Route& route, std::string_view rest) {
   return std::string(route.path) + (route.takes == &IsOperation ? std::string(rest) : "");
+}
+
+// Where a request leads, as far as its header tells. It looks into the target.
+struct Way {
+  const Route* route = nullptr;
+  std::string_view rest = {};
+  std::string name = "none";
+  std::optional<HttpAnswer> refusal = std::nullopt;
+};
+
+// The route of that method; otherwise, what else is served there.
+const Route* FindRoute(std::string_view method, std::string_view path, std::string& allow) {
+  for (const Route& route : routes) {
+    if (!Leads(route, path)) {
+      continue;
+    }
+    const bool isGet = route.bodyType.empty();
+    if (isGet ? method == "GET" || method == "HEAD" : method == "POST") {
+      return &route;
+    }
+    allow += allow.empty() ? "" : ", ";
+    allow += isGet ? "GET, HEAD" : "POST";
+  }
+  return nullptr;
+}
+
+HttpAnswer NotServed(std::string_view path, const std::string& allow) {
+  if (allow.empty()) {
+    return RefusalAt(path, 404, "nothing is served here");
+  }
+  HttpAnswer refusal = RefusalAt(path, 405, "that method is not served here");
+  refusal.allow = allow;
+  return refusal;
+}
+
+std::optional<HttpAnswer> RefusalOn(const Route& route, std::string_view rest, const HttpRequest& head) {
+  if (const auto refusal = RefusalOf(head, RoleFor(route, rest))) {
+    return route.bodyType == xmlType ? ToSoap("", *refusal) : ToHttp(*refusal);
+  }
+  if (!route.bodyType.empty() && !IsOfType(route.bodyType, head.contentType)) {
+    return RefusalAt(head.target, 415, "the body must be " + std::string(route.bodyType));
+  }
+  return std::nullopt;
+}
+
+Way FindWay(const HttpRequest& head, const std::optional<HttpTarget>& target) {
+  if (!target) {
+    return {.refusal = RefusalAt(head.target, 400, "the target holds a broken escape")};
+  }
+  std::string allow;
+  const Route* const route = FindRoute(head.method, target->path, allow);
+  if (route == nullptr) {
+    return {.refusal = NotServed(target->path, allow)};
+  }
+  const std::string_view rest = std::string_view(target->path).substr(route->path.size());
+  return {route, rest, NameOf(*route, rest), RefusalOn(*route, rest, head)};
+}
+
+std::size_t MostBodyOf(HttpRole role) {
+  return role == HttpRole::Change ? HttpAdmission().bodyBytes : role == HttpRole::Read ? readersBody : 0;
 }
 
 // Counts the answer on its way.
@@ -312,30 +365,23 @@ bool Router::WaitUntilIdle(std::chrono::milliseconds patience) const {
   return _queries->WaitUntilIdle(patience);
 }
 
+HttpAdmission Router::Admit(const HttpRequest& head) const {
+  Way way = FindWay(head, ParseTarget(head.target));
+  if (way.refusal) {
+    _metrics->Count(way.name, way.refusal->status, {});
+  }
+  return {std::move(way.refusal), MostBodyOf(head.peer.role)};
+}
+
 void Router::Serve(const HttpRequest& request, const HttpResponder& responder) const {
   const std::optional<HttpTarget> target = ParseTarget(request.target);
-  if (!target) {
-    Counted(_metrics, "none", responder)
-        .Answer(RefusalAt(request.target, 400, "the target holds a broken escape"));
-    return;
+  const Way way = FindWay(request, target);
+  const HttpResponder counted = Counted(_metrics, way.name, responder);
+  if (way.refusal) {
+    counted.Answer(*way.refusal);
+  } else {
+    Follow(*way.route, {_api, _tasks, *_queries, *_metrics, *_watch, _load, *target, request, counted, way.rest});
   }
-  const std::string_view path = target->path;
-  bool pathKnown = false;
-  for (const Route& route : routes) {
-    if (!Leads(route, path)) {
-      continue;
-    }
-    if (request.method == (route.bodyType.empty() ? "GET" : "POST")) {
-      const std::string_view rest = path.substr(route.path.size());
-      const HttpResponder counted = Counted(_metrics, NameOf(route, rest), responder);
-      Follow(route, {_api, _tasks, *_queries, *_metrics, *_watch, *target, request, counted, rest});
-      return;
-    }
-    pathKnown = true;
-  }
-  Counted(_metrics, "none", responder)
-      .Answer(pathKnown ? RefusalAt(path, 405, "that method is not served here")
-                        : RefusalAt(path, 404, "nothing is served here"));
 }
 
 }  // namespace Agentd

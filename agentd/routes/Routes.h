@@ -27,7 +27,8 @@
 // text.
 //
 // A request takes the role read, or change if it changes something; /healthz takes none. A client without the
-// role is answered with NotPermitted.
+// role is answered with NotPermitted. All of this, but for what an operation in SOAP takes, is known from the
+// header, and told before the body is read (see Admit). HEAD is answered like GET.
 //
 // Queries are answered on the calling thread if there is a place for one more, and left to another that
 // answers one already if not (see QueryQueue.h). Changes are handed to the task queue, and answered by it
@@ -36,8 +37,11 @@
 #pragma once
 
 #include <chrono>
+#include <functional>
 #include <memory>
+#include <utility>
 
+#include "agentd/http/HttpLoad.h"
 #include "agentd/http/HttpResponder.h"
 #include "agentd/http/HttpTypes.h"
 #include "agentd/tasks/QueryQueue.h"
@@ -58,6 +62,13 @@ class Router {
   Router(const Host::ManagementApi& api, TaskQueue& tasks, const QueryLimits& limits = {});
   ~Router();
 
+  // What /metrics says of the server. Set before it runs.
+  void OnLoad(std::function<HttpLoad()> load) { _load = std::move(load); }
+
+  // What becomes of a request of which the header has come: who may not ask for it is refused, and so is what
+  // is not served; who may only read may send 1 MiB, and who may do nothing, nothing. Threads: any.
+  HttpAdmission Admit(const HttpRequest& head) const;
+
   // Threads: any. Throws nothing that a client could bring about.
   void Serve(const HttpRequest& request, const HttpResponder& responder) const;
 
@@ -70,6 +81,7 @@ class Router {
   const std::unique_ptr<QueryQueue> _queries;
   const std::unique_ptr<HostWatch> _watch;
   const std::shared_ptr<Metrics> _metrics;  // answers that come late are still counted
+  std::function<HttpLoad()> _load = [] { return HttpLoad(); };
 };
 
 }  // namespace Agentd

@@ -180,6 +180,25 @@ TEST_F(Routes, AnUnknownPathIs404AndAnotherMethod405) {
   EXPECT_EQ(FakeHooks::calls, 0);
 }
 
+TEST_F(Routes, ARefusedMethodTellsWhichAreServed) {
+  EXPECT_EQ(Post("/healthz", "{}").allow, "GET, HEAD");
+  EXPECT_EQ(Get("/api/v1/AddDisks").allow, "POST");
+  EXPECT_EQ(Send({"DELETE", "/api/v1/host", "", ""}).allow, "GET, HEAD, POST");
+  EXPECT_EQ(Send({"PUT", "/soap", "", ""}).allow, "GET, HEAD, POST");
+  EXPECT_EQ(Get("/nowhere").allow, "");
+}
+
+TEST_F(Routes, HeadIsAnsweredAsGetIs) {
+  FakeHooks::AnswerWithDisk("naa.1");
+  for (const char* target :
+       {"/healthz", "/api/v1/disks", "/api/v1/tasks", "/soap?wsdl", "/api/v1/openapi.json"}) {
+    const HttpAnswer head = Send({"HEAD", target, "", ""});
+    EXPECT_EQ(head.status, 200u) << target;
+    EXPECT_EQ(head.body, Get(target).body) << "the server drops it";
+  }
+  EXPECT_EQ(Send({"HEAD", "/api/v1/AddDisks", "", ""}).status, 405u);
+}
+
 TEST_F(Routes, AnEscapedPathIsTheSamePath) {
   EXPECT_EQ(Get("/%68ealthz").status, 200u);
 }

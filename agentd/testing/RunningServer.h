@@ -49,8 +49,8 @@ class RunningServer {
       : _server(OnSocket(_path, limits), std::move(handler)),
         _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
   template <class Handler>
-  RunningServer(const HttpOptions& options, Handler handler)
-      : _server(options, std::move(handler)),
+  RunningServer(const HttpOptions& options, Handler handler, HttpAdmit admit = {})
+      : _server(options, std::move(handler), std::move(admit)),
         _run(std::async(std::launch::async, [this] { return _server.Run(); })) {}
   explicit RunningServer(HttpDeferringHandler handler, const HttpLimits& limits = {},
                          std::function<void()> onStopping = {})
@@ -66,6 +66,7 @@ class RunningServer {
   const std::string& Path() const { return _path; }
   HttpAddress Address(std::size_t at = 0) const { return _server.Addresses().at(at); }
   HttpServer& Server() { return _server; }
+  HttpLoad Now() const { return _server.Now(); }
 
   // Waits for Run to return; what it returned.
   bool Wait() { return _run.valid() ? _run.get() : true; }

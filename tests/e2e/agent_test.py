@@ -138,8 +138,16 @@ class AgentAnswersCurl(ProgramTest):
         status, body = self.post("@" + self.write("large.json", " " * ((16 << 20) + 1)))
         self.assertEqual((status, body), (413, "the body is too large\n"))
 
-    def test_head_requests_without_a_body(self):
-        self.assertEqual(self.curl("/healthz", "--head")[0], 405)
+    def test_head_requests_as_those_for_the_body(self):
+        status, head = self.curl("/healthz", "--head")
+        self.assertEqual(status, 200)
+        self.assertRegex(head, r"Date: \w{3}, \d\d \w{3} \d{4} \d\d:\d\d:\d\d GMT")
+        self.assertIn(f"Content-Length: {len(self.curl('/healthz')[1])}", head)
+
+    def test_other_methods_with_those_that_are_served(self):
+        status, head = self.curl("/healthz", "--request", "DELETE", "--include")
+        self.assertEqual(status, 405)
+        self.assertIn("Allow: GET, HEAD", head)
 
 
 class AgentStarts(ProgramTest):

@@ -1,6 +1,7 @@
 #!/usr/bin/env python3
 """An agent on the network: plain TCP, TLS with and without certificates, and who may do what."""
 
+import contextlib
 import json
 import os
 import re
@@ -22,7 +23,7 @@ class NetworkTest(ProgramTest):
     """An agent with a TCP port beside its socket; the folder is its own."""
 
     def start(self, *arguments):
-        self.start_agent("--host", self.write("host.json", HOST), "--listen", "tcp:127.0.0.1:0", *arguments)
+        self.agent = self.start_agent("--host", self.write("host.json", HOST), "--listen", "tcp:127.0.0.1:0", *arguments)
         self.port = int(self.addresses[1].rpartition(":")[2])
 
     def curl(self, url, *more, body=None, content_type="application/json", **process):
@@ -83,6 +84,37 @@ class PlainTcp(NetworkTest):
         self.assertEqual(over_tcp.out, self.ask_agent("-o", "json", "disks").out)
         self.assert_ended(self.kovactl("--agent", address, "claim"), 1, "role")
         self.assert_ended(self.kovactl("--agent", "tcp:127.0.0.1:1", "disks"), 3, "127.0.0.1:1")
+
+    def test_has_places_for_each_client_and_says_when_they_are_taken(self):
+        crowd = [socket.create_connection(("127.0.0.1", self.port)) for _ in range(64)]
+        for client in crowd:
+            self.addCleanup(client.close)
+            client.sendall(b"GET /healthz HTTP/1.1\r\nHost: kova.example\r\n\r\n")
+            self.assertIn(b"200 OK", client.recv(4096))
+        refused = self.kovactl("--agent", f"tcp:127.0.0.1:{self.port}", "disks")
+        self.assert_ended(refused, 3, "too many connections of this client; try again later")
+        self.assertNotIn("Start one", refused.err)
+        self.assert_ended(self.ask_agent("disks"), 0)
+        log = self.read("agentd.log")
+        self.assertRegex(log, r"Refused 127\.0\.0\.1:\d+ on tcp:127\.0\.0\.1:\d+: too many connections of this client")
+        metrics = self.http().ask("GET", "/metrics")[1]
+        self.assertIn('kova_agent_refusals_total{cause="connectionsOfPeer"} 1\n', metrics)
+        self.assertIn(f'kova_agent_connections{{listener="tcp:127.0.0.1:{self.port}"}} 64\n', metrics)
+
+    def test_holds_no_body_of_those_who_may_not_change(self):
+        with open(f"/proc/{self.agent.pid}/status", encoding="ascii") as file:
+            before = int(re.search(r"^VmRSS:\s+(\d+) kB", file.read(), re.MULTILINE)[1])
+        head = (f"POST /api/v1/AddDisks HTTP/1.1\r\nHost: kova.example\r\nContent-Type: application/json\r\n"
+                f"Content-Length: {16 << 20}\r\n\r\n").encode()
+        crowd = [socket.create_connection(("127.0.0.1", self.port)) for _ in range(60)]
+        for client in crowd:
+            self.addCleanup(client.close)
+            with contextlib.suppress(OSError):  # it may have been hung up on
+                client.sendall(head + b" " * (4 << 20))
+            self.assertIn(b" 403 ", client.recv(4096))
+        with open(f"/proc/{self.agent.pid}/status", encoding="ascii") as file:
+            most = int(re.search(r"^VmHWM:\s+(\d+) kB", file.read(), re.MULTILINE)[1])
+        self.assertLess(most - before, 16 << 10, "KiB")
 
     def test_refuses_requests_meant_for_another_host(self):
         for host, status in (("127.0.0.1:1", 421), ("evil.example", 421), (f"evil.example:{self.port}", 421), ("", 421),

@@ -112,7 +112,7 @@ def err(client):
     client.close()
     with socket.socket(socket.AF_UNIX) as gone:
         gone.connect(client.path)
-        gone.sendall(b"POST /soap HTTP/1.1\r\nContent-Length: 100\r\n\r\n<half")
+        gone.sendall(b"POST /soap HTTP/1.1\r\nHost: localhost\r\nContent-Length: 100\r\n\r\n<half")
     return 7
 
 

@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test clients check api-check bench growth soak tls-check build format-check format asan tsan clang tidy fuzz clean
+.PHONY: help demo test clients check api-check bench growth soak door tls-check build format-check format asan tsan clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -15,6 +15,7 @@ help:
 	@echo "make bench   benchmarks"
 	@echo "make growth  instructions per disk of planning, among few disks and among many"
 	@echo "make soak    an agent under mixed clients for SECONDS (180): its memory must stay flat"
+	@echo "make door    an agent with 2,000 clients at its doors who want nothing good: others are answered as in peace"
 	@echo "make tls-check  testssl on the agent: versions, suites, tickets, known weaknesses"
 	@echo "make build   the release build only: build/release"
 
@@ -114,6 +115,13 @@ soak:
 	@cmake --preset release >/dev/null
 	@cmake --build --preset release -j $(JOBS) --target agentd
 	@KOVA_BIN=$(CURDIR)/build/release/bin python3 -B tests/e2e/soak.py $(or $(SECONDS),180)
+
+# An agent whose doors are besieged, for SECONDS each time.
+door:
+	@$(SETUP) build test
+	@cmake --preset release >/dev/null
+	@cmake --build --preset release -j $(JOBS) --target agentd
+	@KOVA_BIN=$(CURDIR)/build/release/bin python3 -B tests/e2e/door.py $(or $(SECONDS),6)
 
 # What the agent speaks by TLS, looked at by testssl.
 tls-check:

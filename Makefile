@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test clients check api-check bench growth soak door tls-check build format-check format asan tsan clang tidy fuzz clean
+.PHONY: help demo test clients check api-check bench growth soak door tls-check mutants build format-check format asan tsan clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -14,6 +14,7 @@ help:
 	@echo "make api-check  the OpenAPI description before two judges, and a client's types of it; needs npm"
 	@echo "make bench   benchmarks"
 	@echo "make growth  instructions per disk of planning, among few disks and among many"
+	@echo "make mutants changes the plug-in in 200 places, one at a time: do its tests see it? FILE=PATH, ALL=1"
 	@echo "make soak    an agent under mixed clients for SECONDS (180): its memory must stay flat"
 	@echo "make door    an agent with 2,000 clients at its doors who want nothing good: others are answered as in peace"
 	@echo "make tls-check  testssl on the agent: versions, suites, tickets, known weaknesses"
@@ -129,6 +130,15 @@ tls-check:
 	@cmake --preset release >/dev/null
 	@cmake --build --preset release -j $(JOBS) --target agentd
 	@KOVA_BIN=$(CURDIR)/build/release/bin python3 -B tests/e2e/tls_check.py
+
+# Changes the plug-in one place at a time and tells which changes no test sees: of COUNT (200) places, of the files
+# or folders FILE, or of ALL=1.
+mutants:
+	@$(SETUP) build test mutants
+	@cmake --preset mutants >/dev/null
+	@cmake --build --preset mutants -j $(JOBS) --target kova_agentd_test
+	@python3 -B tools/mutants/mutants.py build/mutants --jobs $(JOBS) --count $(or $(COUNT),200) \
+	  $(if $(ALL),--all) $(if $(FILE),--file $(FILE))
 
 clean:
 	rm -rf build

@@ -1,0 +1,114 @@
+"""What a build knows: how a file of it is compiled, how its test program is linked."""
+
+import json
+import os
+import re
+import shlex
+import subprocess
+from pathlib import Path
+
+COMPILERS = ("c++", "g++", "clang++")
+INCLUDE = re.compile(r'^\s*#\s*include\s+([<"][^>"]+[>"])', re.MULTILINE)
+
+
+class Build:
+    """A build folder whose test program is up to date. `room` is the folder of the sources that are changed."""
+
+    def __init__(self, root, folder, room, program):
+        self.root, self.folder, self.room = Path(root), Path(folder), room
+        with open(self.folder / "compile_commands.json", encoding="utf-8") as file:
+            entries = json.load(file)
+        self._entries = {os.path.relpath(entry["file"], self.root): entry for entry in entries}
+        commands = subprocess.run(["ninja", "-C", self.folder, "-t", "commands", program], check=True,
+                                  capture_output=True, text=True).stdout
+        self._link = link_words(commands.splitlines()[-1], program)
+        self.program = self.folder / self._link[self._link.index("-o") + 1]
+        self._header = None
+
+    def files(self, *suffixes):
+        """The sources of the room that are no tests, as paths from the root."""
+        found = (path for suffix in suffixes for path in (self.root / self.room).rglob("*" + suffix))
+        return sorted(str(path.relative_to(self.root)) for path in found if not path.stem.endswith("_test"))
+
+    def text(self, file):
+        return (self.root / file).read_text(encoding="utf-8")
+
+    # ---- compiling
+
+    def flags(self, file):
+        """The compiler and its flags, without what says where to write and what is only advice."""
+        words = shlex.split(self._entries[file]["command"])
+        while os.path.basename(words[0]) not in COMPILERS and not words[0].endswith(tuple("/" + c for c in COMPILERS)):
+            words.pop(0)
+        kept, skip = [], False
+        for word in words:
+            skip_next = word in ("-o", "-MT", "-MF")
+            if not (skip or skip_next or word in ("-c", "-MD", "-g") or word.startswith(("-W", "-O"))):
+                kept.append(word)
+            skip = skip_next
+        return kept[:-1] + ["-w", "-g0"]
+
+    def object_of(self, file):
+        """Where the build puts the file's object, as its commands name it."""
+        words = shlex.split(self._entries[file]["command"])
+        return words[words.index("-o") + 1]
+
+    def compile(self, file, source, output, extra=(), level="-O0"):
+        """Compiles the source in the way of the file. What the compiler says; None when it is content."""
+        header = ["-include", self._header] if self._header and level == "-O0" else []
+        command = [*self.flags(file), level, *extra, *header, "-c", source, "-o", output]
+        result = subprocess.run(list(map(str, command)), cwd=self.folder, capture_output=True, text=True, check=False)
+        return result.stderr if result.returncode != 0 else None
+
+    def precompile(self, folder):
+        """Compiles once what the room's sources include from elsewhere."""
+        own = f'"{self.room}/'
+        included = sorted({name for file in self.files(".cpp", ".h") for name in INCLUDE.findall(self.text(file))
+                           if not name.startswith(own)})
+        header = Path(folder) / "included.h"
+        header.write_text("".join(f"#include {name}\n" for name in included), encoding="utf-8")
+        some_file = next(file for file in self.files(".cpp") if file in self._entries)
+        command = [*self.flags(some_file), "-O0", "-x", "c++-header", header, "-o", f"{header}.gch"]
+        subprocess.run(list(map(str, command)), cwd=self.folder, check=True)
+        self._header = header
+
+    def users_of(self, header):
+        """The files of the room, tests that include it themselves among them, that must be compiled with it."""
+        users = []
+        for file in self._entries:
+            if file.startswith(self.room + "/") and (
+                    not file.endswith("_test.cpp") or f'"{header}"' in INCLUDE.findall(self.text(file))):
+                if header in self._included_by(file, {}):
+                    users.append(file)
+        return users
+
+    def _included_by(self, file, seen):
+        for name in INCLUDE.findall(self.text(file)):
+            path = name.strip('"')
+            if name.startswith('"') and path not in seen and (self.root / path).exists():
+                seen[path] = True
+                self._included_by(path, seen)
+        return seen
+
+    # ---- linking
+
+    def link(self, objects, output):
+        """Links the program with other objects for some files. What the linker says; None when it is content."""
+        replaced = {self.object_of(file): str(path) for file, path in objects.items()}
+        words = [replaced.pop(word, word) for word in self._link]
+        position = words.index("-o")
+        words[position + 1] = str(output)
+        # What the program takes from an archive it takes from here first.
+        words[position:position] = replaced.values()
+        result = subprocess.run([*words, "-fuse-ld=lld", "-Wl,--strip-all"], cwd=self.folder, capture_output=True,
+                                text=True, check=False)
+        return result.stderr if result.returncode != 0 else None
+
+
+def link_words(command, program):
+    """The linker's part of a command of the build, which may stand between others."""
+    for part in command.split("&&"):
+        words = shlex.split(part)
+        if "-o" in words and words[words.index("-o") + 1].endswith(program):
+            return words
+    raise ValueError(f"no command that links {program}: {command}")

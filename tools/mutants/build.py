@@ -1,5 +1,6 @@
 """What a build knows: how a file of it is compiled, how its test program is linked."""
 
+import functools
 import json
 import os
 import re
@@ -53,10 +54,13 @@ class Build:
         words = shlex.split(self._entries[file]["command"])
         return words[words.index("-o") + 1]
 
-    def compile(self, file, source, output, extra=(), level="-O0"):
-        """Compiles the source in the way of the file. What the compiler says; None when it is content."""
-        header = ["-include", self._header] if self._header and level == "-O0" else []
-        command = [*self.flags(file), level, *extra, *header, "-c", source, "-o", output]
+    def compile(self, file, source, output, headers=None, level="-O0"):
+        """Compiles the source in the way of the file; headers are looked for in the folder `headers` first. What
+        the compiler says; None when it is content."""
+        compiler, *flags = self.flags(file)
+        first = [f"-I{headers}"] if headers else []
+        included = ["-include", self._header] if self._header and level == "-O0" else []
+        command = [compiler, *first, *flags, level, *included, "-c", source, "-o", output]
         result = subprocess.run(list(map(str, command)), cwd=self.folder, capture_output=True, text=True, check=False)
         return result.stderr if result.returncode != 0 else None
 
@@ -74,21 +78,21 @@ class Build:
 
     def users_of(self, header):
         """The files of the room, tests that include it themselves among them, that must be compiled with it."""
-        users = []
-        for file in self._entries:
-            if file.startswith(self.room + "/") and (
-                    not file.endswith("_test.cpp") or f'"{header}"' in INCLUDE.findall(self.text(file))):
-                if header in self._included_by(file, {}):
-                    users.append(file)
-        return users
+        own = (file for file in self._entries if file.startswith(self.room + "/"))
+        return [file for file in own if header in (
+            self._own_includes(file) if file.endswith("_test.cpp") else self._included_by(file, set()))]
 
     def _included_by(self, file, seen):
-        for name in INCLUDE.findall(self.text(file)):
-            path = name.strip('"')
-            if name.startswith('"') and path not in seen and (self.root / path).exists():
-                seen[path] = True
+        for path in self._own_includes(file):
+            if path not in seen:
+                seen.add(path)
                 self._included_by(path, seen)
         return seen
+
+    @functools.cache
+    def _own_includes(self, file):
+        quoted = (name.strip('"') for name in INCLUDE.findall(self.text(file)) if name.startswith('"'))
+        return [path for path in quoted if (self.root / path).exists()]
 
     # ---- linking
 
@@ -96,10 +100,8 @@ class Build:
         """Links the program with other objects for some files. What the linker says; None when it is content."""
         replaced = {self.object_of(file): str(path) for file, path in objects.items()}
         words = [replaced.pop(word, word) for word in self._link]
-        position = words.index("-o")
-        words[position + 1] = str(output)
-        # What the program takes from an archive it takes from here first.
-        words[position:position] = replaced.values()
+        words[words.index("-o") + 1] = str(output)
+        words[1:1] = replaced.values()  # what the program takes from an archive it takes from these first
         result = subprocess.run([*words, "-fuse-ld=lld", "-Wl,--strip-all"], cwd=self.folder, capture_output=True,
                                 text=True, check=False)
         return result.stderr if result.returncode != 0 else None

@@ -63,7 +63,7 @@ class Value:
     name: str
     first: int
     last: int
-    scope: int  # which scope it stands in; neighbours have the same
+    scope: str  # where it stands: "namespace 3" or "class 4"
     is_function: bool
 
 
@@ -76,13 +76,13 @@ class Source(Tokens):
         self.values = []
         self.bodies = set()  # the braces that open a block; any other opens a list of values
         self._scopes = 0
-        self._scope(0, len(self.tokens))
+        self._scope("namespace", 0, len(self.tokens))
 
     # ---- outside of functions
 
-    def _scope(self, index, end):
+    def _scope(self, kind, index, end):
         self._scopes += 1
-        scope = self._scopes
+        scope = f"{kind} {self._scopes}"
         while index < end:
             word = self.at(index)
             if word in (";", "[") or (word == "extern" and self.tokens[index + 1].kind == "text"):
@@ -94,7 +94,7 @@ class Source(Tokens):
             elif word in SKIPPED:
                 index = self._semicolon(index) + 1
             elif (brace := self._inner_scope(index, end)) is not None:
-                self._scope(brace + 1, self.partners[brace])
+                self._scope(word, brace + 1, self.partners[brace])
                 index = self.partners[brace] + 1
             else:
                 index = self._declaration(index, end, scope)

@@ -71,7 +71,7 @@ class Trials:
         for file in self._build.users_of(place.file) if is_header else [place.file]:
             source = self._build.root / file if is_header else folder / file
             objects[file] = folder / f"{len(objects)}.o"
-            if self._build.compile(file, source, objects[file], [f"-I{folder}"] * is_header) is not None:
+            if self._build.compile(file, source, objects[file], folder if is_header else None) is not None:
                 return None
         return objects
 
@@ -116,33 +116,45 @@ def chosen_places(places, options, seed):
 
 
 def show(place, verdict, note=""):
-    print(f"{place.file}:{place.line}: {place.function}: {place.kind}: {verdict}\n  - {place.before}\n  + {place.after}")
+    print(f"{place.file}:{place.line}: {place.function}: {place.kind}: {verdict}")
+    print(f"  - {place.before}\n  + {place.after}")
     if note:
         print(f"  ({note})")
     sys.stdout.flush()
 
 
-def try_all(trials, chosen, explained, jobs):
-    """Tries the places and tells of those that need a word; the verdicts counted, and how many are bad."""
+def judge(place, verdict, why, explained):
+    """The verdict in the light of the kept list, and whether it is a bad one; tells of it if it needs a word."""
+    entry = explained.get(place.key())
+    if entry and verdict == KILLED:
+        show(place, f"is kept as equivalent, but {why} sees it", entry["why"])
+        return KILLED, True
+    if entry and verdict == SURVIVED:
+        show(place, "equivalent", entry["why"])
+        return "equivalent", False
+    if verdict == SURVIVED:
+        show(place, verdict)
+    return verdict, verdict == SURVIVED
+
+
+def try_all(trials, chosen, explained, options):
+    """Tries the places; the verdicts counted, and how many are bad. All are written to a file."""
     counts, bad = Counter(), 0
-    with ThreadPoolExecutor(jobs) as pool:
+    with ThreadPoolExecutor(options.jobs) as pool, open(options.build / "verdicts", "w", encoding="utf-8") as file:
         waiting = {pool.submit(trials.run, number, place): place for number, place in enumerate(chosen)}
-        for done, future in enumerate(as_completed(waiting), 1):
-            place = waiting[future]
-            verdict, why = future.result()
-            entry = explained.get(place.key())
-            if entry and verdict == KILLED:
-                bad += 1
-                show(place, f"is kept as equivalent, but {why} sees it", entry["why"])
-            elif entry and verdict == SURVIVED:
-                verdict = "equivalent"
-                show(place, verdict, entry["why"])
-            elif verdict == SURVIVED:
-                bad += 1
-                show(place, verdict)
-            counts[verdict] += 1
-            if done % 50 == 0:
-                print(f"{done} of {len(chosen)} tried", file=sys.stderr, flush=True)
+        try:
+            for done, future in enumerate(as_completed(waiting), 1):
+                place, (verdict, why) = waiting[future], future.result()
+                verdict, is_bad = judge(place, verdict, why, explained)
+                counts[verdict] += 1
+                bad += is_bad
+                at = f"{place.file}:{place.line}"
+                print(verdict, why, at, place.kind, place.before, place.after, sep="\t", file=file)
+                if done % 50 == 0:
+                    print(f"{done} of {len(chosen)} tried", file=sys.stderr, flush=True)
+        except BaseException:
+            pool.shutdown(wait=False, cancel_futures=True)
+            raise
     return counts, bad
 
 
@@ -166,16 +178,17 @@ def options_of(arguments):
 
 def main(arguments):
     options, start = options_of(arguments), time.monotonic()
+    options.build = options.build.resolve()
     seed = int(os.environ.setdefault("KOVA_SEED", str(random.randrange(1 << 31))))
     print(f"KOVA_SEED={seed}", flush=True)
-    build = Build(ROOT, options.build.resolve(), ROOM, PROGRAM)
+    build = Build(ROOT, options.build, ROOM, PROGRAM)
     places, explained = all_places(build), kept.read(KEPT)
     kept.check(explained, places)
     chosen = chosen_places(places, options, seed)
     folder = build.folder / "mutants"
     shutil.rmtree(folder, ignore_errors=True)
     folder.mkdir()
-    counts, bad = try_all(Trials(build, folder), chosen, explained, options.jobs)
+    counts, bad = try_all(Trials(build, folder), chosen, explained, options)
     print(summary(counts, chosen, places, start))
     return 1 if bad else 0
 

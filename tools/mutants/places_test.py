@@ -22,7 +22,8 @@ def inside(kind, text, type_="void"):
 class Conditions(unittest.TestCase):
     def test_are_negated(self):
         for before, after in (("a", "!(a)"), ("!a", "a"), ("a == b", "a != b"), ("a < b", "a >= b"),
-                              ("a && b", "!(a && b)"), ("f(a < b)", "!(f(a < b))"), ("const A* a = b", "const A* a = b; !a")):
+                              ("a && b", "!(a && b)"), ("f(a < b)", "!(f(a < b))"),
+                              ("const A* a = b", "const A* a = b; !a")):
             self.assertEqual(inside("condition negated", f"if ({before}) {{ }}"), [f"if ({after}) {{ }}"])
 
     def test_of_loops_are_too_but_not_made_endless(self):
@@ -58,7 +59,8 @@ class Expressions(unittest.TestCase):
         self.assertEqual(results("text changed", '#include "a.h"\nstatic_assert(a, "b");'), [])
 
     def test_comparisons_are_not_brackets_of_templates(self):
-        self.assertEqual(sorted(inside("comparison changed", "a = f<B>(c < d);")), ["a = f<B>(c <= d);", "a = f<B>(c >= d);"])
+        self.assertEqual(sorted(inside("comparison changed", "a = f<B>(c < d);")),
+                         ["a = f<B>(c <= d);", "a = f<B>(c >= d);"])
 
     def test_arms_of_a_choice_change_places(self):
         self.assertEqual(inside("arms of a choice swapped", "f(a ? b(c, d) : E::e, g);"), ["f(a ? E::e : b(c, d), g);"])
@@ -86,7 +88,8 @@ class Expressions(unittest.TestCase):
 
 class Steps(unittest.TestCase):
     def test_are_dropped(self):
-        self.assertEqual(inside("statement dropped", "a(); if (b) { return; }"), ["if (b) { return; }", "a(); if (b) { }"])
+        self.assertEqual(inside("statement dropped", "a(); if (b) { return; }"),
+                         ["if (b) { return; }", "a(); if (b) { }"])
 
     def test_whose_names_are_used_or_whose_answer_is_needed_are_not(self):
         self.assertEqual(inside("statement dropped", "A a(b); return a;", "int"), [])
@@ -102,9 +105,11 @@ class Steps(unittest.TestCase):
 
     def test_that_depend_or_whose_order_does_not_show_do_not(self):
         for code in ("const A a = b(); c(a);", "a(); return;", "A a; b();", "const auto a = MakeRef<A>(); b();",
-                     "a->SetB(1); a->SetC(2);"):
+                     "a->SetB(1); a->SetC(2);", "a.push_back(c); b.push_back(!d[c].e);"):
             self.assertEqual(inside("statements swapped", code), [], code)
-        self.assertEqual(len(inside("statements swapped", "a->SetB(1); d->SetC(2);")), 1)
+        for code in ("a->SetB(1); d->SetC(2);", "a.push_back(b); a.push_back(c);", "a.push_back(c); b.push_back(a);",
+                     "a.push_back(f()); b.push_back(g());"):
+            self.assertEqual(len(inside("statements swapped", code)), 1, code)
 
     def test_go_over_the_edge_of_a_lock(self):
         code = "a(); { const Guard g(m); b(); c(); } d();"
@@ -135,7 +140,8 @@ class WholeFunctions(unittest.TestCase):
         self.assertEqual(inside("other exceptions swallowed", "try { a(); } catch (...) { }"), [])
 
     def test_leave_a_member_alone(self):
-        self.assertEqual(results("initializer dropped", "A::A() : _b(1), _c{2} {}"), ["A::A() : _c{2} {}", "A::A() : _b(1) {}"])
+        self.assertEqual(results("initializer dropped", "A::A() : _b(1), _c{2} {}"),
+                         ["A::A() : _c{2} {}", "A::A() : _b(1) {}"])
 
 
 class Definitions(unittest.TestCase):
@@ -143,6 +149,9 @@ class Definitions(unittest.TestCase):
         code = "const A a = f();\nconst A b = g();"
         self.assertEqual(results("definitions swapped", code), ["const A b = g();\nconst A a = f();"])
         self.assertEqual(results("definitions swapped", code, "a.h"), [])
+
+    def test_of_a_class_stay(self):
+        self.assertEqual(results("definitions swapped", "namespace A { struct B { C c; D d; }; }"), [])
 
 
 class Places(unittest.TestCase):

@@ -10,6 +10,7 @@ from token_changes import COMPARISONS, edit, swapped
 # What these do nobody sees but a clock: nothing is told by leaving them out or moving them.
 WITHOUT_OUTCOME = re.compile(r"[\w.>()*-]*\b[rR]eserve\(")
 FRESH_OBJECT = re.compile(r"(const )?\S.* (= )?((Tessa::)?MakeRef<[^;]*>\(\);|\w+;)", re.DOTALL)
+APPENDING = re.compile(r"(\w+)\.push_back\(([^()]*)\);")
 SETTER = re.compile(r"(\w+)(->|\.)Set\w+\(")
 
 
@@ -83,8 +84,16 @@ def is_exchangeable(source, one, two):
     name = source.declared(one.first, one.last)
     if name and is_used(source, name, two.first, two.last):
         return False
-    first, second = (SETTER.match(source.words(s.first, s.last)) for s in (one, two))
-    return not (first and second and first[1] == second[1])  # fields of one object, set in either order
+    return not is_order_unseen(*(source.words(s.first, s.last) for s in (one, two)))
+
+
+def is_order_unseen(one, two):
+    """Whether they set two fields of one object, or append to two lists what neither list is asked for."""
+    first, second = SETTER.match(one), SETTER.match(two)
+    if first and second:
+        return first[1] == second[1]
+    first, second = APPENDING.fullmatch(one), APPENDING.fullmatch(two)
+    return bool(first and second) and first[1] not in (second[1], second[2]) and second[1] not in first[2]
 
 
 def is_fresh(source, statement):
@@ -189,8 +198,8 @@ GENERATORS = (conditions, dropped, exchanged, moved_over_edges, cut_short, handl
 
 
 def neighbouring_values(source):
-    """Two neighbouring variables outside of functions, made in the other order."""
+    """Two neighbouring variables outside of functions and classes, made in the other order."""
     for one, two in zip(source.values, source.values[1:]):
-        if one.scope == two.scope and two.first == one.last + 1:
+        if one.scope == two.scope and one.scope.startswith("namespace") and two.first == one.last + 1:
             if not (one.is_function or two.is_function or is_used(source, one.name, two.first, two.last)):
                 yield "definitions swapped", swapped(source, (one.first, one.last), (two.first, two.last))

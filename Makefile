@@ -133,11 +133,13 @@ tls-check:
 
 # Changes the plug-in one place at a time and tells which changes no test sees: of COUNT (200) places, of the files
 # or folders FILE, or of ALL=1.
+MUTANT_TESTS := kova_agentd_test example_hosts_test kernel_failures_test model_check_test
+
 mutants:
 	@$(SETUP) build test mutants
 	@cmake --preset mutants >/dev/null
-	@cmake --build --preset mutants -j $(JOBS) --target kova_agentd_test
-	@python3 -B tools/mutants/mutants.py build/mutants --jobs $(JOBS) --count $(or $(COUNT),200) \
+	@cmake --build --preset mutants -j $(JOBS) --target $(MUTANT_TESTS)
+	@python3 -B tools/mutants/mutants.py build/mutants $(MUTANT_TESTS) --jobs $(JOBS) --count $(or $(COUNT),200) \
 	  $(if $(ALL),--all) $(if $(FILE),--file $(FILE))
 
 clean:

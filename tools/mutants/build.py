@@ -1,4 +1,4 @@
-"""What a build knows: how a file of it is compiled, how its test program is linked."""
+"""What a build knows: how a file of it is compiled, how its test programs are linked."""
 
 import functools
 import json
@@ -13,17 +13,14 @@ INCLUDE = re.compile(r'^\s*#\s*include\s+([<"][^>"]+[>"])', re.MULTILINE)
 
 
 class Build:
-    """A build folder whose test program is up to date. `room` is the folder of the sources that are changed."""
+    """A build folder whose programs are up to date. `room` is the folder of the sources that are changed."""
 
-    def __init__(self, root, folder, room, program):
+    def __init__(self, root, folder, room, programs):
         self.root, self.folder, self.room = Path(root), Path(folder), room
         with open(self.folder / "compile_commands.json", encoding="utf-8") as file:
             entries = json.load(file)
         self._entries = {os.path.relpath(entry["file"], self.root): entry for entry in entries}
-        commands = subprocess.run(["ninja", "-C", self.folder, "-t", "commands", program], check=True,
-                                  capture_output=True, text=True).stdout
-        self._link = link_words(commands.splitlines()[-1], program)
-        self.program = self.folder / self._link[self._link.index("-o") + 1]
+        self._links = {program: self._link_words(program) for program in programs}
         self._header = None
 
     def files(self, *suffixes):
@@ -96,21 +93,27 @@ class Build:
 
     # ---- linking
 
-    def link(self, objects, output):
+    def program(self, name):
+        """Where the build has put the program."""
+        words = self._links[name]
+        return self.folder / words[words.index("-o") + 1]
+
+    def link(self, program, objects, output):
         """Links the program with other objects for some files. What the linker says; None when it is content."""
         replaced = {self.object_of(file): str(path) for file, path in objects.items()}
-        words = [replaced.pop(word, word) for word in self._link]
+        words = [replaced.pop(word, word) for word in self._links[program]]
         words[words.index("-o") + 1] = str(output)
         words[1:1] = replaced.values()  # what the program takes from an archive it takes from these first
         result = subprocess.run([*words, "-fuse-ld=lld", "-Wl,--strip-all"], cwd=self.folder, capture_output=True,
                                 text=True, check=False)
         return result.stderr if result.returncode != 0 else None
 
-
-def link_words(command, program):
-    """The linker's part of a command of the build, which may stand between others."""
-    for part in command.split("&&"):
-        words = shlex.split(part)
-        if "-o" in words and words[words.index("-o") + 1].endswith(program):
-            return words
-    raise ValueError(f"no command that links {program}: {command}")
+    def _link_words(self, program):
+        """The linker's part of the build's last command for the program, which may stand between others."""
+        commands = subprocess.run(["ninja", "-C", self.folder, "-t", "commands", program], check=True,
+                                  capture_output=True, text=True).stdout
+        for part in commands.splitlines()[-1].split("&&"):
+            words = shlex.split(part)
+            if "-o" in words and words[words.index("-o") + 1].endswith(program):
+                return words
+        raise ValueError(f"no command that links {program}")

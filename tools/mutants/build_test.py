@@ -45,7 +45,7 @@ class Building(unittest.TestCase):
                    for name in ("answer", "other", "answer_test")]
         (self.root / "build/compile_commands.json").write_text(json.dumps(entries), encoding="utf-8")
         subprocess.run(["ninja", "-C", self.root / "build", "program"], check=True, capture_output=True)
-        self.build = Build(self.root, self.root / "build", "room", "program")
+        self.build = Build(self.root, self.root / "build", "room", ["program"])
 
     def write(self, folder, sources):
         for name, text in sources.items():
@@ -54,7 +54,7 @@ class Building(unittest.TestCase):
 
     def result_with(self, objects):
         """What the program returns when it is linked with these objects."""
-        self.assertIsNone(self.build.link(objects, self.root / "changed"))
+        self.assertIsNone(self.build.link("program", objects, self.root / "changed"))
         return subprocess.run([self.root / "changed"], check=False).returncode
 
     def compiled(self, file, source, headers=None):
@@ -82,7 +82,7 @@ class Building(unittest.TestCase):
         self.write(self.root / "new", {"bad.cpp": "int Answer() { return x; }", "empty.cpp": ""})
         self.assertIn("error", self.build.compile("room/answer.cpp", self.root / "new/bad.cpp", self.root / "bad.o"))
         empty = self.compiled("room/other.cpp", self.root / "new/empty.cpp")
-        self.assertIn("main", self.build.link({"room/answer_test.cpp": empty}, self.root / "changed"))
+        self.assertIn("main", self.build.link("program", {"room/answer_test.cpp": empty}, self.root / "changed"))
 
     def test_reaches_all_that_include_a_header_and_the_tests_that_name_it(self):
         self.assertEqual(self.build.users_of("room/answer.h"), ["room/answer.cpp", "room/answer_test.cpp"])

@@ -1,9 +1,9 @@
 #!/usr/bin/env python3
 """Changes the plug-in one place at a time and tells which changes its tests do not see.
 
-    mutants.py BUILD_DIR [--all] [--file PATH...] [--count N] [--jobs N]
+    mutants.py BUILD_DIR TEST_PROGRAM... [--all] [--file PATH...] [--count N] [--jobs N]
 
-The sources stay as they are: a changed copy is compiled, the test program is linked with it and run. Places
+The sources stay as they are: a changed copy is compiled, the test programs are linked with it and run. Places
 are drawn by a seed, which is printed; KOVA_SEED brings a draw back. Status 1: a change survived that
 equivalent.toml does not explain, or the list explains one that a test sees.
 """
@@ -27,7 +27,6 @@ from places import changed, places_of
 HERE = Path(__file__).resolve().parent
 ROOT = HERE.parent.parent
 ROOM = "kova/agentd"
-PROGRAM = "kova_agentd_test"
 KEPT = HERE / "equivalent.toml"
 KILLED, SURVIVED, SAME_CODE, INVALID = "killed", "survived", "the same code", "does not compile"
 
@@ -35,11 +34,11 @@ KILLED, SURVIVED, SAME_CODE, INVALID = "killed", "survived", "the same code", "d
 class Trials:
     """Tries changes, each in a folder of its own."""
 
-    def __init__(self, build, folder):
-        self._build, self._folder = build, folder
+    def __init__(self, build, folder, programs):
+        self._build, self._folder, self._unit_tests = build, folder, programs[0]
         self._order = testrun.Order(build.root, build.room)
         build.precompile(folder)
-        self._limit = 10 + 5 * testrun.whole_run(build.program, folder)
+        self._limits = {name: 10 + 5 * testrun.whole_run(build.program(name), folder) for name in programs}
 
     def run(self, number, place):
         """The verdict on one place, and which test gave it."""
@@ -54,14 +53,15 @@ class Trials:
         source = folder / place.file
         source.parent.mkdir(parents=True)
         source.write_text(changed(self._build.text(place.file), place.edits), encoding="utf-8")
-        program = folder / "program"
         objects = self._compiled(place, folder)
-        if objects is None or self._build.link(objects, program) is not None:
+        if objects is None:
             return INVALID, ""
-        why = self._failing_test(place, folder, program)
-        if why is not None:
-            self._order.learn(place.file, why)
-            return KILLED, why
+        for name in self._limits:
+            if self._build.link(name, objects, folder / name) is not None:
+                return INVALID, ""
+            why = self._failing_test(place, folder, name)
+            if why is not None:
+                return KILLED, why
         return (SAME_CODE if self._is_same_code(place, folder) else SURVIVED), ""
 
     def _compiled(self, place, folder):
@@ -75,11 +75,13 @@ class Trials:
                 return None
         return objects
 
-    def _failing_test(self, place, folder, program):
-        first = self._order.first(place.file)
+    def _failing_test(self, place, folder, name):
+        first = self._order.first(place.file) if name == self._unit_tests else ""
         for chosen in filter(None, (first, f"-{first}" if first else "*")):
-            outcome = testrun.run(program, chosen, folder, self._limit)
+            outcome = testrun.run(folder / name, chosen, folder, self._limits[name])
             if outcome.failed:
+                if name == self._unit_tests:
+                    self._order.learn(place.file, outcome.why)
                 return outcome.why
         return None
 
@@ -169,6 +171,7 @@ def summary(counts, chosen, places, start):
 def options_of(arguments):
     parser = argparse.ArgumentParser(description=__doc__.splitlines()[0])
     parser.add_argument("build", type=Path)
+    parser.add_argument("tests", nargs="+", help="programs of the build; the unit tests come first")
     parser.add_argument("--all", action="store_true", help="every place")
     parser.add_argument("--file", nargs="+", help="every place of these files or folders")
     parser.add_argument("--count", type=int, default=200, help="places to draw")
@@ -181,14 +184,14 @@ def main(arguments):
     options.build = options.build.resolve()
     seed = int(os.environ.setdefault("KOVA_SEED", str(random.randrange(1 << 31))))
     print(f"KOVA_SEED={seed}", flush=True)
-    build = Build(ROOT, options.build, ROOM, PROGRAM)
+    build = Build(ROOT, options.build, ROOM, options.tests)
     places, explained = all_places(build), kept.read(KEPT)
     kept.check(explained, places)
     chosen = chosen_places(places, options, seed)
     folder = build.folder / "mutants"
     shutil.rmtree(folder, ignore_errors=True)
     folder.mkdir()
-    counts, bad = try_all(Trials(build, folder), chosen, explained, options)
+    counts, bad = try_all(Trials(build, folder, options.tests), chosen, explained, options)
     print(summary(counts, chosen, places, start))
     return 1 if bad else 0
 

@@ -123,10 +123,16 @@ TEST(AddPlan, KeepsCapacityFlashFromHybridGroups) {
 }
 
 TEST(AddPlan, HasWordsForEveryReason) {
-  for (const LeftOver reason : {LeftOver::NotEligible, LeftOver::NoCacheDisk, LeftOver::NoCapacityDisk,
-                                LeftOver::GroupsFull, LeftOver::TooManyGroups}) {
-    EXPECT_STRNE(Describe(reason), "");
-  }
+  EXPECT_STREQ(Describe(LeftOver::NotEligible), "not eligible");
+  EXPECT_STREQ(Describe(LeftOver::NoCacheDisk),
+               "no flash disk is free to be its cache, and no group of its kind can grow");
+  EXPECT_STREQ(Describe(LeftOver::NoCapacityDisk), "no capacity disk is left for it to be the cache of");
+  EXPECT_STREQ(Describe(LeftOver::GroupsFull), "every group has 7 capacity disks");
+  EXPECT_STREQ(Describe(LeftOver::TooManyGroups), "a host has at most 5 groups");
+}
+
+TEST(AddPlan, HasNoWordsForWhatIsNoReason) {
+  EXPECT_STREQ(Describe(static_cast<LeftOver>(99)), "");
 }
 
 }  // namespace

@@ -45,6 +45,11 @@ TEST(ExtendableGroups, AreThoseOfTheKindThatAreNotHeldBack) {
   EXPECT_THAT(ExtendableGroups({}, false), IsEmpty());
 }
 
+TEST(ExtendableGroups, AreHybridAndNotHeldBackUnlessTheyAreCalledOtherwise) {
+  EXPECT_THAT(ExtendableGroups({ExistingGroup()}, false), ElementsAre(0));
+  EXPECT_THAT(ExtendableGroups({ExistingGroup()}, true), IsEmpty());
+}
+
 TEST(DealCapacityDisks, GoesRoundTheEntriesInOrder) {
   const Deal deal = DealCapacityDisks({0, 0}, 5);
   ASSERT_EQ(deal.shares.size(), 2u);

@@ -105,7 +105,8 @@ class Steps(unittest.TestCase):
 
     def test_that_depend_or_whose_order_does_not_show_do_not(self):
         for code in ("const A a = b(); c(a);", "a(); return;", "A a; b();", "const auto a = MakeRef<A>(); b();",
-                     "a->SetB(1); a->SetC(2);", "a.push_back(c); b.push_back(!d[c].e);"):
+                     "a->SetB(1); a->SetC(2);", "a.push_back(c); b.push_back(!d[c].e);",
+                     "a.b.push_back({c}); a.d.push_back(c);"):
             self.assertEqual(inside("statements swapped", code), [], code)
         for code in ("a->SetB(1); d->SetC(2);", "a.push_back(b); a.push_back(c);", "a.push_back(c); b.push_back(a);",
                      "a.push_back(f()); b.push_back(g());"):

@@ -10,7 +10,7 @@ from token_changes import COMPARISONS, edit, swapped
 # What these do nobody sees but a clock: nothing is told by leaving them out or moving them.
 WITHOUT_OUTCOME = re.compile(r"[\w.>()*-]*\b[rR]eserve\(")
 FRESH_OBJECT = re.compile(r"(const )?\S.* (= )?((Tessa::)?MakeRef<[^;]*>\(\);|\w+;)", re.DOTALL)
-APPENDING = re.compile(r"(\w+)\.push_back\(([^()]*)\);")
+APPENDING = re.compile(r"([\w.]+)\.push_back\(([^()]*)\);")
 SETTER = re.compile(r"(\w+)(->|\.)Set\w+\(")
 
 
@@ -93,7 +93,7 @@ def is_order_unseen(one, two):
     if first and second:
         return first[1] == second[1]
     first, second = APPENDING.fullmatch(one), APPENDING.fullmatch(two)
-    return bool(first and second) and first[1] not in (second[1], second[2]) and second[1] not in first[2]
+    return bool(first and second) and first[1] != second[1] and first[1] not in second[2] and second[1] not in first[2]
 
 
 def is_fresh(source, statement):

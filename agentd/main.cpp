@@ -13,6 +13,7 @@
 #include "agentd/ListenOptions.h"
 #include "agentd/Trace.h"
 #include "agentd/http/HttpServer.h"
+#include "agentd/routes/Refusals.h"
 #include "agentd/routes/Routes.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "host/Build.h"
@@ -101,6 +102,7 @@ void Serve(Options& options) {
         router.Serve(request, responder);
       },
       [&router](const Agentd::HttpRequest& head) { return router.Admit(head); });
+  server.OnRefusal(&Agentd::ToldAt);
   router.OnLoad([&server] { return server.Now(); });
   server.OnStopping([&tasks] { tasks.Close(); });
   WriteReadyFile(options.readyFile, server.Addresses());

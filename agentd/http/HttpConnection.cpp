@@ -105,7 +105,7 @@ void HttpConnection::OnHeader(Error error) {
   const HttpHeader& header = _parser->get();
   _form = {header.version(), header.method() != http::verb::head, _parser->keep_alive()};
   if (auto refusal = RefusalOf(header, _door)) {
-    Refuse(std::move(*refusal));
+    TellRefusal(std::move(*refusal));
     return;
   }
   _request = RequestOf(header, _door, _peer);
@@ -172,7 +172,7 @@ void HttpConnection::GiveUp(Error error) {
     _context.onRefused(HttpRefusal::Bodies, _peer.identity);
   }
   if (auto refusal = tooLate ? RefusedWith(408, "the request took too long") : RefusalOf(error)) {
-    Refuse(std::move(*refusal));
+    TellRefusal(std::move(*refusal));
   }
 }
 
@@ -250,6 +250,12 @@ void HttpConnection::Refuse(HttpAnswer answer) {
   _refused = true;
   Compose(std::move(answer));
   Write();
+}
+
+void HttpConnection::TellRefusal(HttpAnswer refusal) {
+  const bool isAsked = _context.tell && _parser->is_header_done();
+  Refuse(isAsked ? _context.tell(WhatIsAsked(_parser->get()).target, std::move(refusal))
+                 : std::move(refusal));
 }
 
 void HttpConnection::Write() {

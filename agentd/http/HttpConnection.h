@@ -40,6 +40,7 @@ struct HttpContext {
   std::optional<boost::asio::ssl::context> tls;
   HttpDeferringHandler handler;
   HttpAdmit admit;                                                     // may be empty
+  HttpTell tell = {};                                                  // may be empty
   std::function<void(HttpRefusal, const std::string& who)> onRefused;  // told on the network's thread
   boost::asio::io_context& network;
   boost::asio::thread_pool& workers;
@@ -96,6 +97,8 @@ class HttpConnection : public std::enable_shared_from_this<HttpConnection> {
   void Decline(HttpAnswer answer);
   // Answers without having read a request to its end, and closes.
   void Refuse(HttpAnswer answer);
+  // The same with a refusal of the server's own, in the form that is usual at the request's target.
+  void TellRefusal(HttpAnswer refusal);
   // What is left of the answer.
   void Write();
   void OnWritten(Error error);

@@ -116,6 +116,7 @@ class HttpServer::Impl {
     asio::post(_network, [this] { BeginDrain(); });
   }
   void OnStopping(std::function<void()> listener) { _onStopping = std::move(listener); }
+  void OnRefusal(HttpTell tell) { _context.tell = std::move(tell); }
 
  private:
   void Listen(const HttpAddress& address);
@@ -345,6 +346,9 @@ bool HttpServer::Run() {
 }
 void HttpServer::Stop() {
   _impl->Stop();
+}
+void HttpServer::OnRefusal(HttpTell tell) {
+  _impl->OnRefusal(std::move(tell));
 }
 void HttpServer::OnStopping(std::function<void()> listener) {
   _impl->OnStopping(std::move(listener));

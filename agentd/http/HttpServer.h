@@ -31,6 +31,10 @@ using HttpDeferringHandler = std::function<void(const HttpRequest&, const HttpRe
 // Called on the thread in Run, which waits for it.
 using HttpAdmit = std::function<HttpAdmission(const HttpRequest& head)>;
 
+// How a refusal of the server's own is told to a client of that target: the answer, which is a line of text,
+// in the form that is usual there. Called on the thread in Run, which waits for it.
+using HttpTell = std::function<HttpAnswer(std::string_view target, HttpAnswer refusal)>;
+
 class HttpServer {
  public:
   // Binds the addresses (Unix sockets with mode 0660) and listens; from here on SIGTERM and SIGINT are the
@@ -46,6 +50,9 @@ class HttpServer {
 
   // Any thread.
   HttpLoad Now() const;
+
+  // Refusals whose target is known are told by `tell`. Set before Run; without it they are lines of text.
+  void OnRefusal(HttpTell tell);
 
   // Told, on the thread in Run, when the server stops accepting, and before it waits for what is in flight.
   // Set before Run.

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <future>
 #include <memory>
 #include <vector>
 
@@ -142,6 +143,26 @@ TEST(HttpServerBodies, HoldTheirRoomUntilTheyAreHandled) {
   EXPECT_EQ(other.Receive().status, 503u);
   gate.Open();
   EXPECT_EQ(client.Receive().status, 200u);
+}
+
+TEST(HttpServerRefusals, AreToldAsIsUsualAtTheirTarget) {
+  HttpServer server(Options({.bodyBytes = 10}), &Testing::Echo);
+  server.OnRefusal([](std::string_view target, HttpAnswer refusal) {
+    refusal.body = std::string(target) + ": " + refusal.body;
+    return refusal;
+  });
+  auto run = std::async(std::launch::async, [&server] { return server.Run(); });
+  const auto answerTo = [&server](const std::string& text) {
+    RawClient client(server.Addresses().front().place);
+    client.Send(text);
+    return client.Receive();
+  };
+  EXPECT_EQ(answerTo(Post("http://x/a", 11)).body, "/a: the body is too large\n");
+  EXPECT_EQ(answerTo("GET /b HTTP/1.1\r\n\r\n").body.substr(0, 4), "/b: ");
+  EXPECT_EQ(answerTo("GET /c HTTP/1.1\r\nbroken\r\n\r\n").body.substr(0, 13), "not a request")
+      << "of no target";
+  server.Stop();
+  EXPECT_TRUE(run.get());
 }
 
 }  // namespace

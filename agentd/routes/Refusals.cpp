@@ -3,7 +3,9 @@
 #include <algorithm>
 
 #include "agentd/routes/JsonAnswers.h"
+#include "agentd/tasks/Busy.h"
 #include "host/Refusal.h"
+#include "nox/Faults.h"
 #include "orbis/ParseException.h"
 #include "orbis/Types.h"
 
@@ -33,6 +35,22 @@ HttpAnswer RefusalAt(std::string_view path, unsigned status, const std::string& 
   HttpAnswer http = ToHttp(Host::Answer{.result = nullptr, .fault = fault});
   http.status = status;
   return http;
+}
+
+HttpAnswer ToldAt(std::string_view path, HttpAnswer refusal) {
+  if (!IsForPrograms(path)) {
+    return refusal;
+  }
+  const std::string reason = refusal.body.substr(0, refusal.body.find('\n'));
+  HttpAnswer told = RefusalAt(path, refusal.status, reason);
+  if (refusal.status == 503) {
+    const auto busy = TooBusy("nox.agentd.door.tooMuch", reason);
+    busy->SetRetryAfterSeconds(refusal.retryAfterSeconds);
+    told = ToHttp(Host::Answer{.result = nullptr, .fault = busy});
+  }
+  refusal.contentType = std::move(told.contentType);
+  refusal.body = std::move(told.body);
+  return refusal;
 }
 
 HttpAnswer RefusalAt(std::string_view path, const Orbis::ParseException& refused) {

@@ -23,4 +23,7 @@ HttpAnswer RefusalAt(std::string_view path, unsigned status, const std::string& 
 // 400 for a body that cannot be read; the argument is the place in it.
 HttpAnswer RefusalAt(std::string_view path, const Orbis::ParseException& refused);
 
+// A line of text that the server itself refuses with, as a client of that path is told it.
+HttpAnswer ToldAt(std::string_view path, HttpAnswer refusal);
+
 }  // namespace Agentd

@@ -10,6 +10,7 @@
 #include "agentd/testing/FakeApi.h"
 #include "agentd/testing/RunningServer.h"
 #include "host/Answer.h"
+#include "nox/Faults.h"
 #include "orbis/ParseException.h"
 #include "orbis/Types.h"
 
@@ -46,6 +47,28 @@ TEST(Refusals, OfABodyNameThePlace) {
   const HttpAnswer http = RefusalAt("/api/v1/AddDisks", Orbis::ParseException("disks[0]", 3, "is no disk"));
   EXPECT_EQ(http.status, 400u);
   EXPECT_EQ(Told(http), "disks[0] | disks[0], line 3: is no disk");
+}
+
+TEST(Refusals, OfTheServerItselfKeepTheirStatusAndHeaders) {
+  const HttpAnswer line{
+      .status = 405, .contentType = "text/plain", .body = "no tea\n", .retryAfterSeconds = 7, .allow = "GET"};
+  const HttpAnswer json = ToldAt("/api/v1/AddDisks", line);
+  EXPECT_EQ(json.status, 405u);
+  EXPECT_EQ(Told(json), " | no tea");
+  EXPECT_EQ(json.retryAfterSeconds, 7);
+  EXPECT_EQ(json.allow, "GET");
+  EXPECT_EQ(ToldAt("/soap", line).body, "no tea\n");
+}
+
+TEST(Refusals, OfAServerThatHasTooMuchToDoAreBusy) {
+  const HttpAnswer json =
+      ToldAt("/api/v1/disks",
+             {.status = 503, .contentType = "text/plain", .body = "too much\n", .retryAfterSeconds = 7});
+  EXPECT_EQ(json.status, 503u);
+  const Host::Answer answer = Host::ReadJsonAnswer(json.body, nullptr);
+  const auto& busy = dynamic_cast<const Nox::Fault::Busy&>(*answer.fault);
+  EXPECT_EQ(busy.GetRetryAfterSeconds(), 7);
+  EXPECT_EQ((*busy.GetFaultMessage())[0]->GetMessage(), "too much");
 }
 
 class RefusedRoutes : public testing::Test {

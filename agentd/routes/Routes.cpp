@@ -36,7 +36,7 @@ using Host::ManagementApi;
 constexpr std::string_view jsonType = "application/json";
 constexpr std::string_view xmlType = "text/xml";
 constexpr std::string_view jsonFolder = "/api/v1";  // whoever may throw is below it
-constexpr std::size_t readersBody = 1 << 20;  // of those who may not change
+constexpr std::size_t readersBody = 1 << 20;        // of those who may not change
 
 // A request on its way: who serves it, what was asked, and the way back. Gone when it is served; an answer
 // that comes later keeps what it needs.
@@ -380,7 +380,8 @@ void Router::Serve(const HttpRequest& request, const HttpResponder& responder) c
   if (way.refusal) {
     counted.Answer(*way.refusal);
   } else {
-    Follow(*way.route, {_api, _tasks, *_queries, *_metrics, *_watch, _load, *target, request, counted, way.rest});
+    Follow(*way.route,
+           {_api, _tasks, *_queries, *_metrics, *_watch, _load, *target, request, counted, way.rest});
   }
 }
 

@@ -153,7 +153,7 @@ INSTANTIATE_TEST_SUITE_P(
                 "KovaHostIpConfig has none of that name"},
         Refusal{"KeyInOtherCase", Groups(goodGroups + ",\n\"Agentgroup\": \"a\""), "Agentgroup", 4,
                 "unknown field"},
-        Refusal{"EmptyKey", Groups(goodGroups + ",\n\"\": 1"), "(root)", 4, "unknown field"},
+        Refusal{"EmptyKey", Groups(goodGroups + ",\n\"\": 1"), "''", 4, "unknown field"},
         Refusal{"KeyTwice", Groups(goodGroups + ",\n\"masterGroup\": \"m\""), "agentGroup", 4,
                 "key 'masterGroup' stands twice"},
         Refusal{"KeyTwiceByAnEscape", Groups(goodGroups + ",\n\"m\\u0061sterGroup\": \"m\""), "agentGroup", 4,

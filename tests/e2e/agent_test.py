@@ -136,7 +136,8 @@ class AgentAnswersCurl(ProgramTest):
 
     def test_about_a_body_that_is_too_large(self):
         status, body = self.post("@" + self.write("large.json", " " * ((16 << 20) + 1)))
-        self.assertEqual((status, body), (413, "the body is too large\n"))
+        [message] = json.loads(body)["fault"]["faultMessage"]
+        self.assertEqual((status, message["message"]), (413, "the body is too large"))
 
     def test_head_requests_as_those_for_the_body(self):
         status, head = self.curl("/healthz", "--head")

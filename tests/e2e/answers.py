@@ -10,6 +10,7 @@ API = "{urn:nox}"
 FAULT_STATUSES = {"InvalidArgument": 400, "DuplicateDisks": 400, "NotPermitted": 403, "Busy": 503, "SystemError": 500}
 OTHER_FAULT = 409  # the disks, as they are now, do not allow it
 MAPPING_RESULTS = ("AddDisks", "AddAllEligibleDisks", "InitializeDisks", "UnmountDiskMapping")
+QUERIES = ("QueryDisksForKova", "GetStorageInfo", "GetDiskGroups", "GetConfigInfo")
 # Operations that may end with neither result nor fault.
 SILENT = ("AddAllEligibleDisks", "RemoveDisk", "RemoveDiskMapping", "ClaimUnmountedDiskgroup")
 PLAIN = "a text"  # in the place of a fault's type: a SOAP message that could not be read
@@ -89,7 +90,9 @@ class Checker:
         self.hold_to_schema(message)
         fault = message.find(API + "fault")
         is_list = operation in ("QueryDisksForKova", *MAPPING_RESULTS)
-        self.check_pair(operation, fault, is_list or len(message) > 0)  # an empty list shows as nothing
+        task = message.findall(API + "task")
+        demand(len(task) == (0 if operation in QUERIES else 1), f"{operation} tells {len(task)} tasks")
+        self.check_pair(operation, fault, is_list or len(message) > len(task))  # an empty list shows as nothing
         groups = [[name.text or "" for name in group.findall(f"{API}mapping/*/{API}canonicalName")]
                   for group in message.findall(API + "result")
                   if operation in MAPPING_RESULTS and group.find(API + "error") is None]
@@ -102,8 +105,10 @@ class Checker:
         demand(parts["faultcode"].text in ("soapenv:Client", "soapenv:Server"), parts["faultcode"].text)
         if "detail" not in parts:
             return Answer(PLAIN)
-        [fault] = parts["detail"]
-        self.hold_to_schema(fault)
+        fault, *task = parts["detail"]
+        demand([part.tag for part in task] in ([], [API + "task"]), "what else stands in the detail")
+        for part in (fault, *task):
+            self.hold_to_schema(part)
         return Answer(self.type_of(fault))
 
     def hold_to_schema(self, element):

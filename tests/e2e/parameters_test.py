@@ -54,7 +54,7 @@ WRONG = {
 
 # What stands in an element in SOAP in the place of what belongs there.
 NO_TEXT_CONTENTS = ["<b/>", "a<!-- -->b", "&#10;", "x" * ((1 << 20) + 1)]
-NO_DISK_CONTENTS = ["", "naa.s1", "<deviceName/>", "<canonicalName>naa.s1</canonicalName>"]
+NO_DISK_CONTENTS = ["", "naa.s1", "<deviceName/>", "<canonicalName>naa.s1</canonicalName><canonicalName>naa.s2</canonicalName>"]
 WRONG_CONTENTS = {
     "names": NO_TEXT_CONTENTS + ["", "x" * 1025], "disks": NO_DISK_CONTENTS,
     "mappings": NO_DISK_CONTENTS + [f"<ssd>{content}</ssd>" for content in NO_DISK_CONTENTS],

@@ -57,7 +57,7 @@ class Trials:
         if objects is None:
             return INVALID, ""
         for name in self._limits:
-            if self._build.link(name, objects, folder / name) is not None:
+            if self._build.link(name, self._objects_of(name, objects), folder / name) is not None:
                 return INVALID, ""
             why = self._failing_test(place, folder, name)
             if why is not None:
@@ -74,6 +74,11 @@ class Trials:
             if self._build.compile(file, source, objects[file], folder if is_header else None) is not None:
                 return None
         return objects
+
+    def _objects_of(self, name, objects):
+        """Those of the objects that belong into the program: unit tests stand in no other."""
+        return {file: path for file, path in objects.items()
+                if name == self._unit_tests or not file.endswith("_test.cpp")}
 
     def _failing_test(self, place, folder, name):
         first = self._order.first(place.file) if name == self._unit_tests else ""

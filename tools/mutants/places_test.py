@@ -88,12 +88,14 @@ class Expressions(unittest.TestCase):
 
 class Steps(unittest.TestCase):
     def test_are_dropped(self):
-        self.assertEqual(inside("statement dropped", "a(); if (b) { return; }"),
-                         ["if (b) { return; }", "a(); if (b) { }"])
+        self.assertEqual(inside("statement dropped", "if (b) { return; } a();"),
+                         ["if (b) { } a();", "if (b) { return; }"])
 
     def test_whose_names_are_used_or_whose_answer_is_needed_are_not(self):
         self.assertEqual(inside("statement dropped", "A a(b); return a;", "int"), [])
         self.assertEqual(inside("statement dropped", "const Guard guard(a);"), [""])
+        self.assertEqual(inside("statement dropped", "try { f(); return a; } catch (B) { return c; }", "int"),
+                         ["try { return a; } catch (B) { return c; }"])
 
     def test_that_only_a_clock_sees_are_not(self):
         for code in ("a.reserve(b);", "a->Reserve(b->Size());"):

@@ -55,9 +55,17 @@ def is_droppable(source, function, block, statement):
         name = source.declared(statement.first, statement.last)
         return name is not None and not is_used(source, name, statement.last + 1, block.last) and (
             source.at(statement.last - 1) in (")", "}"))
-    if statement.kind in ("return", "throw") and block is function.body and statement is block.statements[-1]:
+    if statement.kind in ("return", "throw") and statement in list(last_statements(function.body)):
         return False  # a function that ends without its result has no meaning
     return statement.kind not in ("label", "if", "try", "block") and not is_without_outcome(source, statement)
+
+
+def last_statements(block):
+    """What stands last in the block, or last in a block that stands last there."""
+    for statement in block.statements[-1:]:
+        yield statement
+        for inner in statement.blocks if statement.kind in ("if", "try", "block") else []:
+            yield from last_statements(inner)
 
 
 def is_used(source, name, first, last):

@@ -157,6 +157,16 @@ TEST_F(AddDisks, SaysWhatItPlannedAndThenEachGroup) {
                   LogLineIs(LogLevel::Verbose, TestSupport::noFaultLine)));
 }
 
+TEST_F(AddDisks, SaysEachGroupBeforeItMakesAny) {
+  const Disks disks = {Ssd("s"), Hdd("a")};
+  Know(disks);
+  LogIntoTimeline();
+  Add(disks);
+  const std::vector<std::string> events =
+      EventsFrom("log verbose: LogDiskMappings: Mapping[0]: { SSD: s, MDs: a }");
+  EXPECT_THAT(events, testing::Contains("log verbose: Formatting KOVA disks"));
+}
+
 TEST_F(AddDisks, PrintsTheNumberOfGroupsAndNeverThatOfTheDisks) {
   const Disks disks = Ssds("s", 2) + Hdds("c", 3);
   Know(disks);

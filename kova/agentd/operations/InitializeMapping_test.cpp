@@ -191,6 +191,13 @@ TEST_F(InitializeOneGroup, TurnsTheExceptionOfADerivedManagersFormatIntoTheGroup
               ElementsAre(LogLineIs(LogLevel::Warning, formatFailed, "parts")));
 }
 
+TEST_F(InitializeOneGroup, KeepsTheKernelsRefusalWhenTheDisksCannotBeAskedForAfterwards) {
+  _kernel.Fail("FormatDiskMapping", KovaExceptionHasPartition("parts", "a"));
+  _kernel.Fail("RefreshKovaInfo", AFault("broken"));
+  EXPECT_THROW(Run(_first), SystemError::Exception);
+  EXPECT_THAT(_result->GetError(), NamesDevice("DiskHasPartitions", "a"));
+}
+
 TEST_F(InitializeOneGroup, LetsAFaultOfTheFormatOut) {
   const auto spy = UseManager<SpyManager>();
   spy->formatDiskMapping = [] { throw AFault("stop"); };

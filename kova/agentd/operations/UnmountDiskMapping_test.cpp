@@ -322,6 +322,15 @@ TEST_F(Unmount, AsksADerivedManagerWhetherTheGroupExists) {
   EXPECT_THAT(ResultTexts(), ElementsAre("x: a"));
 }
 
+TEST_F(Unmount, ReadsTheNameOfTheSsdBeforeItAsksADerivedManager) {
+  const auto spy = UseManager<SpyManager>();
+  spy->diskMappingExists = [] { return false; };
+  auto unnamed = AMapping(AScsiDisk("x").Unnamed(), {Hdd("a")});
+  Ref<Orbis::MethodFault> fault;
+  EXPECT_THROW(_manager->UnmountDiskMappingInt(unnamed, "", fault), NotInitializedException);
+  EXPECT_THAT(spy->calls, ElementsAre(testing::StartsWith("UnmountDiskMappingInt(")));
+}
+
 TEST_F(Unmount, StopsAtAFaultOfTheExistenceCheck) {
   UseManager<SpyManager>()->diskMappingExists = []() -> bool { throw AFault("check"); };
   Run({_first});

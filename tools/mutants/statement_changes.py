@@ -10,8 +10,10 @@ from token_changes import COMPARISONS, edit, swapped
 # What these do nobody sees but a clock: nothing is told by leaving them out or moving them.
 WITHOUT_OUTCOME = re.compile(r"[\w.>()*-]*\b[rR]eserve\(")
 FRESH_OBJECT = re.compile(r"(const )?\S.* (= )?((Tessa::)?MakeRef<[^;]*>\(\);|\w+;)", re.DOTALL)
-APPENDING = re.compile(r"([\w.]+)\.push_back\(([^()]*)\);")
 SETTER = re.compile(r"(\w+)(->|\.)Set\w+\(")
+# Changes one object and nothing else; a call of `a.b()` in it only asks.
+OWN_EFFECT = re.compile(r"([\w.]+)(?: = |(?:\.|->)(push_back|emplace_back|Append|Set\w+)\()"
+                        r"((?:(?:\.|->)\w+\(\)|[^()])*)\)?;")
 
 
 def conditions(source, function):
@@ -96,12 +98,14 @@ def is_exchangeable(source, one, two):
 
 
 def is_order_unseen(one, two):
-    """Whether they set two fields of one object, or append to two lists what neither list is asked for."""
+    """Whether they set two fields of one object, or change two objects of which neither is asked for the other."""
     first, second = SETTER.match(one), SETTER.match(two)
     if first and second:
         return first[1] == second[1]
-    first, second = APPENDING.fullmatch(one), APPENDING.fullmatch(two)
-    return bool(first and second) and first[1] != second[1] and first[1] not in second[2] and second[1] not in first[2]
+    first, second = OWN_EFFECT.fullmatch(one), OWN_EFFECT.fullmatch(two)
+    if not first or not second or first[1] == second[1] or second[1] in first[3]:
+        return False
+    return first[1] not in second[3] or (second[2] == "Append" and first[1] == second[3])  # a list holds references
 
 
 def is_fresh(source, statement):

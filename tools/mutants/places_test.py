@@ -108,11 +108,12 @@ class Steps(unittest.TestCase):
     def test_that_depend_or_whose_order_does_not_show_do_not(self):
         for code in ("const A a = b(); c(a);", "a(); return;", "A a; b();", "const auto a = MakeRef<A>(); b();",
                      "a->SetB(1); a->SetC(2);", "a.push_back(c); b.push_back(!d[c].e);",
-                     "a.b.push_back({c}); a.d.emplace_back(c.size());", "a = b; c = d;", "a->SetB(1); c->Append(a);"):
+                     "a.b.push_back({c}); a.d.emplace_back(c.size());", "a = b; c = d;", "a->SetB(1); c->Append(a);",
+                     'LogInternal("a"); b = MakeRef<C>();', 'LogInternal("a"); b = c.GetD();'):
             self.assertEqual(inside("statements swapped", code), [], code)
         for code in ("a->SetB(f(1)); d->SetC(2);", "a = b; c = a;", "a = b; a = c;",
                      "a.push_back(b); a.push_back(c);", "a.push_back(c); b.push_back(a);",
-                     "a.push_back(f()); b.push_back(g());"):
+                     "a.push_back(f()); b.push_back(g());", "LogInternal(a); b = f();", "LogInternal(b); b = a;"):
             self.assertEqual(len(inside("statements swapped", code)), 1, code)
 
     def test_go_over_the_edge_of_a_lock(self):

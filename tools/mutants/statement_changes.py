@@ -14,6 +14,8 @@ SETTER = re.compile(r"(\w+)(->|\.)Set\w+\(")
 # Changes one object and nothing else; a call of `a.b()` in it only asks.
 OWN_EFFECT = re.compile(r"([\w.]+)(?: = |(?:\.|->)(push_back|emplace_back|Append|Set\w+)\()"
                         r"((?:(?:\.|->)\w+\(\)|[^()])*)\)?;")
+MAKING = re.compile(r"(\w+) = MakeRef<[\w:]+>\([^()]*\);")
+LOG_LINE = re.compile(r"LogInternal\(.*\);", re.DOTALL)
 
 
 def conditions(source, function):
@@ -98,7 +100,11 @@ def is_exchangeable(source, one, two):
 
 
 def is_order_unseen(one, two):
-    """Whether they set two fields of one object, or change two objects of which neither is asked for the other."""
+    """Whether they set two fields of one object, or change two objects of which neither is asked for the other,
+    or one is a line of the log and the other gives a variable its value."""
+    if LOG_LINE.fullmatch(one):
+        made = MAKING.fullmatch(two) or (OWN_EFFECT.fullmatch(two) if " = " in two else None)
+        return made is not None and made[1] not in one
     first, second = SETTER.match(one), SETTER.match(two)
     if first and second:
         return first[1] == second[1]

@@ -326,6 +326,7 @@ TEST_F(AllFlash, NeedsTheSsdFlagOfEveryResult) {
   EXPECT_THAT([this] { Compute(); }, ThrowsMessage<NotInitializedException>(StrEq("optional value not set")));
   EXPECT_EQ(_mappings, _mappingsBefore);
   EXPECT_THAT(_kernel.Calls(), IsEmpty());
+  EXPECT_THAT(_logger->Lines(), ElementsAre(LogLineIs(LogLevel::Verbose, queried, "1")));
 }
 
 TEST_F(AllFlash, HasTakenTheDisksBeforeOneWithoutItsFlag) {

@@ -2,6 +2,7 @@
 
 #include <cstdlib>
 #include <new>
+#include <optional>
 #include <string>
 #include <utility>
 
@@ -10,7 +11,7 @@
 namespace TestSupport {
 namespace {
 
-thread_local bool refuseNext = false;
+thread_local std::optional<RefusedMemory::By> refuser;
 
 // The allocation functions may throw what derives from std::bad_alloc, so this may leave them.
 class Refusal final : public std::bad_alloc, public HostCtl::Lib::HostCtlException {
@@ -22,18 +23,21 @@ class Refusal final : public std::bad_alloc, public HostCtl::Lib::HostCtlExcepti
 
 }  // namespace
 
-RefusedMemory::RefusedMemory() noexcept {
-  refuseNext = true;
+RefusedMemory::RefusedMemory(By by) noexcept {
+  refuser = by;
 }
 RefusedMemory::~RefusedMemory() {
-  refuseNext = false;
+  refuser.reset();
 }
 
 }  // namespace TestSupport
 
 void* operator new(std::size_t size) {
-  if (std::exchange(TestSupport::refuseNext, false)) {
-    throw TestSupport::Refusal();
+  if (const auto by = std::exchange(TestSupport::refuser, std::nullopt)) {
+    if (*by == TestSupport::RefusedMemory::By::Kernel) {
+      throw TestSupport::Refusal();
+    }
+    throw std::bad_alloc();
   }
   if (void* const memory = std::malloc(size != 0 ? size : 1)) {
     return memory;

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <new>
 #include <random>
 #include <string>
 #include <vector>
@@ -140,6 +141,18 @@ TEST_F(DiskFilter, EndsWithAWarningAtAKernelExceptionAndKeepsWhatPassedBefore) {
   EXPECT_THAT(_logger->Lines(),
               ElementsAre(LogLineIs(LogLevel::Warning, "%1: Error querying disks for KOVA: %2",
                                     "LimitQueryDisksForKova", TestSupport::RefusedMemory::described)));
+}
+
+TEST_F(DiskFilter, LetsOutThatThereIsNoMemory) {
+  const Records records = {ARecord(std::string(100, 'n'))};
+  Records passed;
+  passed.reserve(records.size());
+  const auto filter = [&] {
+    const TestSupport::RefusedMemory refused(TestSupport::RefusedMemory::By::System);
+    LimitQueryDisksForKova(*_logger, {}, {}, records, passed);
+  };
+  EXPECT_THROW(filter(), std::bad_alloc);
+  EXPECT_THAT(_logger->Lines(), IsEmpty());
 }
 
 // The filter, written down once more as plain walks and apart from the product's.

@@ -139,6 +139,7 @@ TEST_F(AddAllEligibleDisks, PlansHybridGroupsThenAllFlashOnes) {
   SetHost({Ssd("f"), Ssd("tagged"), Ssd("s"), Hdd("a")},
           {ARecord("f").Ssd(), ARecord("tagged").Ssd().CapacityFlash(), ARecord("s").Ssd(), ARecord("a")});
   EXPECT_EQ(Plan(), "InitializeDisksInt([s: a, f: tagged], tag)");
+  EXPECT_THAT(_logger->Lines(), Contains(LogLineIs(LogLevel::Verbose, computed, "2", "4")));
   EXPECT_THAT(ResultTexts(), ElementsAre("s: a", "f: tagged"));
 }
 

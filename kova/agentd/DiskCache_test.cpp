@@ -83,6 +83,18 @@ TEST_F(DiskCache, AsksTheKernelAgainAfterAnInvalidation) {
   EXPECT_THAT(_logger->Lines(), IsEmpty());
 }
 
+TEST_F(DiskCache, IsInvalidatedUnderItsLock) {
+  const auto manager = MakeManager();
+  _locks.SetTakeObserver([&](const std::string&) {
+    _locks.SetTakeObserver({});
+    manager->RefreshKovaDiskCache();  // as another thread could, just before
+  });
+  manager->InvalidateKovaDiskCache();
+  _kernel.ForgetCalls();
+  manager->RefreshKovaDiskCache();
+  EXPECT_FALSE(_kernel.Calls().empty());
+}
+
 TEST_F(DiskCache, ForgetsDisksThatHaveGoneSinceTheLastRefresh) {
   SetHost({AScsiDisk("naa.1"), AScsiDisk("naa.2")}, {ARecord("naa.1"), ARecord("naa.2")});
   const auto manager = MakeManager();

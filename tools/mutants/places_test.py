@@ -109,7 +109,7 @@ class Steps(unittest.TestCase):
         for code in ("const A a = b(); c(a);", "a(); return;", "A a; b();", "const auto a = MakeRef<A>(); b();",
                      "a->SetB(1); a->SetC(2);", "a.push_back(c); b.push_back(!d[c].e);",
                      "a.b.push_back({c}); a.d.emplace_back(c.size());", "a = b; c = d;", "a->SetB(1); c->Append(a);",
-                     'LogInternal("a"); b = MakeRef<C>();', 'LogInternal("a"); b = c.GetD();'):
+                     'LogInternal("a"); b = MakeRef<C>();', 'LogInternal("b"); b = c.GetD();'):
             self.assertEqual(inside("statements swapped", code), [], code)
         for code in ("a->SetB(f(1)); d->SetC(2);", "a = b; c = a;", "a = b; a = c;",
                      "a.push_back(b); a.push_back(c);", "a.push_back(c); b.push_back(a);",

@@ -15,6 +15,7 @@ SETTER = re.compile(r"(\w+)(->|\.)Set\w+\(")
 OWN_EFFECT = re.compile(r"([\w.]+)(?: = |(?:\.|->)(push_back|emplace_back|Append|Set\w+)\()"
                         r"((?:(?:\.|->)\w+\(\)|[^()])*)\)?;")
 MAKING = re.compile(r"(\w+) = MakeRef<[\w:]+>\([^()]*\);")
+TEXT = re.compile(r'"[^"]*"')
 LOG_LINE = re.compile(r"LogInternal\(.*\);", re.DOTALL)
 
 
@@ -104,7 +105,7 @@ def is_order_unseen(one, two):
     or one is a line of the log and the other gives a variable its value."""
     if LOG_LINE.fullmatch(one):
         made = MAKING.fullmatch(two) or (OWN_EFFECT.fullmatch(two) if " = " in two else None)
-        return made is not None and made[1] not in one
+        return made is not None and made[1] not in TEXT.sub("", one)
     first, second = SETTER.match(one), SETTER.match(two)
     if first and second:
         return first[1] == second[1]

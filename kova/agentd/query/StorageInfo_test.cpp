@@ -359,6 +359,12 @@ TEST_F(StorageInfo, WithoutAnInventoryWarnsAndHasNoGroups) {
   EXPECT_EQ(_timeline.Events().back(), "release KovaManager.diskCache");
 }
 
+TEST_F(StorageInfo, WithoutAnInventoryHasNoGroupsOfAbsentDisksEither) {
+  _kernel.groups = {AGroup("", {""})};
+  _app.SetObject("storageSystem", nullptr);
+  EXPECT_TRUE(HasNoGroups(*Ask()));
+}
+
 TEST_F(StorageInfo, LetsOtherExceptionsOfTheInventoryThrough) {
   SetGroup("s1", {"a"});
   _storage->SetObserver(

@@ -193,8 +193,27 @@ TEST_F(Session, IsMadeAgainAfterAFailure) {
 TEST_F(Session, IsRefusedWithoutAnApplication) {
   Tessa::Service::SetApp(nullptr);
   Ref<Tessa::Session> session;
-  EXPECT_THROW(KovaUtil::GetSession(session), SystemError::Exception);
+  EXPECT_THAT(
+      [&] { KovaUtil::GetSession(session); },
+      testing::Throws<SystemError::Exception>(CarriesSystemError("Failed to get application instance.")));
   EXPECT_FALSE(KovaUtil::_session);
+  Tessa::Service::SetApp(&_app);
+}
+
+// Takes the authorization manager away when a session is registered.
+class ClosingApp final : public Tessa::Service::App {
+ public:
+  Ref<Tessa::Object> LookupObject(const std::string&) const override { return {}; }
+  void RegisterSession(const Ref<Tessa::Session>&) override {
+    Tessa::Authorize::AuthorizeManager::SetInstance(nullptr);
+  }
+};
+
+TEST_F(Session, AsksForTheAuthorizationManagerOnceTheSessionIsRegistered) {
+  ClosingApp app;
+  Tessa::Service::SetApp(&app);
+  Ref<Tessa::Session> session;
+  EXPECT_THROW(KovaUtil::GetSession(session), SystemError::Exception);
   Tessa::Service::SetApp(&_app);
 }
 

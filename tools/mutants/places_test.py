@@ -88,8 +88,14 @@ class Expressions(unittest.TestCase):
 
 class Steps(unittest.TestCase):
     def test_are_dropped(self):
-        self.assertEqual(inside("statement dropped", "if (b) { return; } a();"),
-                         ["if (b) { } a();", "if (b) { return; }"])
+        self.assertEqual(inside("statement dropped", "if (b) { c(); return; } a();"),
+                         ["if (b) { return; } a();", "if (b) { c(); } a();", "if (b) { c(); return; }"])
+
+    def test_that_alone_hang_on_a_condition_are_not_for_it_has_its_own_change(self):
+        self.assertEqual(inside("statement dropped", "if (a) { b(); } c();"), ["if (a) { b(); }"])
+        self.assertEqual(inside("statement dropped", "if (a) { b(); } else { c(); } d();"),
+                         ["if (a) { } else { c(); } d();", "if (a) { b(); } else { } d();",
+                          "if (a) { b(); } else { c(); }"])
 
     def test_whose_names_are_used_or_whose_answer_is_needed_are_not(self):
         self.assertEqual(inside("statement dropped", "A a(b); return a;", "int"), [])

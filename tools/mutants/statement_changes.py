@@ -48,7 +48,11 @@ def negated(source, first, last):
 
 
 def dropped(source, function):
+    never_done = [statement.blocks[0] for statement in function.statements()
+                  if statement.kind == "if" and len(statement.blocks) == 1 and not statement.governed]
     for block in function.blocks():
+        if block in never_done and len(block.statements) == 1:
+            continue  # that comes to a condition that is never true
         for statement in block.statements:
             if is_droppable(source, function, block, statement):
                 start = source.tokens[statement.first].start

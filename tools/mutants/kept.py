@@ -16,7 +16,7 @@ def read(path):
         entries = tomllib.load(file).get("kept", [])
     kept = {}
     for entry in entries:
-        missing = FIELDS - {name for name in entry if entry[name]} - {"after"} | FIELDS - set(entry)
+        missing = FIELDS - {name for name in entry if entry[name]} - {"after", "function"} | FIELDS - set(entry)
         if missing:
             raise Faulty(f"{path}: an entry lacks {', '.join(sorted(missing))}: {entry}")
         key = tuple(entry[name] for name in ("file", "function", "before", "after"))

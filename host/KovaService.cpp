@@ -9,9 +9,11 @@
 #include "host/KnownDisks.h"
 #include "host/RequestTexts.h"
 #include "host/UnmountedGroups.h"
+#include "host/UnusableDisks.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/include/KovaPlugin.h"
+#include "nox/Faults.h"
 #include "nox/Kova.h"
 #include "otxctl/TaskScope.h"
 #include "otxctl/sim/SimHost.h"
@@ -51,6 +53,14 @@ Answer Guarded(Work work) {
 // A query that was answered with nothing at all has failed.
 Answer OrFailed(Answer answer, const char* reason) {
   return answer.result || answer.fault ? answer : FailedWith(reason);
+}
+
+std::vector<std::string> NamesOf(const DiskList& disks) {
+  std::vector<std::string> names;
+  for (const Nox::Host::ScsiDisk* disk : disks) {
+    names.push_back(disk->GetCanonicalName());
+  }
+  return names;
 }
 
 std::string RequestTag() {
@@ -120,9 +130,13 @@ Answer KovaService::AddDisks(const DiskList& disks) const {
     const Ref<DiskList> admitted = Gate::AdmitDisks(disks, known);
     Gate::DemandWholeGroups(*admitted, known, *Kernel());
     const Kovasvc::Texts texts = ToTexts(*admitted);
-    return Ask([&](std::string& faultText, std::string& resultText) {
+    Answer answer = Ask([&](std::string& faultText, std::string& resultText) {
       _hooks.addDisks(texts, RequestTag(), faultText, resultText);
     });
+    if (dynamic_cast<const Nox::Fault::InsufficientDisks*>(answer.fault.Get()) != nullptr) {
+      NameUnusableDisks(QueryDisksForKova(NamesOf(*admitted)), *answer.fault);
+    }
+    return answer;
   });
 }
 

@@ -78,14 +78,13 @@ const char* CodeOf(const MethodFault& fault) {
   return server ? "Server" : "Client";
 }
 
-// For whoever reads the fault's text alone: its first message in words or, without one, what its kind means
-// and what it carries.
+// For whoever reads the fault's text alone: what its kind means and what it carries; of a request that is
+// wrong, the message that says where.
 std::string TextOf(const MethodFault& fault) {
   const auto messages = fault.GetFaultMessage();
-  for (const Orbis::LocalizableMessage* message : *messages) {
-    if (message->HasMessage()) {
-      return fault.GetType().name + ": " + message->GetMessage();
-    }
+  if (dynamic_cast<const Orbis::Fault::InvalidArgument*>(&fault) != nullptr && !messages->IsEmpty() &&
+      (*messages)[0]->HasMessage()) {
+    return fault.GetType().name + ": " + (*messages)[0]->GetMessage();
   }
   return fault.GetType().name + ": " + Host::Explain(fault);
 }

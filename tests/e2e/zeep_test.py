@@ -104,6 +104,11 @@ class Story(ZeepTest):
             fault = self.fault_of(service.InitializeDisks, mappings=[])
             self.assertEqual(self.type_of(fault), "InsufficientDisks")
             self.assertIn("too few disks for a disk group", self.fault_text)
+        with self.subTest("that names the disk and the reason"):
+            fault = self.fault_of(service.AddDisks, disks=[{"canonicalName": PARTED}, {"canonicalName": "naa.c1"}])
+            self.assertEqual(self.type_of(fault), "InsufficientDisks")
+            self.assertIn(f"too few disks for a disk group; {PARTED}: holds partitions or is in use by others",
+                          self.fault_text)
 
     def test_a_part_that_fails_and_a_part_that_does_not(self):
         service = self.connect(self.through_a_bridge(HALF_FAILS))

@@ -5,31 +5,18 @@
 
 #include <set>
 
+#include "host/testing/Faults.h"
 #include "nox/Faults.h"
 #include "orbis/Any.h"
-#include "orbis/TypeDescriptor.h"
 
 namespace Host {
 namespace {
 
-using Orbis::LocalizableMessage;
-using Orbis::MethodFault;
 using Tessa::MakeRef;
-using Tessa::Ref;
+using Testing::EveryFault;
 using testing::HasSubstr;
 using testing::Not;
-
-// Every fault class there is, made without anything set.
-std::vector<Ref<MethodFault>> EveryFault() {
-  std::vector<Ref<MethodFault>> faults;
-  for (const Orbis::TypeDescriptor* type : Orbis::AllTypes()) {
-    if (type->kind == Orbis::TypeKind::DataObject && type->IsA(MethodFault::StaticType()) &&
-        !type->IsAbstract()) {
-      faults.emplace_back(static_cast<MethodFault*>(type->create().Get()));
-    }
-  }
-  return faults;
-}
+using Testing::WithKey;
 
 TEST(FaultWords, StandForEveryFaultThatThereIs) {
   std::set<std::string> words;
@@ -68,16 +55,6 @@ TEST(FaultWords, OfAFaultEndWithItsMessagesOrTheirKeys) {
   fault.GetFaultMessage()->Append(told);
   fault.GetFaultMessage()->Append(untold);
   EXPECT_EQ(Explain(fault), "the storage service refused; first; c.d");
-}
-
-// A fault with one message, which has only its key.
-template <class Fault>
-Ref<Fault> WithKey(const std::string& key) {
-  const auto message = MakeRef<LocalizableMessage>();
-  message->SetKey(key);
-  const auto fault = MakeRef<Fault>();
-  fault->GetFaultMessage()->Append(message);
-  return fault;
 }
 
 TEST(FaultWords, StandForTheKeysThatSayWhichLimitStoppedPlanning) {

@@ -3,41 +3,15 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <vector>
-
+#include "host/testing/Faults.h"
 #include "nox/Faults.h"
-#include "orbis/TypeDescriptor.h"
 
 namespace Kovactl {
 namespace {
 
-using Orbis::LocalizableMessage;
-using Orbis::MethodFault;
-using Tessa::MakeRef;
-using Tessa::Ref;
+using Host::Testing::EveryFault;
+using Host::Testing::WithKey;
 using testing::HasSubstr;
-
-// Every fault class there is, made without anything set.
-std::vector<Ref<MethodFault>> EveryFault() {
-  std::vector<Ref<MethodFault>> faults;
-  for (const Orbis::TypeDescriptor* type : Orbis::AllTypes()) {
-    if (type->kind == Orbis::TypeKind::DataObject && type->IsA(MethodFault::StaticType()) &&
-        !type->IsAbstract()) {
-      faults.emplace_back(static_cast<MethodFault*>(type->create().Get()));
-    }
-  }
-  return faults;
-}
-
-// A fault with one message, which has only its key.
-template <class Fault>
-Ref<Fault> WithKey(const std::string& key) {
-  const auto message = MakeRef<LocalizableMessage>();
-  message->SetKey(key);
-  const auto fault = MakeRef<Fault>();
-  fault->GetFaultMessage()->Append(message);
-  return fault;
-}
 
 TEST(FaultAdvice, SaysHowToMakeRoomWhenALimitStoppedPlanning) {
   for (const char* key :

@@ -1,29 +1,20 @@
 // Any message: refused with an exception of the reader, or read into a request that is written and read again
 // to an equal one.
 
-#include <array>
 #include <cstdint>
 #include <cstdlib>
 
-#include "nox/Operations.h"
+#include "nox/OperationTable.h"
 #include "orbis/Engine.h"
 #include "orbis/Envelope.h"
 #include "orbis/TypeDescriptor.h"
 
 namespace {
 
-namespace Op = Nox::Operation;
-
 // The type of the request, chosen by the message's name as a server does.
 const Orbis::TypeDescriptor& TypeOf(std::string_view name) {
-  const std::array types = {&Op::AddDisks::StaticType(), &Op::RemoveDisk::StaticType(),
-                            &Op::QueryDisksForKova::StaticType(), &Op::GetStorageInfo::StaticType()};
-  for (const Orbis::TypeDescriptor* type : types) {
-    if (type->name == name) {
-      return *type;
-    }
-  }
-  return Op::RemoveDiskMapping::StaticType();
+  const Nox::OperationDescriptor* const operation = Nox::FindOperation(name);
+  return operation != nullptr ? operation->request : Nox::FindOperation("RemoveDiskMapping")->request;
 }
 
 }  // namespace

@@ -1,10 +1,13 @@
 #include "host/Answer.h"
 
+#include <utility>
+
 #include "nox/Kova.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
 #include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"
+#include "orbis/WrittenSoap.h"
 #include "orbis/json/JsonText.h"
 
 namespace Host {
@@ -29,23 +32,35 @@ Ref<Orbis::Any> ReadMember(const Value& object, const char* name, const Orbis::T
   return member->kind == Kind::Null ? nullptr : Orbis::ReadJson(*member, type, name);
 }
 
-template <class T>
-void AppendOrNull(const Ref<T>& value, std::string& out) {
-  if (value) {
-    Orbis::WriteJson(*value, out);
-  } else {
-    out += "null";
-  }
+Ref<Orbis::MethodFault> ReadFault(const std::string& text) {
+  Ref<Orbis::Any> fault;
+  Orbis::DeserializeSoapToObject(text, fault, nullptr, &Orbis::MethodFault::StaticType());
+  return AsFault(fault);
 }
 
 using GroupResults = Orbis::DataArray<Nox::Kova::Host::DiskMapResult>;
 
-bool HoldsNothing(const Ref<Orbis::Any>& result) {
+bool HoldsNothing(const Result& result) {
   const auto* const list = dynamic_cast<const Orbis::DataArrayBase*>(result.Get());
   return !result || (list != nullptr && list->IsEmpty());
 }
 
 }  // namespace
+
+Result Result::OfText(std::string text) {
+  Result result;
+  if (!text.empty()) {
+    result._text = std::make_shared<const std::string>(std::move(text));
+  }
+  return result;
+}
+
+Orbis::Any* Result::Get() const {
+  if (!_value && _text) {
+    Orbis::DeserializeSoapToObject(*_text, _value);
+  }
+  return _value.Get();
+}
 
 bool IsFaultAlone(const Answer& answer) {
   return answer.fault && HoldsNothing(answer.result);
@@ -68,33 +83,13 @@ Outcome OutcomeOf(const Answer& answer) {
   return answer.fault ? Outcome::Partly : Outcome::Done;
 }
 
-Answer Read(const WrittenAnswer& answer) {
-  try {
-    return {.result = ReadAnswer("", answer.result).result, .fault = answer.fault};
-  } catch (const Orbis::ParseException& mistake) {
-    return FailedWith(mistake.what());
-  }
+Outcome OutcomeOfQuery(const Answer& answer) {
+  return !answer.fault ? Outcome::Done : IsFaultAlone(answer) ? Outcome::Failed : Outcome::Partly;
 }
 
-WrittenAnswer Written(const Answer& answer) {
-  WrittenAnswer written{.result = {}, .fault = answer.fault};
-  if (answer.result) {
-    Orbis::SerializeObjectToSoap(*answer.result, nullptr, written.result);
-  }
-  return written;
-}
-
-Answer ReadAnswer(const std::string& faultText, const std::string& resultText) {
-  Answer answer;
-  if (!resultText.empty()) {
-    Orbis::DeserializeSoapToObject(resultText, answer.result);
-  }
-  if (!faultText.empty()) {
-    Ref<Orbis::Any> fault;
-    Orbis::DeserializeSoapToObject(faultText, fault, nullptr, &Orbis::MethodFault::StaticType());
-    answer.fault = AsFault(fault);
-  }
-  return answer;
+Answer AnswerOf(const std::string& faultText, std::string resultText) {
+  return {.result = Result::OfText(std::move(resultText)),
+          .fault = faultText.empty() ? nullptr : ReadFault(faultText)};
 }
 
 Answer ReadJsonAnswer(std::string_view text, const Orbis::TypeDescriptor* resultType) {
@@ -107,11 +102,24 @@ Answer ReadJsonAnswer(std::string_view text, const Orbis::TypeDescriptor* result
           .fault = AsFault(ReadMember(root, "fault", &Orbis::MethodFault::StaticType()))};
 }
 
+// A text that is as the plug-in's writer writes it needs not be read for this.
+void WriteJsonResult(const Result& result, std::string& out) {
+  if (!result) {
+    out += "null";
+  } else if (result.GetText() == nullptr || !Orbis::AppendJsonOfSoap(*result.GetText(), out)) {
+    Orbis::WriteJson(*result.Get(), out);
+  }
+}
+
 void WriteJsonAnswer(const Answer& answer, std::string& out) {
   out += "{\"result\":";
-  AppendOrNull(answer.result, out);
+  WriteJsonResult(answer.result, out);
   out += ",\"fault\":";
-  AppendOrNull(answer.fault, out);
+  if (answer.fault) {
+    Orbis::WriteJson(*answer.fault, out);
+  } else {
+    out += "null";
+  }
   out += "}";
 }
 

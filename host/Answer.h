@@ -1,6 +1,13 @@
 // What a request came to: a result, a fault, or both.
+//
+// A result stays the text that the plug-in wrote until somebody looks into it: whoever only passes it on
+// works on the text.
+//
+// Threads: an answer belongs to one thread at a time; a copy is another answer.
 #pragma once
 
+#include <cstddef>
+#include <memory>
 #include <string>
 #include <string_view>
 
@@ -10,14 +17,42 @@
 
 namespace Host {
 
-struct Answer {
-  Tessa::Ref<Orbis::Any> result;         // null: none
-  Tessa::Ref<Orbis::MethodFault> fault;  // null: none
+class Result {
+ public:
+  // None.
+  Result() = default;
+  Result(std::nullptr_t) {}  // NOLINT(google-explicit-constructor)
+
+  // Of an object at hand; null: none.
+  Result(Tessa::Ref<Orbis::Any> value) : _value(std::move(value)) {}  // NOLINT(google-explicit-constructor)
+  template <class T>
+  Result(const Tessa::Ref<T>& value) : _value(value) {}  // NOLINT(google-explicit-constructor)
+
+  // Of a SOAP text; an empty one: none.
+  static Result OfText(std::string text);
+
+  // Whether there is one.
+  explicit operator bool() const noexcept { return _value || _text; }
+
+  // The text; null for a result that is an object.
+  const std::string* GetText() const noexcept { return _text.get(); }
+
+  // The object, null: none. A text is read when this is first called; throws Orbis::ParseException for one
+  // that cannot be, which would be a mistake of the plug-in.
+  Orbis::Any* Get() const;
+
+  Orbis::Any& operator*() const { return *Get(); }
+
+  // Roughly the bytes that the result's text takes; nothing is written to learn it.
+  std::size_t TextSize() const noexcept { return _text ? _text->size() : 0; }
+
+ private:
+  mutable Tessa::Ref<Orbis::Any> _value;
+  std::shared_ptr<const std::string> _text;  // shared by copies
 };
 
-// An answer whose result is still the text that the plug-in wrote, for whoever only passes it on.
-struct WrittenAnswer {
-  std::string result;                    // a SOAP text; empty: none
+struct Answer {
+  Result result;
   Tessa::Ref<Orbis::MethodFault> fault;  // null: none
 };
 
@@ -28,21 +63,21 @@ bool IsFaultAlone(const Answer& answer);
 // of the groups failed.
 Outcome OutcomeOf(const Answer& answer);
 
-// A result that cannot be read, which would be a mistake of the plug-in, becomes a SystemError.
-Answer Read(const WrittenAnswer& answer);
-// Throws what SerializeObjectToSoap throws.
-WrittenAnswer Written(const Answer& answer);
+// The same of an answer that is not about disk groups, without a look into a result that stands alone.
+Outcome OutcomeOfQuery(const Answer& answer);
 
-// Reads what a hook appended to the texts it was given; an empty text is nothing. Throws
-// Orbis::ParseException, which would be a mistake of the plug-in.
-Answer ReadAnswer(const std::string& faultText, const std::string& resultText);
+// What a hook appended to the texts it was given; an empty text is nothing. Throws Orbis::ParseException for
+// a fault that cannot be read, which would be a mistake of the plug-in.
+Answer AnswerOf(const std::string& faultText, std::string resultText);
 
-// The same from the JSON form {"result": .., "fault": ..}, either null, that an agent sends. `resultType` is
-// the declared type of the result. Throws Orbis::ParseException.
+// From the JSON form {"result": .., "fault": ..}, either null, that an agent sends. `resultType` is the
+// declared type of the result; null: it has none. Throws Orbis::ParseException.
 Answer ReadJsonAnswer(std::string_view text, const Orbis::TypeDescriptor* resultType);
 
-// And back, appended.
+// And back, appended: from the text of the result, if it is one. Throws as Result::Get.
 void WriteJsonAnswer(const Answer& answer, std::string& out);
+// The result alone; null for none.
+void WriteJsonResult(const Result& result, std::string& out);
 
 // An answer that is only a SystemError with that reason.
 Answer FailedWith(const std::string& reason);

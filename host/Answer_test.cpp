@@ -42,47 +42,79 @@ std::string Json(const Answer& answer) {
   return text;
 }
 
-TEST(Answer, IsTheSameWrittenAndRead) {
-  const auto fault = MakeRef<SystemError>("r");
-  for (const Answer& answer :
-       {Answer{.result = OneDisk(), .fault = fault}, Answer{.result = OneDisk(), .fault = nullptr},
-        Answer{.result = nullptr, .fault = fault}, Answer()}) {
-    EXPECT_EQ(Json(Read(Written(answer))), Json(answer));
+TEST(Result, OfATextIsReadWhenSomebodyLooks) {
+  const auto disks = OneDisk();
+  const Result result = Result::OfText(Soap(*disks));
+  EXPECT_TRUE(result);
+  EXPECT_EQ(*result.GetText(), Soap(*disks));
+  EXPECT_EQ(result.TextSize(), Soap(*disks).size());
+  EXPECT_TRUE(Orbis::Equal(result.Get(), disks.Get()));
+  EXPECT_EQ(result.Get(), result.Get()) << "once";
+}
+
+TEST(Result, OfATextThatCannotBeReadIsThereAndThrows) {
+  const Result result = Result::OfText("<object");
+  EXPECT_TRUE(result);
+  EXPECT_THROW(result.Get(), Orbis::ParseException);
+}
+
+TEST(Result, OfAnEmptyTextOrOfNullIsNone) {
+  for (const Result& none : {Result(), Result::OfText(""), Result(nullptr), Result(Ref<SystemError>())}) {
+    EXPECT_FALSE(none);
+    EXPECT_EQ(none.Get(), nullptr);
+    EXPECT_EQ(none.GetText(), nullptr);
+    EXPECT_EQ(none.TextSize(), 0u);
   }
 }
 
-TEST(Answer, OfATextThatCannotBeReadIsASystemErrorAlone) {
-  const Answer answer = Read({.result = "<object", .fault = nullptr});
-  EXPECT_FALSE(answer.result);
-  EXPECT_NE(dynamic_cast<const SystemError*>(answer.fault.Get()), nullptr);
+TEST(Result, ThatWasReadInACopyIsATextStill) {
+  const Result result = Result::OfText(Soap(*OneDisk()));
+  const Result copy = result;
+  EXPECT_EQ(result.GetText(), copy.GetText()) << "the text is shared";
+  EXPECT_NE(copy.Get(), result.Get()) << "the object is not";
+}
+
+TEST(Answer, IsTheSameInJsonFromATextAsFromAnObject) {
+  const auto fault = MakeRef<SystemError>("r");
+  for (const auto& said : {fault, Ref<SystemError>()}) {
+    EXPECT_EQ(Json({.result = Result::OfText(Soap(*OneDisk())), .fault = said}),
+              Json({.result = OneDisk(), .fault = said}));
+  }
+}
+
+TEST(Answer, OfATextThatThePluginDidNotWriteIsReadForItsJson) {
+  std::string text = Soap(*OneDisk());
+  text.insert(text.find("?>") + 2, "\n<!-- by hand -->\n");
+  EXPECT_EQ(Json({.result = Result::OfText(text), .fault = nullptr}),
+            Json({.result = OneDisk(), .fault = nullptr}));
 }
 
 TEST(Answer, OfTwoEmptyTextsIsNothing) {
-  const Answer answer = ReadAnswer("", "");
+  const Answer answer = AnswerOf("", "");
   EXPECT_FALSE(answer.result);
   EXPECT_FALSE(answer.fault);
 }
 
 TEST(Answer, ReadsWhatAHookAppended) {
   const auto disks = OneDisk();
-  const Answer answer = ReadAnswer(Soap(SystemError("no luck")), Soap(*disks));
+  const Answer answer = AnswerOf(Soap(SystemError("no luck")), Soap(*disks));
   EXPECT_TRUE(Orbis::Equal(answer.result.Get(), disks.Get()));
   EXPECT_EQ(dynamic_cast<const SystemError&>(*answer.fault).GetReason(), "no luck");
 }
 
 TEST(Answer, ReadsAFaultAlone) {
-  const Answer answer = ReadAnswer(Soap(SystemError("no luck")), "");
+  const Answer answer = AnswerOf(Soap(SystemError("no luck")), "");
   EXPECT_FALSE(answer.result);
   EXPECT_TRUE(answer.fault);
 }
 
 TEST(Answer, RefusesAFaultThatIsNone) {
-  EXPECT_THROW(ReadAnswer(Soap(DiskResult()), ""), Orbis::ParseException);
+  EXPECT_THROW(AnswerOf(Soap(DiskResult()), ""), Orbis::ParseException);
 }
 
 TEST(Answer, RefusesTextsThatHoldNoObject) {
-  EXPECT_THROW(ReadAnswer("", "rubbish"), Orbis::ParseException);
-  EXPECT_THROW(ReadAnswer("<object", ""), Orbis::ParseException);
+  EXPECT_THROW(AnswerOf("", "rubbish").result.Get(), Orbis::ParseException);
+  EXPECT_THROW(AnswerOf("<object", ""), Orbis::ParseException);
 }
 
 TEST(Answer, IsTheSameAfterAJourneyAsJson) {
@@ -171,6 +203,14 @@ TEST(Outcome, IsDoneWithoutAFault) {
     EXPECT_FALSE(IsFaultAlone(answer));
     EXPECT_EQ(OutcomeOf(answer), Outcome::Done);
   }
+}
+
+TEST(Outcome, OfAQueryIsKnownWithoutALookIntoItsResult) {
+  const Result unreadable = Result::OfText("<object");
+  const auto fault = MakeRef<SystemError>("no");
+  EXPECT_EQ(OutcomeOfQuery({.result = unreadable, .fault = nullptr}), Outcome::Done);
+  EXPECT_EQ(OutcomeOfQuery({.result = OneDisk(), .fault = fault}), Outcome::Partly);
+  EXPECT_EQ(OutcomeOfQuery({.result = nullptr, .fault = fault}), Outcome::Failed);
 }
 
 TEST(Outcome, HasAName) {

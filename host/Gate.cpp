@@ -18,25 +18,6 @@ using Tessa::Ref;
 
 namespace {
 
-void CheckName(const std::string& place, const std::string& name) {
-  if (name.empty()) {
-    Refuse(place, "the name of a disk is empty");
-  }
-  CheckLength(place, name);
-  if (!IsClean(name)) {
-    Refuse(place, "the name '" + Printable(name) + "' holds control characters or is not UTF-8");
-  }
-}
-
-void CheckOption(const std::string& property, const std::string& text) {
-  if (text.size() > longestOption) {
-    Refuse(property, "a text of more than " + std::to_string(longestOption) + " bytes");
-  }
-  if (!IsClean(text)) {
-    Refuse(property, "the text '" + Printable(text) + "' holds control characters or is not UTF-8");
-  }
-}
-
 // What is done with a disk that the inventory does not know, whatever flag it brings.
 enum class Unknown {
   Refused,
@@ -122,21 +103,30 @@ void CheckLength(const std::string& place, const std::string& name) {
   }
 }
 
+void CheckName(const std::string& place, const std::string& name) {
+  if (name.empty()) {
+    Refuse(place, "the name of a disk is empty");
+  }
+  CheckLength(place, name);
+  if (!IsClean(name)) {
+    Refuse(place, "the name '" + Printable(name) + "' holds control characters or is not UTF-8");
+  }
+}
+
+void CheckOption(const std::string& property, const std::string& text) {
+  if (text.size() > longestOption) {
+    Refuse(property, "a text of more than " + std::to_string(longestOption) + " bytes");
+  }
+  if (!IsClean(text)) {
+    Refuse(property, "the text '" + Printable(text) + "' holds control characters or is not UTF-8");
+  }
+}
+
 void CheckNames(const std::string& property, const std::vector<std::string>& names) {
   CheckCount(property, names.size(), mostNames, "names");
   for (std::size_t i = 0; i < names.size(); ++i) {
     CheckName(Indexed(property, i), names[i]);
   }
-}
-
-void CheckRemoval(const std::string& disk, const RemovalArguments& arguments) {
-  CheckName("disk", disk);
-  CheckRemovalArguments(arguments);
-}
-
-void CheckRemovalArguments(const RemovalArguments& arguments) {
-  CheckOption("passThrough", arguments.passThrough);
-  CheckOption("optionText", arguments.optionText);
 }
 
 Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known) {
@@ -151,8 +141,8 @@ Ref<MappingList> AdmitGroups(const MappingList& mappings, const KnownDisks& know
   return AdmitMappings(mappings, known, Unknown::LetIn);
 }
 
-Ref<DiskMapping> AdmitGroup(const DiskMapping& mapping, const KnownDisks& known) {
-  return AdmitMapping("mapping", &mapping, known, Unknown::LetIn);
+Ref<DiskMapping> AdmitGroup(const DiskMapping* mapping, const KnownDisks& known) {
+  return AdmitMapping("mapping", mapping, known, Unknown::LetIn);
 }
 
 void CheckHostChange(std::string_view change) {

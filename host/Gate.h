@@ -39,9 +39,11 @@ void CheckLength(const std::string& place, const std::string& name);
 // the client calls them.
 void CheckNames(const std::string& property, const std::vector<std::string>& names);
 
-// The name of a disk, present or absent, and what goes with it to the kernel.
-void CheckRemoval(const std::string& disk, const RemovalArguments& arguments);
-void CheckRemovalArguments(const RemovalArguments& arguments);
+// One such name: of a disk, present or absent.
+void CheckName(const std::string& place, const std::string& name);
+
+// A text that goes to the kernel as it is: not too long, UTF-8 without control characters.
+void CheckOption(const std::string& property, const std::string& text);
 
 // The disks of an AddDisks. One that the inventory lacks is refused, whatever flag it brings: the kernel may
 // know it, but nobody has vouched for what it is.
@@ -54,7 +56,7 @@ Tessa::Ref<MappingList> AdmitNewGroups(const MappingList& mappings, const KnownD
 // Groups that are there already, to be unmounted or removed. Their disks may be unknown to the inventory:
 // the plug-in compares names, and says itself when there is no such group.
 Tessa::Ref<MappingList> AdmitGroups(const MappingList& mappings, const KnownDisks& known);
-Tessa::Ref<Nox::Kova::Host::DiskMapping> AdmitGroup(const Nox::Kova::Host::DiskMapping& mapping,
+Tessa::Ref<Nox::Kova::Host::DiskMapping> AdmitGroup(const Nox::Kova::Host::DiskMapping* mapping,
                                                     const KnownDisks& known);
 
 // Disks as AdmitDisks lets them in: a cache disk of a group that is not mounted brings its whole group along,

@@ -87,19 +87,17 @@ TEST(Gate, NamesTheParameterThatTheCallerNames) {
 }
 
 TEST(GateForRemovals, LetsInADiskThatIsThereOrAbsentAndTextsOfTheirLimit) {
-  const std::string longest(longestOption, 'o');
-  EXPECT_EQ(VerdictOn([&] { CheckRemoval("naa.1", {longest, longest, -1, 1}); }), "let in");
-  EXPECT_EQ(VerdictOn([] { CheckRemoval(absentName, {}); }), "let in");
+  EXPECT_EQ(VerdictOn([] { CheckName("disk", "naa.1"); }), "let in");
+  EXPECT_EQ(VerdictOn([] { CheckName("disk", absentName); }), "let in");
+  EXPECT_EQ(VerdictOn([] { CheckOption("passThrough", std::string(longestOption, 'o')); }), "let in");
 }
 
 TEST(GateForRemovals, RefusesAnUnfitNameOrText) {
-  EXPECT_THAT(VerdictOn([] { CheckRemoval("", {}); }), StartsWith("disk | "));
-  EXPECT_THAT(VerdictOn([] { CheckRemoval("a\n", {}); }), StartsWith("disk | "));
-  EXPECT_THAT(VerdictOn([] { CheckRemoval("a", {"\x01", "", 0, 0}); }), StartsWith("passThrough | "));
-  EXPECT_THAT(VerdictOn([] { CheckRemoval("a", {"", "\xFF", 0, 0}); }), StartsWith("optionText | "));
-  EXPECT_THAT(VerdictOn([] {
-                CheckRemoval("a", {"", std::string(longestOption + 1, 'o'), 0, 0});
-              }),
+  EXPECT_THAT(VerdictOn([] { CheckName("disk", ""); }), StartsWith("disk | "));
+  EXPECT_THAT(VerdictOn([] { CheckName("disk", "a\n"); }), StartsWith("disk | "));
+  EXPECT_THAT(VerdictOn([] { CheckOption("passThrough", "\x01"); }), StartsWith("passThrough | "));
+  EXPECT_THAT(VerdictOn([] { CheckOption("optionText", "\xFF"); }), StartsWith("optionText | "));
+  EXPECT_THAT(VerdictOn([] { CheckOption("optionText", std::string(longestOption + 1, 'o')); }),
               AllOf(StartsWith("optionText | "), HasSubstr("4096 bytes")));
 }
 
@@ -225,14 +223,14 @@ TEST_F(GateWithHost, LetsInTheMostDisksOfAGroupAndNoMore) {
   EXPECT_EQ(VerdictOnNewGroups({largest}), "let in");
   EXPECT_THAT(VerdictOnNewGroups({largest, larger}),
               AllOf(StartsWith("mappings[1].nonSsd | "), HasSubstr("more than 1000 disks")));
-  EXPECT_THAT(VerdictOn([&] { AdmitGroup(*larger, Known()); }), StartsWith("mapping.nonSsd | "));
+  EXPECT_THAT(VerdictOn([&] { AdmitGroup(larger.Get(), Known()); }), StartsWith("mapping.nonSsd | "));
 }
 
 TEST_F(GateWithHost, LetsGroupsThatAreThereNameDisksThatTheInventoryLacks) {
-  const auto group = AdmitGroup(*MappingOf("naa.x", {"naa.2", "naa.y"}), Known());
+  const auto group = AdmitGroup(MappingOf("naa.x", {"naa.2", "naa.y"}).Get(), Known());
   EXPECT_TRUE(group->GetSsd()->GetSsd());
   EXPECT_FALSE((*group->GetNonSsd())[1]->GetSsd());
-  EXPECT_EQ(VerdictOn([&] { AdmitGroup(*MappingOf("", {}), Known()); }),
+  EXPECT_EQ(VerdictOn([&] { AdmitGroup(MappingOf("", {}).Get(), Known()); }),
             "mapping.ssd | mapping.ssd: the name of a disk is empty");
   EXPECT_EQ(VerdictOn([&] { AdmitGroups(*Mappings({MappingOf("naa.x", {"naa.y"})}), Known()); }), "let in");
 }

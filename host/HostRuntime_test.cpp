@@ -29,6 +29,7 @@
 namespace Host {
 namespace {
 
+namespace Op = Nox::Operation;
 using Nox::Kova::Host::DiskResult;
 using OtxCtl::Sim::AHost;
 using OtxCtl::Sim::HostBuilder;
@@ -96,7 +97,7 @@ std::vector<std::string> DisksOf(const Answer& answer) {
 }
 
 std::vector<std::string> Disks(const HostRuntime& runtime) {
-  return DisksOf(KovaService(runtime.Hooks()).QueryDisksForKova({}));
+  return DisksOf(KovaService(runtime.Hooks()).Query(Op::QueryDisksForKova()));
 }
 
 template <class Error>
@@ -172,7 +173,7 @@ TEST_F(HostRuntimeTest, WithoutAStorageSystemAQueryIsASystemError) {
       [](HostDescription& host) { host.storageSystem = OtxCtl::Sim::StorageSystem::Missing; }));
   InOwnProcess([&options] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const Answer answer = KovaService(runtime.Hooks()).QueryDisksForKova({});
+    const Answer answer = KovaService(runtime.Hooks()).Query(Op::QueryDisksForKova());
     EXPECT_FALSE(answer.result);
     EXPECT_NE(dynamic_cast<const Orbis::Fault::SystemError*>(answer.fault.Get()), nullptr);
 
@@ -239,7 +240,7 @@ TEST_F(HostRuntimeTest, MakesNoGroupOfADiskThatTheKernelCouldNotTellAbout) {
     HostRuntime& runtime = HostRuntime::Start(options);
     const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
     const Answer answer =
-        service.InitializeDisks(*Testing::Mappings({Testing::MappingOf("naa.1", {"naa.2"})}));
+        service.Change(Op::InitializeDisks(Testing::Mappings({Testing::MappingOf("naa.1", {"naa.2"})})));
     EXPECT_TRUE(answer.fault);
     EXPECT_TRUE(runtime.SimulatedHost().Snapshot().groups.empty());
   });
@@ -266,7 +267,7 @@ TEST_F(HostRuntimeTest, WarnsOfAChangeThatMayNotLastAndKeepsIt) {
       [&options] {
         HostRuntime& runtime = HostRuntime::Start(options);
         const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
-        EXPECT_FALSE(service.AddAllEligibleDisks().fault);
+        EXPECT_FALSE(service.Change(Op::AddAllEligibleDisks()).fault);
         EXPECT_EQ(runtime.SimulatedHost().Snapshot().groups.size(), 1u);
         EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile), runtime.SimulatedHost().Snapshot());
         FlushLogs();
@@ -333,17 +334,17 @@ TEST_F(HostRuntimeTest, AddsUnmountsClaimsAndRemovesOnTheSimulatedHost) {
     HostRuntime& runtime = HostRuntime::Start(options);
     const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
     const auto groups = [&runtime] { return runtime.SimulatedHost().Snapshot().groups; };
-    EXPECT_EQ(ToldBy(service.AddDisks(*Testing::DisksNamed({"naa.1", "naa.2", "naa.3"}))), "done");
+    EXPECT_EQ(ToldBy(service.Change(Op::AddDisks(Testing::DisksNamed({"naa.1", "naa.2", "naa.3"})))), "done");
     ASSERT_EQ(groups().size(), 1u);
-    EXPECT_EQ(ToldBy(service.RemoveDisk("naa.3", {})), "done");
+    EXPECT_EQ(ToldBy(service.Change(Op::RemoveDisk("naa.3"))), "done");
     const auto group = Testing::MappingOf("naa.1", {"naa.2"});
-    EXPECT_EQ(ToldBy(service.UnmountDiskMapping(*Testing::Mappings({group}))), "done");
+    EXPECT_EQ(ToldBy(service.Change(Op::UnmountDiskMapping(Testing::Mappings({group})))), "done");
     EXPECT_FALSE(groups()[0].mounted);
-    EXPECT_EQ(ToldBy(service.ClaimUnmountedDiskgroup()), "done");
+    EXPECT_EQ(ToldBy(service.Change(Op::ClaimUnmountedDiskgroup())), "done");
     EXPECT_TRUE(groups()[0].mounted);
-    EXPECT_EQ(ToldBy(service.RemoveDiskMapping(*group, {})), "done");
+    EXPECT_EQ(ToldBy(service.Change(Op::RemoveDiskMapping(group))), "done");
     EXPECT_TRUE(groups().empty());
-    EXPECT_EQ(ToldBy(service.InitializeDisks(*Testing::Mappings({group}))), "done");
+    EXPECT_EQ(ToldBy(service.Change(Op::InitializeDisks(Testing::Mappings({group})))), "done");
     EXPECT_EQ(groups().size(), 1u);
   });
 }
@@ -357,10 +358,10 @@ TEST_F(HostRuntimeTest, RefusesTheCacheDiskOfABrokenGroupThatWouldEndThePlugin) 
   InOwnProcess([&options] {
     HostRuntime& runtime = HostRuntime::Start(options);
     const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
-    EXPECT_THAT(ToldBy(service.AddDisks(*Testing::DisksNamed({"naa.1", "naa.4"}))),
+    EXPECT_THAT(ToldBy(service.Change(Op::AddDisks(Testing::DisksNamed({"naa.1", "naa.4"})))),
                 HasSubstr("'kova:uuid-of-naa.3'"));
     EXPECT_EQ(ToldBy(service.ChangeHost(R"({"disk": {"name": "naa.3", "absent": false}})")), "done");
-    EXPECT_EQ(ToldBy(service.AddDisks(*Testing::DisksNamed({"naa.1"}))), "done");
+    EXPECT_EQ(ToldBy(service.Change(Op::AddDisks(Testing::DisksNamed({"naa.1"})))), "done");
     EXPECT_TRUE(runtime.SimulatedHost().Snapshot().groups[0].mounted);
   });
 }

@@ -2,12 +2,16 @@
 
 #include <exception>
 #include <memory>
+#include <string>
 #include <utility>
+#include <vector>
 
 #include "host/Gate.h"
 #include "host/HostError.h"
 #include "host/KnownDisks.h"
+#include "host/Refusal.h"
 #include "host/RequestTexts.h"
+#include "host/Text.h"
 #include "host/UnmountedGroups.h"
 #include "host/UnusableDisks.h"
 #include "kova/agentd/include/HostCtlException.h"
@@ -15,25 +19,30 @@
 #include "kova/agentd/include/KovaPlugin.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
+#include "nox/Tasks.h"
+#include "orbis/TypeDescriptor.h"
 #include "otxctl/TaskScope.h"
 #include "otxctl/sim/SimHost.h"
 
 namespace Host {
 
+namespace Op = Nox::Operation;
 using Nox::Kova::Host::DiskMapping;
 using OtxCtl::Sim::HostDescription;
 using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
+using Tessa::MakeRef;
 using Tessa::Ref;
 
 namespace {
 
-// Calls a hook with empty texts and reads what it appended.
+// Calls a hook with empty texts; what it appended is the answer.
 template <class Call>
 Answer Ask(Call call) {
   std::string faultText;
   std::string resultText;
   call(faultText, resultText);
-  return ReadAnswer(faultText, resultText);
+  return AnswerOf(faultText, std::move(resultText));
 }
 
 // The work's answer; what the gate refuses, and any exception, become a fault.
@@ -55,6 +64,13 @@ Answer OrFailed(Answer answer, const char* reason) {
   return answer.result || answer.fault ? answer : FailedWith(reason);
 }
 
+// The items of a list that a request may leave out.
+template <class List>
+const List& ItemsOf(const Ref<List>& list) {
+  static const List& none = *new List;
+  return list ? *list : none;
+}
+
 std::vector<std::string> NamesOf(const DiskList& disks) {
   std::vector<std::string> names;
   for (const Nox::Host::ScsiDisk* disk : disks) {
@@ -62,6 +78,24 @@ std::vector<std::string> NamesOf(const DiskList& disks) {
   }
   return names;
 }
+
+// What a removal hands to the kernel as it is.
+struct Removal {
+  template <class Request>
+  explicit Removal(const Request& request)
+      : passThrough(request.HasPassThrough() ? request.GetPassThrough() : ""),
+        optionText(request.HasOptionText() ? request.GetOptionText() : ""),
+        optionFirst(request.HasOptionFirst() ? request.GetOptionFirst() : 0),
+        optionSecond(request.HasOptionSecond() ? request.GetOptionSecond() : 0) {
+    Gate::CheckOption("passThrough", passThrough);
+    Gate::CheckOption("optionText", optionText);
+  }
+
+  std::string passThrough;
+  std::string optionText;
+  int optionFirst;
+  int optionSecond;
+};
 
 std::string RequestTag() {
   const OtxCtl::TaskScope* const task = OtxCtl::TaskScope::Current();
@@ -72,39 +106,29 @@ std::unique_ptr<HostCtl::Kova::KovaInfo> Kernel() {
   return std::unique_ptr<HostCtl::Kova::KovaInfo>(OtxCtl::Kova::KovaPluginImpl().GetKovaInfo());
 }
 
-}  // namespace
-
-Answer KovaService::QueryDisksForKova(const std::vector<std::string>& names) const {
-  return Read(QueryDisksWritten(names));
+Answer QueryDisks(const PluginHooks& hooks, const std::vector<std::string>& names) {
+  std::vector<std::string> wanted = names;
+  return OrFailed(Ask([&](std::string& faultText, std::string& resultText) {
+                    hooks.queryDisksForKova(wanted, faultText, resultText);
+                  }),
+                  "The disks of the host could not be read; the agent's log says why.");
 }
 
-WrittenAnswer KovaService::QueryDisksWritten(const std::vector<std::string>& names) const {
-  WrittenAnswer written;
-  const Answer rest = Guarded([&] {
-    Gate::CheckNames("names", names);
-    std::vector<std::string> wanted = names;
-    std::string faultText;
-    std::string resultText;
-    _hooks.queryDisksForKova(wanted, faultText, resultText);
-    const Answer read = ReadAnswer(faultText, "");
-    written.result = std::move(resultText);
-    return written.result.empty()
-               ? OrFailed(read, "The disks of the host could not be read; the agent's log says why.")
-               : read;
-  });
-  written.fault = rest.fault;
-  return written;
+Answer QueryDisksForKova(const PluginHooks& hooks, const Op::QueryDisksForKova& request) {
+  const std::vector<std::string> names =
+      request.GetNames() ? request.GetNames()->Items() : std::vector<std::string>();
+  Gate::CheckNames("names", names);
+  return QueryDisks(hooks, names);
 }
 
-Answer KovaService::GetStorageInfo() const {
-  return Guarded([&] {
-    return OrFailed(Ask([&](std::string&, std::string& resultText) { _hooks.getStorageInfo(resultText); }),
-                    "The disk groups of the host could not be read; the agent's log says why.");
-  });
+Answer GetStorageInfo(const PluginHooks& hooks, const Op::GetStorageInfo&) {
+  return OrFailed(Ask([&](std::string&, std::string& resultText) { hooks.getStorageInfo(resultText); }),
+                  "The disk groups of the host could not be read; the agent's log says why.");
 }
 
-Answer KovaService::GetDiskGroups() const {
-  Answer answer = GetStorageInfo();
+// The mounted groups as the plug-in tells them, and behind them the others that the kernel has.
+Answer GetDiskGroups(const PluginHooks& hooks, const Op::GetDiskGroups&) {
+  Answer answer = GetStorageInfo(hooks, Op::GetStorageInfo());
   auto* const info = dynamic_cast<StorageInfo*>(answer.result.Get());
   if (info == nullptr) {
     return answer;
@@ -113,91 +137,132 @@ Answer KovaService::GetDiskGroups() const {
     AppendUnlisted(GroupsOf(*Kernel()), KnownDisks::Now(), *info);
     return Answer();
   });
-  answer.fault = more.fault;  // beside the groups that could be read
+  return {.result = Ref<StorageInfo>(info), .fault = more.fault};  // beside the groups that could be read
+}
+
+Answer GetConfigInfo(const PluginHooks& hooks, const Op::GetConfigInfo&) {
+  return OrFailed(Ask([&](std::string&, std::string& resultText) { hooks.getConfigInfo(resultText); }),
+                  "The configuration of the host could not be read; the agent's log says why.");
+}
+
+Answer AddDisks(const PluginHooks& hooks, const Op::AddDisks& request) {
+  const KnownDisks known = KnownDisks::Now();
+  const Ref<DiskList> admitted = Gate::AdmitDisks(ItemsOf(request.GetDisks()), known);
+  Gate::DemandWholeGroups(*admitted, known, *Kernel());
+  const Kovasvc::Texts texts = ToTexts(*admitted);
+  Answer answer = Ask([&](std::string& faultText, std::string& resultText) {
+    hooks.addDisks(texts, RequestTag(), faultText, resultText);
+  });
+  if (dynamic_cast<const Nox::Fault::InsufficientDisks*>(answer.fault.Get()) != nullptr) {
+    NameUnusableDisks(Guarded([&] { return QueryDisks(hooks, NamesOf(*admitted)); }), *answer.fault);
+  }
   return answer;
 }
 
-Answer KovaService::GetConfigInfo() const {
-  return Guarded([&] {
-    return OrFailed(Ask([&](std::string&, std::string& resultText) { _hooks.getConfigInfo(resultText); }),
-                    "The configuration of the host could not be read; the agent's log says why.");
+Answer AddAllEligibleDisks(const PluginHooks& hooks, const Op::AddAllEligibleDisks&) {
+  return Ask([&](std::string& faultText, std::string& resultText) {
+    hooks.addAllEligibleDisks(RequestTag(), faultText, resultText);
   });
 }
 
-Answer KovaService::AddDisks(const DiskList& disks) const {
-  return Guarded([&] {
-    const KnownDisks known = KnownDisks::Now();
-    const Ref<DiskList> admitted = Gate::AdmitDisks(disks, known);
-    Gate::DemandWholeGroups(*admitted, known, *Kernel());
-    const Kovasvc::Texts texts = ToTexts(*admitted);
-    Answer answer = Ask([&](std::string& faultText, std::string& resultText) {
-      _hooks.addDisks(texts, RequestTag(), faultText, resultText);
-    });
-    if (dynamic_cast<const Nox::Fault::InsufficientDisks*>(answer.fault.Get()) != nullptr) {
-      NameUnusableDisks(QueryDisksForKova(NamesOf(*admitted)), *answer.fault);
+Answer InitializeDisks(const PluginHooks& hooks, const Op::InitializeDisks& request) {
+  const Kovasvc::Texts texts =
+      ToTexts(*Gate::AdmitNewGroups(ItemsOf(request.GetMappings()), KnownDisks::Now()));
+  Gate::DemandAnswers(*Kernel());
+  return Ask([&](std::string& faultText, std::string& resultText) {
+    hooks.initializeDisks(texts, RequestTag(), faultText, resultText);
+  });
+}
+
+Answer UnmountDiskMapping(const PluginHooks& hooks, const Op::UnmountDiskMapping& request) {
+  const Kovasvc::Texts texts = ToTexts(*Gate::AdmitGroups(ItemsOf(request.GetMappings()), KnownDisks::Now()));
+  return Ask([&](std::string& faultText, std::string& resultText) {
+    hooks.unmountDiskMapping(texts, RequestTag(), faultText, resultText);
+  });
+}
+
+Answer RemoveDisk(const PluginHooks& hooks, const Op::RemoveDisk& request) {
+  const std::string& disk = request.GetDisk();
+  Gate::CheckName("disk", disk);
+  const Removal removal(request);
+  Gate::DemandOneIfAbsent("disk", disk, *Kernel());
+  return Ask([&](std::string& faultText, std::string&) {
+    hooks.removeDisks(disk, removal.passThrough, removal.optionText, removal.optionFirst,
+                      removal.optionSecond, faultText);
+  });
+}
+
+Answer RemoveDiskMapping(const PluginHooks& hooks, const Op::RemoveDiskMapping& request) {
+  const Removal removal(request);
+  const Ref<DiskMapping> admitted = Gate::AdmitGroup(request.GetMapping().Get(), KnownDisks::Now());
+  const auto kernel = Kernel();
+  Gate::DemandGroupIfAbsent(*admitted, *kernel);
+  Gate::DemandOneIfAbsent("mapping.ssd", admitted->GetSsd()->GetCanonicalName(), *kernel);
+  const std::string text = ToText(*admitted);
+  return Ask([&](std::string& faultText, std::string&) {
+    hooks.removeDiskMapping(text, removal.passThrough, removal.optionText, removal.optionFirst,
+                            removal.optionSecond, faultText);
+  });
+}
+
+Answer ClaimUnmountedDiskgroup(const PluginHooks& hooks, const Op::ClaimUnmountedDiskgroup&) {
+  hooks.claimUnmountedDiskgroup();
+  return {};
+}
+
+// A host by itself remembers no changes: its agent does.
+Answer GetTasks(const PluginHooks&, const Op::GetTasks&) {
+  return {.result = MakeRef<Orbis::DataArray<Nox::Task>>(), .fault = nullptr};
+}
+
+Answer GetTask(const PluginHooks&, const Op::GetTask& request) {
+  Refuse("id", "there is no task '" + Printable(request.GetId()) + "'");
+}
+
+// Which function answers which request.
+struct Row {
+  const Orbis::TypeDescriptor& (*request)();
+  Answer (*answer)(const PluginHooks& hooks, const Orbis::DataObject& request);
+};
+
+template <class Request, Answer (*function)(const PluginHooks&, const Request&)>
+constexpr Row rowOf = {&Request::StaticType, [](const PluginHooks& hooks, const Orbis::DataObject& request) {
+                         return function(hooks, static_cast<const Request&>(request));
+                       }};
+
+constexpr Row rows[] = {
+    rowOf<Op::QueryDisksForKova, &QueryDisksForKova>,
+    rowOf<Op::GetStorageInfo, &GetStorageInfo>,
+    rowOf<Op::GetDiskGroups, &GetDiskGroups>,
+    rowOf<Op::GetConfigInfo, &GetConfigInfo>,
+    rowOf<Op::GetTasks, &GetTasks>,
+    rowOf<Op::GetTask, &GetTask>,
+    rowOf<Op::AddDisks, &AddDisks>,
+    rowOf<Op::AddAllEligibleDisks, &AddAllEligibleDisks>,
+    rowOf<Op::InitializeDisks, &InitializeDisks>,
+    rowOf<Op::UnmountDiskMapping, &UnmountDiskMapping>,
+    rowOf<Op::RemoveDisk, &RemoveDisk>,
+    rowOf<Op::RemoveDiskMapping, &RemoveDiskMapping>,
+    rowOf<Op::ClaimUnmountedDiskgroup, &ClaimUnmountedDiskgroup>,
+};
+
+Answer AnswerTo(const Orbis::DataObject& request, const PluginHooks& hooks) {
+  for (const Row& row : rows) {
+    if (&row.request() == &request.GetType()) {
+      return Guarded([&] { return row.answer(hooks, request); });
     }
-    return answer;
-  });
+  }
+  return FailedWith("this host does not serve " + request.GetType().name);
 }
 
-Answer KovaService::AddAllEligibleDisks() const {
-  return Guarded([&] {
-    return Ask([&](std::string& faultText, std::string& resultText) {
-      _hooks.addAllEligibleDisks(RequestTag(), faultText, resultText);
-    });
-  });
+}  // namespace
+
+Answer KovaService::Query(const Op::Query& request) const {
+  return AnswerTo(request, _hooks);
 }
 
-Answer KovaService::InitializeDisks(const MappingList& mappings) const {
-  return Guarded([&] {
-    const Kovasvc::Texts texts = ToTexts(*Gate::AdmitNewGroups(mappings, KnownDisks::Now()));
-    Gate::DemandAnswers(*Kernel());
-    return Ask([&](std::string& faultText, std::string& resultText) {
-      _hooks.initializeDisks(texts, RequestTag(), faultText, resultText);
-    });
-  });
-}
-
-Answer KovaService::UnmountDiskMapping(const MappingList& mappings) const {
-  return Guarded([&] {
-    const Kovasvc::Texts texts = ToTexts(*Gate::AdmitGroups(mappings, KnownDisks::Now()));
-    return Ask([&](std::string& faultText, std::string& resultText) {
-      _hooks.unmountDiskMapping(texts, RequestTag(), faultText, resultText);
-    });
-  });
-}
-
-Answer KovaService::RemoveDisk(const std::string& disk, const RemovalArguments& arguments) const {
-  return Guarded([&] {
-    Gate::CheckRemoval(disk, arguments);
-    Gate::DemandOneIfAbsent("disk", disk, *Kernel());
-    return Ask([&](std::string& faultText, std::string&) {
-      _hooks.removeDisks(disk, arguments.passThrough, arguments.optionText, arguments.optionFirst,
-                         arguments.optionSecond, faultText);
-    });
-  });
-}
-
-Answer KovaService::RemoveDiskMapping(const DiskMapping& mapping, const RemovalArguments& arguments) const {
-  return Guarded([&] {
-    Gate::CheckRemovalArguments(arguments);
-    const Ref<DiskMapping> admitted = Gate::AdmitGroup(mapping, KnownDisks::Now());
-    const auto kernel = Kernel();
-    Gate::DemandGroupIfAbsent(*admitted, *kernel);
-    Gate::DemandOneIfAbsent("mapping.ssd", admitted->GetSsd()->GetCanonicalName(), *kernel);
-    const std::string text = ToText(*admitted);
-    return Ask([&](std::string& faultText, std::string&) {
-      _hooks.removeDiskMapping(text, arguments.passThrough, arguments.optionText, arguments.optionFirst,
-                               arguments.optionSecond, faultText);
-    });
-  });
-}
-
-Answer KovaService::ClaimUnmountedDiskgroup() const {
-  return Guarded([&] {
-    _hooks.claimUnmountedDiskgroup();
-    return Answer();
-  });
+Answer KovaService::Change(const Op::Change& request) const {
+  return AnswerTo(request, _hooks);
 }
 
 OtxCtl::Sim::SimHost& KovaService::SimulatedHost() const {

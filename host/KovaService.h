@@ -9,7 +9,6 @@
 #pragma once
 
 #include <string>
-#include <vector>
 
 #include "host/ManagementApi.h"
 #include "host/PluginLoader.h"
@@ -29,19 +28,8 @@ class KovaService final : public ManagementApi {
   explicit KovaService(const PluginHooks& hooks, OtxCtl::Sim::SimHost* simulated = nullptr)
       : _hooks(hooks), _simulated(simulated) {}
 
-  Answer QueryDisksForKova(const std::vector<std::string>& names) const override;
-  WrittenAnswer QueryDisksWritten(const std::vector<std::string>& names) const override;
-  Answer GetStorageInfo() const override;
-  Answer GetDiskGroups() const override;
-  Answer GetConfigInfo() const override;
-  Answer AddDisks(const DiskList& disks) const override;
-  Answer AddAllEligibleDisks() const override;
-  Answer InitializeDisks(const MappingList& mappings) const override;
-  Answer UnmountDiskMapping(const MappingList& mappings) const override;
-  Answer RemoveDisk(const std::string& disk, const RemovalArguments& arguments) const override;
-  Answer RemoveDiskMapping(const Nox::Kova::Host::DiskMapping& mapping,
-                           const RemovalArguments& arguments) const override;
-  Answer ClaimUnmountedDiskgroup() const override;
+  Answer Query(const Nox::Operation::Query& request) const override;
+  Answer Change(const Nox::Operation::Change& request) const override;
   std::string DescribeHost() const override;
   Answer ChangeHost(const std::string& change) const override;
 

@@ -137,14 +137,15 @@ class KovaServiceChanges : public testing::Test {
 };
 
 TEST_F(KovaServiceChanges, HandsDisksDownAsTheInventoryKnowsThem) {
-  EXPECT_EQ(Told(_service.AddDisks(*Disks({ADisk("naa.1"), ADisk("naa.2", true)})).fault.Get()), "done");
+  EXPECT_EQ(Told(_service.Change(Op::AddDisks(Disks({ADisk("naa.1"), ADisk("naa.2", true)}))).fault.Get()),
+            "done");
   EXPECT_THAT(heard, ElementsAre("add naa.1! naa.2 #"));
 }
 
 TEST_F(KovaServiceChanges, HandsGroupsDownAsTheInventoryKnowsThem) {
   const auto mappings = Mappings({MappingOf("naa.1", {"naa.2"}), MappingOf("naa.3", {})});
-  _service.InitializeDisks(*mappings);
-  _service.UnmountDiskMapping(*mappings);
+  _service.Change(Op::InitializeDisks(mappings));
+  _service.Change(Op::UnmountDiskMapping(mappings));
   EXPECT_THAT(heard, ElementsAre("init naa.1!<naa.2> naa.3<> #", "unmount naa.1!<naa.2> naa.3<> #"));
 }
 
@@ -158,8 +159,8 @@ TEST_F(KovaServiceChanges, HandsNoGroupDownThatGrowsBeyondWhatThePluginReads) {
   };
   const KovaService service(hooks);
   const auto unmount = [&](std::size_t disks) {
-    return service.UnmountDiskMapping(
-        *Mappings({MappingOf("naa.2", std::vector<std::string>(disks, "naa.2"))}));
+    return service.Change(
+        Op::UnmountDiskMapping(Mappings({MappingOf("naa.2", std::vector<std::string>(disks, "naa.2"))})));
   };
   EXPECT_THAT(Told(unmount(99'000).fault.Get()), StartsWith("mappings[0].nonSsd | "));
   EXPECT_EQ(bytes, 0u) << "the hook is not called";
@@ -168,17 +169,17 @@ TEST_F(KovaServiceChanges, HandsNoGroupDownThatGrowsBeyondWhatThePluginReads) {
 }
 
 TEST_F(KovaServiceChanges, HandsRemovalsDownWithAllThatBelongsToThem) {
-  _service.RemoveDisk("naa.2", {"p", "o", -1, 2});
-  _service.RemoveDiskMapping(*MappingOf("naa.1", {"naa.9"}), {"q", "r", 3, -4});
+  _service.Change(WithOptions(Op::RemoveDisk("naa.2"), {"p", "o", -1, 2}));
+  _service.Change(WithOptions(Op::RemoveDiskMapping(MappingOf("naa.1", {"naa.9"})), {"q", "r", 3, -4}));
   EXPECT_THAT(heard, ElementsAre("remove naa.2 p o -1 2", "remove group naa.1!<naa.9> q r 3 -4"));
 }
 
 TEST_F(KovaServiceChanges, TakesTheTasksIdForTheRequestTag) {
   const OtxCtl::TaskScope task("task-7", {});
-  _service.AddDisks(*DisksNamed({"naa.2"}));
-  _service.InitializeDisks(*Mappings({}));
-  _service.UnmountDiskMapping(*Mappings({}));
-  _service.AddAllEligibleDisks();
+  _service.Change(Op::AddDisks(DisksNamed({"naa.2"})));
+  _service.Change(Op::InitializeDisks(Mappings({})));
+  _service.Change(Op::UnmountDiskMapping(Mappings({})));
+  _service.Change(Op::AddAllEligibleDisks());
   EXPECT_THAT(heard, ElementsAre("add naa.2 #task-7", "init #task-7", "unmount #task-7", "add all #task-7"));
 }
 
@@ -187,18 +188,21 @@ TEST_F(KovaServiceChanges, HandsUpResultAndFault) {
   Orbis::SerializeObjectToSoap(results, nullptr, saidResult);
   Orbis::SerializeObjectToSoap(Orbis::Fault::SystemError("half of it failed"), nullptr, saidFault);
   for (const Answer& answer :
-       {_service.AddDisks(*Disks({})), _service.AddAllEligibleDisks(),
-        _service.InitializeDisks(*Mappings({})), _service.UnmountDiskMapping(*Mappings({}))}) {
+       {_service.Change(Op::AddDisks(Disks({}))), _service.Change(Op::AddAllEligibleDisks()),
+        _service.Change(Op::InitializeDisks(Mappings({}))),
+        _service.Change(Op::UnmountDiskMapping(Mappings({})))}) {
     EXPECT_TRUE(answer.result);
     EXPECT_EQ(Told(answer.fault.Get()), "half of it failed");
   }
-  EXPECT_EQ(Told(_service.RemoveDisk("naa.2", {}).fault.Get()), "half of it failed");
-  EXPECT_EQ(Told(_service.RemoveDiskMapping(*MappingOf("naa.1", {}), {}).fault.Get()), "half of it failed");
+  EXPECT_EQ(Told(_service.Change(Op::RemoveDisk("naa.2")).fault.Get()), "half of it failed");
+  EXPECT_EQ(Told(_service.Change(Op::RemoveDiskMapping(MappingOf("naa.1", {}))).fault.Get()),
+            "half of it failed");
 }
 
 TEST_F(KovaServiceChanges, AnswersWithNothingWhenThePluginSaysNothing) {
-  for (const Answer& answer : {_service.AddAllEligibleDisks(), _service.ClaimUnmountedDiskgroup(),
-                               _service.RemoveDisk("naa.2", {})}) {
+  for (const Answer& answer :
+       {_service.Change(Op::AddAllEligibleDisks()), _service.Change(Op::ClaimUnmountedDiskgroup()),
+        _service.Change(Op::RemoveDisk("naa.2"))}) {
     EXPECT_FALSE(answer.result);
     EXPECT_FALSE(answer.fault);
   }
@@ -209,15 +213,17 @@ TEST_F(KovaServiceChanges, CallsNoHookForWhatTheGateRefuses) {
   _host->Change([](HostDescription& host) { host.disks[2].absent = true; });
   _inventory->Replace(DescribeInventory(_host->Snapshot()));
   for (const auto& [answer, told] : std::vector<std::pair<Answer, const char*>>{
-           {_service.AddDisks(*DisksNamed({"naa.9"})), "disks[0] | "},
-           {_service.AddDisks(*DisksNamed({"naa.2", "naa.1"})), "disks[1] | "},
-           {_service.InitializeDisks(*Mappings({nullptr})), "mappings[0] | "},
-           {_service.InitializeDisks(*Mappings({MappingOf("naa.1", {"naa.9"})})), "mappings[0].nonSsd[0] | "},
-           {_service.UnmountDiskMapping(*Mappings({MappingOf("", {})})), "mappings[0].ssd | "},
-           {_service.RemoveDisk("", {}), "disk | "},
-           {_service.RemoveDisk("naa.2", {"\n", "", 0, 0}), "passThrough | "},
-           {_service.RemoveDiskMapping(*MappingOf("", {}), {}), "mapping.ssd | "},
-           {_service.RemoveDiskMapping(*MappingOf("naa.1", {}), {"", "\n", 0, 0}), "optionText | "}}) {
+           {_service.Change(Op::AddDisks(DisksNamed({"naa.9"}))), "disks[0] | "},
+           {_service.Change(Op::AddDisks(DisksNamed({"naa.2", "naa.1"}))), "disks[1] | "},
+           {_service.Change(Op::InitializeDisks(Mappings({nullptr}))), "mappings[0] | "},
+           {_service.Change(Op::InitializeDisks(Mappings({MappingOf("naa.1", {"naa.9"})}))),
+            "mappings[0].nonSsd[0] | "},
+           {_service.Change(Op::UnmountDiskMapping(Mappings({MappingOf("", {})}))), "mappings[0].ssd | "},
+           {_service.Change(Op::RemoveDisk("")), "disk | "},
+           {_service.Change(WithOptions(Op::RemoveDisk("naa.2"), {"\n", "", 0, 0})), "passThrough | "},
+           {_service.Change(Op::RemoveDiskMapping(MappingOf("", {}))), "mapping.ssd | "},
+           {_service.Change(WithOptions(Op::RemoveDiskMapping(MappingOf("naa.1", {})), {"", "\n", 0, 0})),
+            "optionText | "}}) {
     EXPECT_FALSE(answer.result);
     EXPECT_THAT(Told(answer.fault.Get()), StartsWith(told));
   }
@@ -230,7 +236,7 @@ TEST_F(KovaServiceChanges, MakesNoGroupWhileTheKernelCannotBeAsked) {
       host.faults = {
           {.operation = operation, .exception = "HostCtlException", .message = "busy", .disk = {}}};
     });
-    const Answer answer = _service.InitializeDisks(*Mappings({MappingOf("naa.1", {"naa.2"})}));
+    const Answer answer = _service.Change(Op::InitializeDisks(Mappings({MappingOf("naa.1", {"naa.2"})})));
     EXPECT_THAT(Told(answer.fault.Get()), HasSubstr("busy")) << operation;
   }
   EXPECT_THAT(heard, IsEmpty());
@@ -240,11 +246,12 @@ TEST_F(KovaServiceChanges, RemovesAGroupByAnAbsentDiskOnlyIfThatIsItsCacheDisk) 
   _host->Change([](HostDescription& host) { host.disks[0].absent = host.disks[2].absent = true; });
   _inventory->Replace(DescribeInventory(_host->Snapshot()));
   for (const char* name : {"kova:uuid-of-naa.3", "kova:01234567-89ab-cdef-0123-456789abcdef", "kova:"}) {
-    const Answer answer = _service.RemoveDiskMapping(*MappingOf(name, {}), {});
+    const Answer answer = _service.Change(Op::RemoveDiskMapping(MappingOf(name, {})));
     EXPECT_THAT(Told(answer.fault.Get()), StartsWith("mapping.ssd | ")) << name;
   }
   EXPECT_THAT(heard, IsEmpty());
-  EXPECT_EQ(Told(_service.RemoveDiskMapping(*MappingOf("kova:uuid-of-naa.1", {}), {}).fault.Get()), "done");
+  EXPECT_EQ(Told(_service.Change(Op::RemoveDiskMapping(MappingOf("kova:uuid-of-naa.1", {}))).fault.Get()),
+            "done");
   EXPECT_THAT(heard, ElementsAre("remove group kova:uuid-of-naa.1!<>   0 0"));
 }
 
@@ -258,22 +265,23 @@ TEST_F(KovaServiceChanges, RemovesNoAbsentDiskThatCouldBeAnother) {
     host.disks[1].absent = false;
   });
   const std::string both = "kova:same";
-  EXPECT_THAT(Told(_service.RemoveDisk(both, {}).fault.Get()), StartsWith("disk | disk: more than one disk"));
-  EXPECT_THAT(Told(_service.RemoveDiskMapping(*MappingOf(both, {}), {}).fault.Get()),
+  EXPECT_THAT(Told(_service.Change(Op::RemoveDisk(both)).fault.Get()),
+              StartsWith("disk | disk: more than one disk"));
+  EXPECT_THAT(Told(_service.Change(Op::RemoveDiskMapping(MappingOf(both, {}))).fault.Get()),
               StartsWith("mapping.ssd | mapping.ssd: more than one disk"));
   _host->Change([](HostDescription& host) { host.disks[0].inKernel = host.disks[2].inKernel = false; });
-  EXPECT_THAT(Told(_service.RemoveDisk(both, {}).fault.Get()), StartsWith("disk | "))
+  EXPECT_THAT(Told(_service.Change(Op::RemoveDisk(both)).fault.Get()), StartsWith("disk | "))
       << "both in their group, which is all that the kernel knows of them";
   _host->Change([](HostDescription& host) {
     host.disks[1].absent = true;
     host.disks[2].absent = false;
   });
-  EXPECT_THAT(Told(_service.RemoveDisk(both, {}).fault.Get()), StartsWith("disk | "))
+  EXPECT_THAT(Told(_service.Change(Op::RemoveDisk(both)).fault.Get()), StartsWith("disk | "))
       << "one in a group and one in none";
   EXPECT_THAT(heard, IsEmpty());
   _host->Change([](HostDescription& host) { host.disks[1].absent = false; });
-  _service.RemoveDisk(both, {});
-  _service.RemoveDiskMapping(*MappingOf(both, {}), {});
+  _service.Change(Op::RemoveDisk(both));
+  _service.Change(Op::RemoveDiskMapping(MappingOf(both, {})));
   EXPECT_EQ(heard.size(), 2u) << "one is absent: disks that are there have names of their own";
 }
 
@@ -283,10 +291,10 @@ TEST_F(KovaServiceChanges, RemovesNoAbsentDiskWhileTheKernelCannotBeAsked) {
       host.faults = {
           {.operation = operation, .exception = "HostCtlException", .message = "busy", .disk = {}}};
     });
-    EXPECT_THAT(Told(_service.RemoveDisk("kova:uuid-of-naa.3", {}).fault.Get()), HasSubstr("busy"));
+    EXPECT_THAT(Told(_service.Change(Op::RemoveDisk("kova:uuid-of-naa.3")).fault.Get()), HasSubstr("busy"));
   }
   EXPECT_THAT(heard, IsEmpty());
-  _service.RemoveDisk("naa.3", {});
+  _service.Change(Op::RemoveDisk("naa.3"));
   EXPECT_EQ(heard.size(), 1u) << "nothing is asked about disks that are called by their own names";
 }
 
@@ -295,12 +303,13 @@ TEST_F(KovaServiceChanges, AnswersAnExceptionOfAHookByASystemErrorWithItsText) {
   hooks.addAllEligibleDisks = [](const std::string&, std::string&, std::string&) {
     throw std::runtime_error("the kernel is gone");
   };
-  EXPECT_EQ(Told(KovaService(hooks).AddAllEligibleDisks().fault.Get()), "the kernel is gone");
+  EXPECT_EQ(Told(KovaService(hooks).Change(Op::AddAllEligibleDisks()).fault.Get()), "the kernel is gone");
 }
 
 TEST_F(KovaServiceChanges, AnswersWithoutAProviderByASystemError) {
   OtxCtl::Kova::SetProviderFactory({});
-  EXPECT_THAT(Told(_service.AddDisks(*DisksNamed({"naa.1"})).fault.Get()), HasSubstr("No kernel provider"));
+  EXPECT_THAT(Told(_service.Change(Op::AddDisks(DisksNamed({"naa.1"}))).fault.Get()),
+              HasSubstr("No kernel provider"));
   EXPECT_THAT(heard, IsEmpty());
 }
 
@@ -312,7 +321,7 @@ TEST_F(KovaServiceChanges, GroupsAreThoseOfStorageInfoAndTheUnmountedOnes) {
     Orbis::SerializeObjectToSoap(info, nullptr, result);
   };
   const KovaService service(hooks, _host.get());
-  Answer answer = service.GetDiskGroups();
+  Answer answer = service.Query(Op::GetDiskGroups());
   const auto* info = dynamic_cast<const Nox::Kova::Host::ConfigInfo::StorageInfo*>(answer.result.Get());
   ASSERT_NE(info, nullptr);
   EXPECT_FALSE(answer.fault);
@@ -324,7 +333,7 @@ TEST_F(KovaServiceChanges, GroupsAreThoseOfStorageInfoAndTheUnmountedOnes) {
     host.faults = {
         {.operation = "GetDiskMappings", .exception = "HostCtlException", .message = "busy", .disk = {}}};
   });
-  answer = service.GetDiskGroups();
+  answer = service.Query(Op::GetDiskGroups());
   EXPECT_TRUE(answer.result) << "what could be read is answered";
   EXPECT_EQ(Told(answer.fault.Get()), "busy");
 }

@@ -5,22 +5,24 @@
 
 #include <stdexcept>
 
+#include "host/testing/Requests.h"
 #include "nox/Kova.h"
 #include "orbis/Soap.h"
+#include "orbis/TypeDescriptor.h"
 
 namespace Host {
 namespace {
 
+namespace Op = Nox::Operation;
 using Nox::Kova::Host::DiskResult;
 using Orbis::DataArray;
 using Orbis::Fault::InvalidArgument;
 using Orbis::Fault::SystemError;
 using testing::ElementsAre;
 using testing::HasSubstr;
-using Names = std::vector<std::string>;
 
 // Hooks are plain functions, so what they see and say stands beside them.
-Names seenNames;
+std::vector<std::string> seenNames;
 std::string saidFault;
 std::string saidResult;
 int calls = 0;
@@ -32,7 +34,7 @@ std::string Soap(const Value& value) {
   return text;
 }
 
-void Speak(Names& names, std::string& fault, std::string& result) {
+void Speak(std::vector<std::string>& names, std::string& fault, std::string& result) {
   ++calls;
   seenNames = names;
   names.clear();  // a hook may do with its list what it likes
@@ -50,10 +52,10 @@ class KovaServiceTest : public testing::Test {
     calls = 0;
   }
 
-  static Answer Query(const Names& names, Kovasvc::QueryDisksForKovaFn* hook = &Speak) {
+  static Answer Query(const std::vector<std::string>& names, Kovasvc::QueryDisksForKovaFn* hook = &Speak) {
     PluginHooks hooks{};
     hooks.queryDisksForKova = hook;
-    return KovaService(hooks).QueryDisksForKova(names);
+    return KovaService(hooks).Query(Op::QueryDisksForKova(Testing::Names(names)));
   }
 };
 
@@ -91,14 +93,49 @@ TEST_F(KovaServiceTest, CallsNoHookForARequestThatTheGateRefuses) {
 }
 
 TEST_F(KovaServiceTest, AnswersAnExceptionOfAHookByASystemErrorWithItsText) {
-  const Answer answer =
-      Query({}, [](Names&, std::string&, std::string&) { throw std::runtime_error("the kernel is gone"); });
+  const Answer answer = Query({}, [](std::vector<std::string>&, std::string&, std::string&) {
+    throw std::runtime_error("the kernel is gone");
+  });
   EXPECT_FALSE(answer.result);
   EXPECT_EQ(ReasonOf(answer), "the kernel is gone");
 }
 
-TEST_F(KovaServiceTest, AnswersWhatCannotBeReadByASystemError) {
+TEST_F(KovaServiceTest, HandsTheTextOfAResultOnUnread) {
   saidResult = "<object";
+  EXPECT_EQ(*Query({}).result.GetText(), "<object");
+}
+
+// A plug-in with every hook, each of which answers with a fault that it was called.
+PluginHooks EveryHook() {
+  using Text = std::string;
+  using Texts = Kovasvc::Texts;
+  static const auto call = [](Text& fault) { fault += Soap(SystemError("called")); };
+  PluginHooks hooks{};
+  hooks.addDisks = [](const Texts&, const Text&, Text& fault, Text&) { call(fault); };
+  hooks.initializeDisks = [](const Texts&, const Text&, Text& fault, Text&) { call(fault); };
+  hooks.removeDisks = [](const Text&, const Text&, const Text&, int, int, Text& fault) { call(fault); };
+  hooks.removeDiskMapping = [](const Text&, const Text&, const Text&, int, int, Text& fault) { call(fault); };
+  hooks.queryDisksForKova = [](Texts&, Text& fault, Text&) { call(fault); };
+  hooks.addAllEligibleDisks = [](const Text&, Text& fault, Text&) { call(fault); };
+  hooks.unmountDiskMapping = [](const Texts&, const Text&, Text& fault, Text&) { call(fault); };
+  hooks.getStorageInfo = [](Text&) {};
+  hooks.getConfigInfo = [](Text&) {};
+  hooks.claimUnmountedDiskgroup = [] {};
+  return hooks;
+}
+
+TEST_F(KovaServiceTest, ServesEveryOperation) {
+  const KovaService service(EveryHook());
+  for (const Nox::OperationDescriptor& operation : Nox::Operations()) {
+    const auto request = operation.request.create();
+    const Answer answer = operation.changes ? service.Change(dynamic_cast<const Op::Change&>(*request))
+                                            : service.Query(dynamic_cast<const Op::Query&>(*request));
+    EXPECT_THAT(ReasonOf(answer), testing::Not(HasSubstr("does not serve"))) << operation.name;
+  }
+}
+
+TEST_F(KovaServiceTest, AnswersAFaultThatCannotBeReadByASystemError) {
+  saidFault = "<object";
   const Answer answer = Query({});
   EXPECT_FALSE(answer.result);
   EXPECT_THAT(ReasonOf(answer), testing::Not(testing::AnyOf("no SystemError", "")));

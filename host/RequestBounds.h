@@ -3,21 +3,21 @@
 // Threads: any.
 #pragma once
 
-#include <string>
+#include <cstddef>
 
-#include "host/ManagementApi.h"
+namespace Orbis {
+class DataObject;
+}
 
 namespace Host {
 
-// The disks with nothing but name and flag: what the gate looks at. Too many of them, or too long a name, are
-// refused by an InvalidArgument as the gate does it; whatever else is wrong is left to the gate.
-Tessa::Ref<DiskList> Lean(const std::string& property, const DiskList& disks);
-Tessa::Ref<MappingList> Lean(const MappingList& mappings);
-Tessa::Ref<Nox::Kova::Host::DiskMapping> Lean(const Nox::Kova::Host::DiskMapping& mapping);
+// Checks a request and cuts it down to what the gate looks at: of a disk, its name and its flag. Too many of
+// anything, or too long a text, is refused by an InvalidArgument as the gate does it; whatever else is wrong
+// is left to the gate. Texts are names of disks in a list; a text that must be there names one thing, one
+// that may be missing is handed on as it is.
+void Bound(Orbis::DataObject& request);
 
-// Roughly the bytes that they take in memory.
-std::size_t WeightOf(const DiskList& disks);
-std::size_t WeightOf(const MappingList& mappings);
-std::size_t WeightOf(const Nox::Kova::Host::DiskMapping& mapping);
+// Roughly the bytes that the request takes in memory; a bounded one.
+std::size_t WeightOf(const Orbis::DataObject& request);
 
 }  // namespace Host

@@ -1,8 +1,8 @@
 // Requests as the texts that the plug-in reads.
 //
-// The plug-in ends the process over a text that it cannot read. So each text is read again here, by the same
-// reader, and must come out with the disks that went in; otherwise the request is refused by an
-// InvalidArgument that names the disk or the group, as it is when all texts together are too large.
+// The plug-in ends the process over a text that it cannot read, so what goes into one must come out again: a
+// name that XML cannot hold, a text larger than the plug-in's reader takes, and texts too large together are
+// refused by an InvalidArgument that names the disk or the group.
 //
 // Threads: any.
 #pragma once

@@ -5,6 +5,7 @@
 #include "kovactl/Print.h"
 #include "kovactl/Table.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
 
 namespace Kovactl {
 namespace {
@@ -54,7 +55,7 @@ void PrintText(const ConfigInfo& config, std::ostream& out) {
 
 ExitStatus RunConfig(const Host::ManagementApi& host, const std::string& output, std::ostream& out,
                      std::ostream& err) {
-  return PrintAnswer<ConfigInfo>(host.GetConfigInfo(), output, out, err, &PrintText);
+  return PrintAnswer<ConfigInfo>(host.Query(Nox::Operation::GetConfigInfo()), output, out, err, &PrintText);
 }
 
 }  // namespace Kovactl

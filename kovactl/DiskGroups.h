@@ -6,6 +6,7 @@
 
 #include "host/ManagementApi.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
 
 namespace Kovactl {
 
@@ -17,7 +18,9 @@ class DiskGroups {
  public:
   // Of a host that could not tell, there are none, and the fault says why.
   explicit DiskGroups(const Host::Answer& answer);
-  static DiskGroups Of(const Host::ManagementApi& host) { return DiskGroups(host.GetDiskGroups()); }
+  static DiskGroups Of(const Host::ManagementApi& host) {
+    return DiskGroups(host.Query(Nox::Operation::GetDiskGroups()));
+  }
 
   const Tessa::Ref<Orbis::MethodFault>& Fault() const noexcept { return _fault; }
   // Null when the host could not tell.

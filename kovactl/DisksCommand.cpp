@@ -9,6 +9,7 @@
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
 
 namespace Kovactl {
 namespace {
@@ -53,7 +54,8 @@ void PrintTable(const DiskResults& disks, std::ostream& out) {
 
 ExitStatus RunDisks(const Host::ManagementApi& host, const std::vector<std::string>& names,
                     const std::string& output, std::ostream& out, std::ostream& err) {
-  const Host::Answer answer = host.QueryDisksForKova(names);
+  const Host::Answer answer =
+      host.Query(Nox::Operation::QueryDisksForKova(Tessa::MakeRef<Orbis::TextList>(names)));
   const ExitStatus status = PrintAnswer<DiskResults>(answer, output, out, err, &PrintTable);
   const auto* const disks = dynamic_cast<const DiskResults*>(answer.result.Get());
   if (disks == nullptr) {

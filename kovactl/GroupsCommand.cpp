@@ -7,6 +7,7 @@
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
 
 namespace Kovactl {
 namespace {
@@ -66,7 +67,7 @@ void PrintTable(const StorageInfo& info, std::ostream& out) {
 
 ExitStatus RunGroups(const Host::ManagementApi& host, const std::string& output, std::ostream& out,
                      std::ostream& err) {
-  return PrintAnswer<StorageInfo>(host.GetDiskGroups(), output, out, err, &PrintTable);
+  return PrintAnswer<StorageInfo>(host.Query(Nox::Operation::GetDiskGroups()), output, out, err, &PrintTable);
 }
 
 }  // namespace Kovactl

@@ -9,6 +9,7 @@
 #include "nox/Faults.h"
 #include "nox/Host.h"
 #include "nox/Kova.h"
+#include "nox/Tasks.h"
 #include "orbis/Engine.h"
 #include "orbis/Scalar.h"
 #include "orbis/TypeDescriptor.h"
@@ -56,6 +57,9 @@ const std::map<std::string, Getter>& OptionalGetters() {
        [](DataObject& o) { As<Kova::Host::ConfigInfo::ClusterInfo>(o).GetNodeUuid(); }},
       {"KovaHostConfigInfoStorageInfo.autoClaim",
        [](DataObject& o) { As<Kova::Host::ConfigInfo::StorageInfo>(o).GetAutoClaim(); }},
+      {"Task.started", [](DataObject& o) { As<Task>(o).GetStarted(); }},
+      {"Task.ended", [](DataObject& o) { As<Task>(o).GetEnded(); }},
+      {"Task.resultForgotten", [](DataObject& o) { As<Task>(o).GetResultForgotten(); }},
       {"KovaDiskFault.device", [](DataObject& o) { As<Fault::KovaDiskFault>(o).GetDevice(); }},
       {"InvalidArgument.argument", [](DataObject& o) { As<Orbis::Fault::InvalidArgument>(o).GetArgument(); }},
       {"LocalizableMessage.message", [](DataObject& o) { As<Orbis::LocalizableMessage>(o).GetMessage(); }},
@@ -110,9 +114,10 @@ TEST(NewObject, HasItsRequiredSimpleFieldsSetToNothing) {
       ASSERT_NE(value, nullptr);
       std::string text;
       Orbis::AppendScalar(field.kind, value, text);
-      EXPECT_EQ(text, field.kind == FieldKind::String    ? ""
-                      : field.kind == FieldKind::Boolean ? "false"
-                                                         : "0");
+      EXPECT_EQ(text, field.kind == FieldKind::String     ? ""
+                      : field.kind == FieldKind::Boolean  ? "false"
+                      : field.kind == FieldKind::DateTime ? "1970-01-01T00:00:00Z"
+                                                          : "0");
     }
   });
 }

@@ -70,6 +70,12 @@ inline FieldDescriptor Output(FieldDescriptor field) {
   return field;
 }
 
+// The same field, which identifies its object.
+inline FieldDescriptor Key(FieldDescriptor field) {
+  field.key = true;
+  return field;
+}
+
 template <class T>
 Ref<Any> Create() {
   return new T;

@@ -13,6 +13,7 @@
 #include <string_view>
 
 #include "orbis/Any.h"
+#include "orbis/DataObject.h"
 #include "orbis/Limits.h"
 
 namespace Orbis {
@@ -26,10 +27,25 @@ struct Value;
 // null in a list or in a required field, naming it.
 TESSA_API void WriteJson(const Any& value, std::string& out);
 
+// The same of an object where its type goes without saying: no "@type" in front of its fields.
+TESSA_API void WriteJsonFields(const DataObject& object, std::string& out);
+
 // What a missing required field means.
 enum class Missing {
   Refused,
-  Default,  // the value of a new object: for texts that people write by hand
+  Default,    // the value of a new object: for texts that people write by hand
+  InRequest,  // the same, but an object that not only answers need must be there
+};
+
+// Makes the object that a text alone stands for, where the type has a key.
+using NamedObject = Ref<DataObject> (*)(const TypeDescriptor& type, const std::string& key);
+
+// An object with nothing but its key.
+TESSA_API Ref<DataObject> ObjectOfKey(const TypeDescriptor& type, const std::string& key);
+
+struct JsonRules {
+  Missing missing = Missing::Refused;
+  NamedObject named = nullptr;  // null: a text stands for no object
 };
 
 // Reads a whole text. Bounded and strict: keys twice, unknown keys, wrong types, numbers out of range and
@@ -37,10 +53,10 @@ enum class Missing {
 // and the line. `declared` is the type of the value, a list's element type with it (see ArrayTypeOf);
 // null: the text must name it.
 TESSA_API Ref<Any> ReadJson(std::string_view text, const Limits& limits, const TypeDescriptor* declared,
-                            Missing missing = Missing::Refused);
+                            const JsonRules& rules = {});
 
 // The same for a value of a text that was read before (orbis/json/JsonText.h). `path` is where it stands.
 TESSA_API Ref<Any> ReadJson(const Json::Value& value, const TypeDescriptor* declared,
-                            std::string_view path = {}, Missing missing = Missing::Refused);
+                            std::string_view path = {}, const JsonRules& rules = {});
 
 }  // namespace Orbis

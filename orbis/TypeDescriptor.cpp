@@ -116,8 +116,10 @@ bool TypeDescriptor::IsA(const TypeDescriptor& other) const noexcept {
 const TypeDescriptor& Complete(TypeDescriptor description, Ref<DataArrayBase> (*createArray)()) {
   auto* const type = new TypeDescriptor(std::move(description));
   type->fields = type->base->fields;
+  type->key = type->base->key;
   for (const FieldDescriptor& field : type->ownFields) {
     type->fields.push_back(&field);
+    type->key = field.key ? &field : type->key;
   }
   type->array = new TypeDescriptor{.name = type->name + std::string(listSuffix),
                                    .source = "Orbis::DataArray",

@@ -41,6 +41,7 @@ struct FieldDescriptor {
   const TypeDescriptor& (*declaredType)();  // kind Object: the declared type of the object or element
   int since = 0;                            // order of the first version that has the field
   bool output = false;                      // a required one that a request may leave out
+  bool key = false;                         // an optional text that identifies the object
 
   // Scalars: the value, or null when unset; and the value to write to, set if it was not.
   const void* (*read)(const DataObject&) = nullptr;
@@ -72,6 +73,7 @@ struct TypeDescriptor {
 
   // Filled by Complete(), for data objects.
   std::vector<const FieldDescriptor*> fields = {};  // all fields, those of the bases first
+  const FieldDescriptor* key = nullptr;             // the one of them that identifies the object, if any
   const TypeDescriptor* array = nullptr;            // the type of a list of them
 
   bool IsAbstract() const noexcept { return kind == TypeKind::DataObject && create == nullptr; }

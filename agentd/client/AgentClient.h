@@ -4,7 +4,7 @@
 #include <chrono>
 #include <stdexcept>
 #include <string>
-#include <vector>
+#include <string_view>
 
 #include "agentd/http/HttpClient.h"
 #include "host/ManagementApi.h"
@@ -35,19 +35,9 @@ class AgentClient final : public Host::ManagementApi {
   // std::runtime_error where they cannot be used.
   explicit AgentClient(const std::string& url, TlsClientFiles files = {});
 
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override;
-  Host::Answer GetStorageInfo() const override;
-  Host::Answer GetDiskGroups() const override;
-  Host::Answer GetConfigInfo() const override;
-  // The label of these is empty.
-  Host::Answer AddDisks(const Host::DiskList& disks) const override;
-  Host::Answer AddAllEligibleDisks() const override;
-  Host::Answer InitializeDisks(const Host::MappingList& mappings) const override;
-  Host::Answer UnmountDiskMapping(const Host::MappingList& mappings) const override;
-  Host::Answer RemoveDisk(const std::string& disk, const Host::RemovalArguments& arguments) const override;
-  Host::Answer RemoveDiskMapping(const Nox::Kova::Host::DiskMapping& mapping,
-                                 const Host::RemovalArguments& arguments) const override;
-  Host::Answer ClaimUnmountedDiskgroup() const override;
+  Host::Answer Query(const Nox::Operation::Query& request) const override;
+  // Neither result nor fault where the request says not to wait.
+  Host::Answer Change(const Nox::Operation::Change& request) const override;
   // Throws Host::HostError when the agent's host is not simulated.
   std::string DescribeHost() const override;
   Host::Answer ChangeHost(const std::string& change) const override;
@@ -58,8 +48,9 @@ class AgentClient final : public Host::ManagementApi {
   std::string Task(const std::string& id) const;
 
  private:
-  Host::Answer Ask(const std::string& operation, const std::string& body,
-                   const Orbis::TypeDescriptor* resultType, std::chrono::milliseconds patience) const;
+  Host::Answer Ask(const Orbis::DataObject& request, std::chrono::milliseconds patience) const;
+  Host::Answer Post(std::string_view operation, const std::string& body,
+                    const Orbis::TypeDescriptor* resultType, std::chrono::milliseconds patience) const;
   // The body. Throws RefusedByAgent for a fault in its place.
   std::string Get(const std::string& target) const;
   void DemandJson(const HttpAnswer& http) const;

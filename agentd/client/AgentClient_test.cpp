@@ -21,6 +21,8 @@
 namespace Agentd {
 namespace {
 
+namespace Op = Nox::Operation;
+using Host::Testing::Names;
 using Nox::Kova::Host::DiskResult;
 using testing::AllOf;
 using testing::ElementsAre;
@@ -37,7 +39,7 @@ HttpDeferringHandler Serving(const Host::ManagementApi& api, TaskQueue& tasks) {
 std::string WhyNot(const HttpAnswer& answer) {
   RunningServer server([&answer](const HttpRequest&) { return answer; });
   try {
-    AgentClient("unix:" + server.Path()).QueryDisksForKova({});
+    AgentClient("unix:" + server.Path()).Query(Op::QueryDisksForKova());
     return "there was an answer";
   } catch (const ConnectionError& error) {
     EXPECT_THAT(error.what(), HasSubstr(server.Path()));
@@ -51,8 +53,8 @@ TEST(AgentClient, AsksAnAgentAsAProgramAsksTheServiceItself) {
   FakeHooks::AnswerWithFault(Orbis::Fault::SystemError("half of it failed"));
   TaskQueue tasks;
   RunningServer server(Serving(service, tasks));
-  const Host::Answer answer =
-      AgentClient("unix:" + server.Path()).QueryDisksForKova({"naa.1", "t10.\"quoted\" \\ ß"});
+  const Host::Answer answer = AgentClient("unix:" + server.Path())
+                                  .Query(Op::QueryDisksForKova(Names({"naa.1", "t10.\"quoted\" \\ ß"})));
   EXPECT_THAT(FakeHooks::names, ElementsAre("naa.1", "t10.\"quoted\" \\ ß"));
   const auto& disks = dynamic_cast<const Orbis::DataArray<DiskResult>&>(*answer.result);
   ASSERT_EQ(disks.Size(), 1u);
@@ -69,12 +71,13 @@ TEST(AgentClient, AsksForGroupsAndConfiguration) {
   ConfigInfo::StorageInfo storage;
   storage.SetAutoClaim(true);
   Orbis::SerializeObjectToSoap(storage, nullptr, FakeHooks::resultText);
-  EXPECT_TRUE(dynamic_cast<const ConfigInfo::StorageInfo&>(*client.GetStorageInfo().result).GetAutoClaim());
+  EXPECT_TRUE(dynamic_cast<const ConfigInfo::StorageInfo&>(*client.Query(Op::GetStorageInfo()).result)
+                  .GetAutoClaim());
   FakeHooks::Reset();
   ConfigInfo config;
   config.SetEnabled(true);
   Orbis::SerializeObjectToSoap(config, nullptr, FakeHooks::resultText);
-  EXPECT_TRUE(dynamic_cast<const ConfigInfo&>(*client.GetConfigInfo().result).GetEnabled());
+  EXPECT_TRUE(dynamic_cast<const ConfigInfo&>(*client.Query(Op::GetConfigInfo()).result).GetEnabled());
 }
 
 TEST(AgentClient, HandsEveryOperationOnAsItWasCalled) {
@@ -84,15 +87,15 @@ TEST(AgentClient, HandsEveryOperationOnAsItWasCalled) {
   RunningServer server(Serving(api, tasks));
   const AgentClient client("unix:" + server.Path());
   const auto mapping = MappingOf("naa.1", {"naa.2", "naa.3"});
-  const Host::RemovalArguments arguments{"p", "o \"\\", -2147483647 - 1, 2147483647};
-  client.GetDiskGroups();
-  client.AddDisks(*Disks({ADisk("naa.1"), ADisk("naa.2", true), ADisk("naa.3", false)}));
-  client.AddAllEligibleDisks();
-  client.InitializeDisks(*Mappings({mapping, MappingOf("naa.4", {})}));
-  client.UnmountDiskMapping(*Mappings({mapping}));
-  client.RemoveDisk("naa.1", arguments);
-  client.RemoveDiskMapping(*mapping, arguments);
-  client.ClaimUnmountedDiskgroup();
+  const RemovalOptions arguments{"p", "o \"\\", -2147483647 - 1, 2147483647};
+  client.Query(Op::GetDiskGroups());
+  client.Change(Op::AddDisks(Disks({ADisk("naa.1"), ADisk("naa.2", true), ADisk("naa.3", false)})));
+  client.Change(Op::AddAllEligibleDisks());
+  client.Change(Op::InitializeDisks(Mappings({mapping, MappingOf("naa.4", {})})));
+  client.Change(Op::UnmountDiskMapping(Mappings({mapping})));
+  client.Change(WithOptions(Op::RemoveDisk("naa.1"), arguments));
+  client.Change(WithOptions(Op::RemoveDiskMapping(mapping), arguments));
+  client.Change(Op::ClaimUnmountedDiskgroup());
   client.ChangeHost(R"({"set": {}})");
   EXPECT_THAT(api.Asked(),
               ElementsAre("GetDiskGroups", "AddDisks naa.1? naa.2! naa.3", "AddAllEligibleDisks",
@@ -116,8 +119,9 @@ TEST(AgentClient, GivesWhatAChangeCameTo) {
   const Host::Testing::MappingRef mapping = Host::Testing::MappingOf("naa.1", {});
   const auto mappings = Host::Testing::Mappings({mapping});
   for (const Host::Answer& answer :
-       {client.AddDisks(*Host::Testing::DisksNamed({"naa.1"})), client.AddAllEligibleDisks(),
-        client.InitializeDisks(*mappings), client.UnmountDiskMapping(*mappings)}) {
+       {client.Change(Op::AddDisks(Host::Testing::DisksNamed({"naa.1"}))),
+        client.Change(Op::AddAllEligibleDisks()), client.Change(Op::InitializeDisks(mappings)),
+        client.Change(Op::UnmountDiskMapping(mappings))}) {
     EXPECT_EQ(dynamic_cast<const Orbis::DataArray<DiskMapResult>&>(*answer.result).Size(), 1u);
     EXPECT_EQ(dynamic_cast<const Nox::Fault::DiskHasPartitions&>(*answer.fault).GetDevice(), "naa.1");
   }
@@ -128,9 +132,10 @@ TEST(AgentClient, GivesNeitherResultNorFaultAsThat) {
   TaskQueue tasks;
   RunningServer server(Serving(api, tasks));
   const AgentClient client("unix:" + server.Path());
-  for (const Host::Answer& answer : {client.AddAllEligibleDisks(), client.RemoveDisk("naa.1", {}),
-                                     client.RemoveDiskMapping(*Host::Testing::MappingOf("naa.1", {}), {}),
-                                     client.ClaimUnmountedDiskgroup(), client.ChangeHost("{}")}) {
+  for (const Host::Answer& answer :
+       {client.Change(Op::AddAllEligibleDisks()), client.Change(Op::RemoveDisk("naa.1")),
+        client.Change(Op::RemoveDiskMapping(Host::Testing::MappingOf("naa.1", {}))),
+        client.Change(Op::ClaimUnmountedDiskgroup()), client.ChangeHost("{}")}) {
     EXPECT_FALSE(answer.result);
     EXPECT_FALSE(answer.fault);
   }
@@ -141,7 +146,7 @@ TEST(AgentClient, GivesBusyAsAFault) {
   TaskQueue tasks;
   tasks.Close();
   RunningServer server(Serving(api, tasks));
-  const Host::Answer answer = AgentClient("unix:" + server.Path()).AddAllEligibleDisks();
+  const Host::Answer answer = AgentClient("unix:" + server.Path()).Change(Op::AddAllEligibleDisks());
   EXPECT_NE(dynamic_cast<const Nox::Fault::Busy*>(answer.fault.Get()), nullptr);
 }
 
@@ -153,7 +158,7 @@ TEST(AgentClient, FetchesTasksAndTheHostsDescriptionAsTheyAre) {
   const AgentClient client("unix:" + server.Path());
   EXPECT_EQ(client.DescribeHost(), api.description);
   EXPECT_EQ(client.Tasks(), "{\"tasks\":[]}\n");
-  client.AddAllEligibleDisks();
+  client.Change(Op::AddAllEligibleDisks());
   EXPECT_THAT(client.Tasks(), HasSubstr("AddAllEligibleDisks"));
   EXPECT_THAT(client.Task(tasks.List().at(0).id), HasSubstr("\"result\":null"));
   api.description.clear();
@@ -181,7 +186,7 @@ TEST(AgentClient, TellsAnAgentThatLacksAnOperationFromAHostThatRefusesIt) {
                 AllOf(HasSubstr(std::to_string(status)), HasSubstr("nothing is served here")));
   }
   RunningServer server([&body](const HttpRequest&) { return HttpAnswer{409, "application/json", body}; });
-  EXPECT_TRUE(AgentClient("unix:" + server.Path()).QueryDisksForKova({}).fault);
+  EXPECT_TRUE(AgentClient("unix:" + server.Path()).Query(Op::QueryDisksForKova()).fault);
 }
 
 TEST(AgentClient, GivesAFaultWhateverItsStatus) {
@@ -196,7 +201,7 @@ TEST(AgentClient, GivesAFaultWhateverItsStatus) {
   for (const auto& fault : faults) {
     api.answer = {.result = Tessa::MakeRef<Orbis::DataArray<Nox::Kova::Host::DiskMapResult>>(),
                   .fault = fault};
-    const Host::Answer answer = client.AddAllEligibleDisks();
+    const Host::Answer answer = client.Change(Op::AddAllEligibleDisks());
     EXPECT_EQ(&answer.fault->GetType(), &fault->GetType());
     EXPECT_TRUE(answer.result);
   }
@@ -206,7 +211,7 @@ TEST(AgentClient, GivesAFaultOfTheAgentAsAFault) {
   const Host::KovaService service = Testing::AFakeService();
   TaskQueue tasks;
   RunningServer server(Serving(service, tasks));
-  const Host::Answer answer = AgentClient("unix:" + server.Path()).QueryDisksForKova({""});
+  const Host::Answer answer = AgentClient("unix:" + server.Path()).Query(Op::QueryDisksForKova(Names({""})));
   EXPECT_FALSE(answer.result);
   EXPECT_EQ(dynamic_cast<const Orbis::Fault::InvalidArgument&>(*answer.fault).GetArgument(), "names[0]");
 }
@@ -214,7 +219,7 @@ TEST(AgentClient, GivesAFaultOfTheAgentAsAFault) {
 TEST(AgentClient, SaysThatNobodyAnswers) {
   const std::string path = Testing::FreshSocketPath();
   try {
-    AgentClient("unix:" + path).QueryDisksForKova({});
+    AgentClient("unix:" + path).Query(Op::QueryDisksForKova());
     FAIL() << "somebody answered";
   } catch (const ConnectionError& error) {
     EXPECT_THAT(error.what(), HasSubstr(path));

@@ -6,6 +6,7 @@
 #include "host/ManagementApi.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
 
 namespace Agentd {
 namespace {
@@ -33,8 +34,8 @@ void CountGroups(const StorageInfo& storage, HostCounts& counts) {
 
 // Nothing when the host does not tell all of it.
 std::optional<HostCounts> Count(const Host::ManagementApi& api) {
-  const Host::Answer disks = api.QueryDisksForKova({});
-  const Host::Answer groups = api.GetDiskGroups();
+  const Host::Answer disks = api.Query(Nox::Operation::QueryDisksForKova());
+  const Host::Answer groups = api.Query(Nox::Operation::GetDiskGroups());
   const auto* const results = dynamic_cast<const Orbis::DataArray<DiskResult>*>(disks.result.Get());
   const auto* const storage = dynamic_cast<const StorageInfo*>(groups.result.Get());
   if (results == nullptr || storage == nullptr || disks.fault || groups.fault) {

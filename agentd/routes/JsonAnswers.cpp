@@ -1,7 +1,6 @@
 #include "agentd/routes/JsonAnswers.h"
 
 #include "nox/Faults.h"
-#include "orbis/WrittenSoap.h"
 #include "orbis/json/JsonText.h"
 
 namespace Agentd {
@@ -42,10 +41,10 @@ unsigned StatusOf(const Answer& answer) {
   return faultOfTheHost;
 }
 
-HttpAnswer WithStatusOf(const Answer& answer) {
+HttpAnswer WithStatusOf(const Answer& answer, Host::Outcome outcome) {
   HttpAnswer http;
   http.status = StatusOf(answer);
-  http.outcome = Host::OutcomeOf(answer);
+  http.outcome = outcome;
   if (const auto* const busy = dynamic_cast<const Nox::Fault::Busy*>(answer.fault.Get())) {
     http.retryAfterSeconds = busy->GetRetryAfterSeconds();
   }
@@ -64,24 +63,14 @@ Host::Outcome OutcomeOf(const HttpAnswer& http) {
 }
 
 HttpAnswer ToHttp(const Answer& answer) {
-  HttpAnswer http = WithStatusOf(answer);
+  HttpAnswer http = WithStatusOf(answer, Host::OutcomeOfQuery(answer));
   WriteJsonAnswer(answer, http.body);
   http.body += "\n";
   return http;
 }
 
-HttpAnswer ToHttp(const Host::WrittenAnswer& answer) {
-  HttpAnswer http;
-  http.body = "{\"result\":";
-  if (answer.fault || !Orbis::AppendJsonOfSoap(answer.result, http.body)) {
-    return ToHttp(Host::Read(answer));
-  }
-  http.body += ",\"fault\":null}\n";
-  return http;
-}
-
 HttpAnswer ToHttp(const Task& ended) {
-  HttpAnswer http = WithStatusOf(ended.answer);
+  HttpAnswer http = WithStatusOf(ended.answer, OutcomeIn(ended.state));
   std::string answer;
   WriteJsonAnswer(ended.answer, answer);
   http.body = "{\"task\":";
@@ -107,6 +96,16 @@ HttpAnswer DescribeTasks(const std::vector<Task>& tasks) {
   }
   http.body += "]}\n";
   return http;
+}
+
+const Encoding& JsonEncoding() {
+  static constexpr Encoding encoding = {
+      .answer = [](const Nox::OperationDescriptor&, const Answer& answer) { return ToHttp(answer); },
+      .ended = [](const Task& task) { return ToHttp(task); },
+      .takenOn = [](const Task& task) { return DescribeTask(202, task); },
+      .fault = [](const Answer& fault) { return ToHttp(fault); },
+  };
+  return encoding;
 }
 
 }  // namespace Agentd

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "agentd/http/HttpTypes.h"
+#include "agentd/routes/Dispatch.h"
 #include "agentd/tasks/Task.h"
 #include "host/Answer.h"
 
@@ -15,12 +16,9 @@ HttpAnswer PlainText(unsigned status, const std::string& text);
 // What the request came to: Failed with every status that says so, otherwise as the answer has it.
 Host::Outcome OutcomeOf(const HttpAnswer& http);
 
-// {"result": .., "fault": ..}. A fault alone, or beside an empty list, has the status of its kind; everything
-// else has 200.
+// To a query, {"result": .., "fault": ..}. A fault alone, or beside an empty list, has the status of its
+// kind; everything else has 200.
 HttpAnswer ToHttp(const Host::Answer& answer);
-
-// The same of a result that is still a text.
-HttpAnswer ToHttp(const Host::WrittenAnswer& answer);
 
 // The answer of a task that has ended: the same behind {"task": ID, ..}.
 HttpAnswer ToHttp(const Task& ended);
@@ -29,5 +27,8 @@ HttpAnswer ToHttp(const Task& ended);
 HttpAnswer DescribeTask(unsigned status, const Task& task);
 // {"tasks": [..]}, without results.
 HttpAnswer DescribeTasks(const std::vector<Task>& tasks);
+
+// All of this, for requests that are dispatched.
+const Encoding& JsonEncoding();
 
 }  // namespace Agentd

@@ -5,7 +5,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "agentd/routes/Operations.h"
 #include "agentd/routes/Routes.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "agentd/testing/FakeApi.h"
@@ -63,7 +62,7 @@ TEST_F(Permission, EveryReportTakesTheRoleRead) {
 }
 
 TEST_F(Permission, EveryOperationTakesTheRoleThatItsKindTakes) {
-  for (const Operation& operation : Operations()) {
+  for (const Nox::OperationDescriptor& operation : Nox::Operations()) {
     const std::string target = "/api/v1/" + std::string(operation.name);
     EXPECT_EQ(Post(HttpRole::None, target).status, 403u) << target;
     EXPECT_EQ(Post(HttpRole::Read, target).status == 403u, operation.changes) << target;

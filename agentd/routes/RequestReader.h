@@ -1,33 +1,36 @@
-// The JSON body of a request, read as the arguments of its operation.
+// The body of a request, read as the request object of its operation.
 //
 //   {"disks": ["naa.1", {"canonicalName": "naa.2", "ssd": true}], "label": "rack 3", "wait": false}
 //
-// A disk is a text, its canonical name, or an object whose missing fields have defaults; a mapping is
-// {"ssd": DISK, "nonSsd": [DISK, ..]}. An operation that changes disks also takes `label`, a text of the
-// client's own, and `wait`. Bounded and strict: unknown, missing, doubled and mistyped parameters are refused
-// by an Orbis::ParseException that names the place and the line.
+// In JSON a disk is a text, its canonical name, or an object whose missing fields have defaults. Bounded and
+// strict: unknown, missing, doubled and mistyped parameters are refused by an Orbis::ParseException that
+// names the place and the line.
 //
 // Threads: any.
 #pragma once
 
-#include <string>
 #include <string_view>
 
-#include "agentd/routes/Operations.h"
+#include "nox/OperationTable.h"
+#include "tessa/Ref.h"
 
 namespace Agentd {
 
 inline constexpr std::size_t longestLabel = 256;  // bytes
 
-struct ReadRequest {
-  Arguments arguments;
-  std::string label;
-  bool wait = true;  // for the answer; otherwise the client is told the task and goes
+using RequestRef = Tessa::Ref<Orbis::DataObject>;
+
+// An object of the operation's request type.
+RequestRef ReadJsonRequest(const Nox::OperationDescriptor& operation, std::string_view body);
+
+struct SoapRequest {
+  const Nox::OperationDescriptor* operation;
+  RequestRef request;
 };
 
-// What a label may be, whichever way it comes; throws ParseException. 0: the line is not known.
-void CheckLabel(const std::string& label, int line = 0);
-
-ReadRequest ReadJsonRequest(const Operation& operation, std::string_view body);
+// The same of a SOAP message. `action` is the value of the SOAPAction header; empty or an empty text in
+// quotes says nothing, any other must name the operation of the body. Throws Orbis::EnvelopeException for
+// what is wrong with the message.
+SoapRequest ReadSoapRequest(std::string_view body, std::string_view action);
 
 }  // namespace Agentd

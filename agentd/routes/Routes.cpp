@@ -3,22 +3,24 @@
 #include <algorithm>
 #include <array>
 #include <chrono>
+#include <exception>
 #include <optional>
 #include <string>
 #include <utility>
 
 #include "agentd/http/HttpTarget.h"
 #include "agentd/http/Shown.h"
+#include "agentd/routes/Dispatch.h"
 #include "agentd/routes/DoorMetrics.h"
 #include "agentd/routes/HostWatch.h"
 #include "agentd/routes/JsonAnswers.h"
 #include "agentd/routes/Metrics.h"
-#include "agentd/routes/Operations.h"
 #include "agentd/routes/Permission.h"
 #include "agentd/routes/Refusals.h"
 #include "agentd/routes/RequestReader.h"
 #include "agentd/routes/SoapAnswer.h"
 #include "agentd/routes/SoapEndpoint.h"
+#include "agentd/tasks/TaskApi.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "host/Build.h"
 #include "host/Gate.h"
@@ -26,6 +28,7 @@
 #include "host/ManagementApi.h"
 #include "host/Text.h"
 #include "nox/Documents.h"
+#include "nox/Operations.h"
 #include "orbis/ParseException.h"
 
 namespace Agentd {
@@ -41,9 +44,7 @@ constexpr std::size_t readersBody = 1 << 20;        // of those who may not chan
 // A request on its way: who serves it, what was asked, and the way back. Gone when it is served; an answer
 // that comes later keeps what it needs.
 struct Call {
-  const ManagementApi& api;
-  TaskQueue& tasks;
-  QueryQueue& queries;
+  Services services;
   const Metrics& metrics;
   HostWatch& watch;
   const std::function<HttpLoad()>& load;
@@ -71,11 +72,10 @@ bool HasOnly(std::string_view known, const Call& call) {
   return true;
 }
 
-// What `make` makes, or what its exception comes to.
-template <class Make>
-HttpAnswer Made(const Make& make) {
+// Answers for a request that cannot be read, or must not be carried out.
+HttpAnswer Refused(const std::exception_ptr& reason) {
   try {
-    return make();
+    std::rethrow_exception(reason);
   } catch (const Orbis::ParseException& refused) {
     return RefusalAt(jsonFolder, refused);
   } catch (const Orbis::MethodFault::Exception& refused) {
@@ -83,17 +83,6 @@ HttpAnswer Made(const Make& make) {
   } catch (const std::exception& mistake) {
     return ToHttp(Host::FailedWith(mistake.what()));
   }
-}
-
-// Answers with what the query makes, once there is a place for it.
-template <class Query>
-void Ask(const Call& call, Query query) {
-  call.queries.Run([responder = call.responder, query = std::move(query)] {
-    HttpAnswer made = Made(query);
-    const Host::Outcome outcome = OutcomeOf(made);
-    responder.Answer(std::move(made));
-    return outcome;
-  });
 }
 
 void Health(const Call& call) {
@@ -108,73 +97,49 @@ void GetMetrics(const Call& call) {
   if (!HasOnly("", call)) {
     return;
   }
-  const TaskQueue::Load changes = call.tasks.Now();
+  const TaskQueue::Load changes = call.services.tasks.Now();
   call.responder.Answer(
       {200, "text/plain; version=0.0.4; charset=utf-8",
-       call.metrics.Text({.changes = changes, .queries = call.queries.Now(), .host = call.watch.Last()}) +
+       call.metrics.Text(
+           {.changes = changes, .queries = call.services.queries.Now(), .host = call.watch.Last()}) +
            DescribeDoors(call.load())});
   call.watch.Refresh(changes.ended.Total());  // for the next who asks: this answer waits for nobody
 }
 
+void Dispatch(const Call& call, const RequestRef& request) {
+  Dispatch(call.services, Nox::OperationOf(*request), request, JsonEncoding(), call.responder);
+}
+
 void GetDisks(const Call& call) {
   if (HasOnly("names", call)) {
-    Ask(call, [&api = call.api, names = call.target.ValuesOf("names")] {
-      return ToHttp(api.QueryDisksWritten(names));
-    });
+    const auto request = Tessa::MakeRef<Nox::Operation::QueryDisksForKova>();
+    request->SetNames(Tessa::MakeRef<Orbis::TextList>(call.target.ValuesOf("names")));
+    Dispatch(call, request);
   }
 }
 
-template <Host::Answer (ManagementApi::*operation)() const>
+template <class Query>
 void GetPlain(const Call& call) {
   if (HasOnly("", call)) {
-    Ask(call, [&api = call.api] { return ToHttp((api.*operation)()); });
+    Dispatch(call, Tessa::MakeRef<Query>());
   }
-}
-
-// Hands the work to the queue. The client gets the answer when it is done or, without waiting, the task.
-void Submit(const Call& call, const std::string& operation, const ReadRequest& request, TaskQueue::Work work,
-            std::size_t bytes) {
-  if (!request.wait) {
-    call.responder.Answer(
-        DescribeTask(202, call.tasks.Submit(operation, request.label, std::move(work), {}, bytes)));
-    return;
-  }
-  call.tasks.Submit(
-      operation, request.label, std::move(work),
-      [responder = call.responder](const Task& ended) { responder.Answer(ToHttp(ended)); }, bytes);
 }
 
 void PostOperation(const Call& call) {
-  const Operation& operation = *FindOperation(call.rest);
-  ReadRequest request = ReadJsonRequest(operation, call.request.body);
-  Bound(request.arguments);
-  if (!operation.changes) {
-    Ask(call, [&api = call.api, &operation, arguments = std::move(request.arguments)] {
-      return operation.callWritten != nullptr ? ToHttp(operation.callWritten(api, arguments))
-                                              : ToHttp(operation.call(api, arguments));
-    });
-    return;
-  }
-  const std::size_t bytes = WeightOf(request.arguments);
-  Submit(
-      call, std::string(operation.name), request,
-      [&api = call.api, &operation, arguments = std::move(request.arguments)] {
-        return operation.call(api, arguments);
-      },
-      bytes);
+  Dispatch(call, ReadJsonRequest(*Nox::FindOperation(call.rest), call.request.body));
 }
 
 void GetTasks(const Call& call) {
   if (HasOnly("", call)) {
-    call.responder.Answer(DescribeTasks(call.tasks.List()));
+    call.responder.Answer(DescribeTasks(call.services.tasks.List()));
   }
 }
 
 void GetTask(const Call& call) {
-  if (const std::optional<Task> task = call.tasks.Find(std::string(call.rest))) {
+  if (const std::optional<Task> task = call.services.tasks.Find(std::string(call.rest))) {
     call.responder.Answer(DescribeTask(200, *task));
   } else {
-    Refuse(call, 404, "no task of that id; those that ended long ago are forgotten");
+    Refuse(call, 404, std::string(noSuchTask));
   }
 }
 
@@ -183,7 +148,7 @@ void GetHost(const Call& call) {
     return;
   }
   try {
-    call.responder.Answer({200, std::string(jsonType), call.api.DescribeHost()});
+    call.responder.Answer({200, std::string(jsonType), call.services.api.DescribeHost()});
   } catch (const Host::HostError& unknown) {
     Refuse(call, 404, unknown.what());
   }
@@ -192,9 +157,10 @@ void GetHost(const Call& call) {
 // A task like any other: nothing changes the host while a request is at work on it.
 void PostHost(const Call& call) {
   Host::Gate::CheckHostChange(call.request.body);
-  Submit(
-      call, "ChangeHost", ReadRequest(),
-      [&api = call.api, change = call.request.body] { return api.ChangeHost(change); },
+  call.services.tasks.Submit(
+      "ChangeHost", "",
+      [&api = call.services.api, change = call.request.body] { return api.ChangeHost(change); },
+      [responder = call.responder](const Task& ended) { responder.Answer(ToHttp(ended)); },
       call.request.body.size());
 }
 
@@ -205,7 +171,7 @@ void GetDescription(const Call& call) {
 }
 
 void PostSoap(const Call& call) {
-  ServeSoap({call.api, call.tasks, call.queries}, call.request, call.responder);
+  ServeSoap(call.services, call.request, call.responder);
 }
 
 void GetSoap(const Call& call) {
@@ -221,7 +187,7 @@ bool IsId(std::string_view rest) {
 }
 
 bool IsOperation(std::string_view rest) {
-  return FindOperation(rest) != nullptr;
+  return Nox::FindOperation(rest) != nullptr;
 }
 
 struct Route {
@@ -236,8 +202,8 @@ constexpr std::array<Route, 13> routes = {{
     {HttpRole::None, "", "/healthz", &IsNothing, &Health},
     {HttpRole::Read, "", "/metrics", &IsNothing, &GetMetrics},
     {HttpRole::Read, "", "/api/v1/disks", &IsNothing, &GetDisks},
-    {HttpRole::Read, "", "/api/v1/groups", &IsNothing, &GetPlain<&ManagementApi::GetDiskGroups>},
-    {HttpRole::Read, "", "/api/v1/config", &IsNothing, &GetPlain<&ManagementApi::GetConfigInfo>},
+    {HttpRole::Read, "", "/api/v1/groups", &IsNothing, &GetPlain<Nox::Operation::GetDiskGroups>},
+    {HttpRole::Read, "", "/api/v1/config", &IsNothing, &GetPlain<Nox::Operation::GetConfigInfo>},
     {HttpRole::Read, "", "/api/v1/openapi.json", &IsNothing, &GetDescription},
     {HttpRole::Read, "", "/api/v1/tasks", &IsNothing, &GetTasks},
     {HttpRole::Read, "", "/api/v1/tasks/", &IsId, &GetTask},
@@ -263,7 +229,7 @@ bool IsOfType(std::string_view wanted, std::string_view contentType) {
 }
 
 HttpRole RoleFor(const Route& route, std::string_view rest) {
-  const Operation* const operation = route.takes == &IsOperation ? FindOperation(rest) : nullptr;
+  const auto* const operation = route.takes == &IsOperation ? Nox::FindOperation(rest) : nullptr;
   return operation == nullptr ? route.role : operation->changes ? HttpRole::Change : HttpRole::Read;
 }
 
@@ -271,7 +237,7 @@ void Follow(const Route& route, const Call& call) {
   try {
     route.serve(call);
   } catch (...) {
-    call.responder.Answer(Made([]() -> HttpAnswer { throw; }));  // that exception again
+    call.responder.Answer(Refused(std::current_exception()));
   }
 }
 
@@ -315,7 +281,7 @@ HttpAnswer NotServed(std::string_view path, const std::string& allow) {
 
 std::optional<HttpAnswer> RefusalOn(const Route& route, std::string_view rest, const HttpRequest& head) {
   if (const auto refusal = RefusalOf(head, RoleFor(route, rest))) {
-    return route.bodyType == xmlType ? ToSoap("", *refusal) : ToHttp(*refusal);
+    return route.bodyType == xmlType ? ToSoapFault(*refusal) : ToHttp(*refusal);
   }
   if (!route.bodyType.empty() && !IsOfType(route.bodyType, head.contentType)) {
     return RefusalAt(head.target, 415, "the body must be " + std::string(route.bodyType));
@@ -354,8 +320,8 @@ HttpResponder Counted(const std::shared_ptr<Metrics>& metrics, std::string route
 }  // namespace
 
 Router::Router(const ManagementApi& api, TaskQueue& tasks, const QueryLimits& limits)
-    : _api(api),
-      _tasks(tasks),
+    : _tasks(tasks),
+      _api(std::make_unique<TaskApi>(api, tasks)),
       _queries(std::make_unique<QueryQueue>(limits)),
       _watch(std::make_unique<HostWatch>(api, *_queries)),
       _metrics(std::make_shared<Metrics>()) {}
@@ -381,7 +347,7 @@ void Router::Serve(const HttpRequest& request, const HttpResponder& responder) c
     counted.Answer(*way.refusal);
   } else {
     Follow(*way.route,
-           {_api, _tasks, *_queries, *_metrics, *_watch, _load, *target, request, counted, way.rest});
+           {{*_api, _tasks, *_queries}, *_metrics, *_watch, _load, *target, request, counted, way.rest});
   }
 }
 

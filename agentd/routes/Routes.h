@@ -54,6 +54,7 @@ namespace Agentd {
 
 class HostWatch;
 class Metrics;
+class TaskApi;
 class TaskQueue;
 
 class Router {
@@ -76,8 +77,8 @@ class Router {
   bool WaitUntilIdle(std::chrono::milliseconds patience) const;
 
  private:
-  const Host::ManagementApi& _api;
   TaskQueue& _tasks;
+  const std::unique_ptr<TaskApi> _api;
   const std::unique_ptr<QueryQueue> _queries;
   const std::unique_ptr<HostWatch> _watch;
   const std::shared_ptr<Metrics> _metrics;  // answers that come late are still counted

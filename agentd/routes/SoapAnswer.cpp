@@ -1,23 +1,19 @@
 #include "agentd/routes/SoapAnswer.h"
 
-#include <array>
-#include <optional>
 #include <string>
-#include <type_traits>
 
 #include "host/FaultWords.h"
 #include "host/Refusal.h"
 #include "nox/Faults.h"
-#include "nox/Operations.h"
+#include "nox/OperationTable.h"
 #include "orbis/Envelope.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/WrittenSoap.h"
-#include "tessa/Narrow.h"
 
 namespace Agentd {
 namespace {
 
-namespace Op = Nox::Operation;
+using Nox::OperationDescriptor;
 using Orbis::MethodFault;
 using Tessa::MakeRef;
 using Tessa::Ref;
@@ -29,47 +25,30 @@ HttpAnswer Xml(unsigned status) {
   return http;
 }
 
-// An answer, and the id of its task if it is a change's.
-struct Told {
-  const Host::Answer& answer;
-  std::string_view task;  // empty: none
-};
-
-// Sets what there is a place for.
-template <class Response, class Result = void>
-Ref<Orbis::DataObject> Respond(const Told& told) {
-  const auto response = MakeRef<Response>();
-  if constexpr (!std::is_void_v<Result>) {
-    response->SetResult(Tessa::NarrowToType<Result>(told.answer.result));
+const Orbis::FieldDescriptor* FindField(const Orbis::TypeDescriptor& type, std::string_view name) {
+  for (const Orbis::FieldDescriptor* field : type.fields) {
+    if (field->name == name) {
+      return field;
+    }
   }
-  response->SetFault(told.answer.fault);
-  if constexpr (requires { response->GetTask(); }) {
-    response->SetTask(told.task.empty() ? std::nullopt : std::optional(std::string(told.task)));
-  }
-  return response;
+  return nullptr;
 }
 
-using DiskResults = Orbis::DataArray<Nox::Kova::Host::DiskResult>;
-using MapResults = Orbis::DataArray<Nox::Kova::Host::DiskMapResult>;
-using ConfigInfo = Nox::Kova::Host::ConfigInfo;
-
-struct Row {
-  std::string_view operation;
-  Ref<Orbis::DataObject> (*respond)(const Told& told);
-};
-
-constexpr std::array<Row, 10> rows = {{
-    {"QueryDisksForKova", &Respond<Op::QueryDisksForKovaResponse, DiskResults>},
-    {"AddDisks", &Respond<Op::AddDisksResponse, MapResults>},
-    {"InitializeDisks", &Respond<Op::InitializeDisksResponse, MapResults>},
-    {"RemoveDisk", &Respond<Op::RemoveDiskResponse>},
-    {"RemoveDiskMapping", &Respond<Op::RemoveDiskMappingResponse>},
-    {"AddAllEligibleDisks", &Respond<Op::AddAllEligibleDisksResponse, MapResults>},
-    {"UnmountDiskMapping", &Respond<Op::UnmountDiskMappingResponse, MapResults>},
-    {"GetStorageInfo", &Respond<Op::GetStorageInfoResponse, ConfigInfo::StorageInfo>},
-    {"GetConfigInfo", &Respond<Op::GetConfigInfoResponse, ConfigInfo>},
-    {"ClaimUnmountedDiskgroup", &Respond<Op::ClaimUnmountedDiskgroupResponse>},
-}};
+// The operation's response object. Throws Tessa::TypeMismatchException for a result of another type than the
+// operation's.
+Ref<Orbis::DataObject> ResponseOf(const OperationDescriptor& operation, const Host::Answer& answer,
+                                  std::string_view task) {
+  const Ref<Orbis::Any> made = operation.response.create();
+  auto& response = static_cast<Orbis::DataObject&>(*made);
+  if (answer.result && operation.result != nullptr) {
+    FindField(operation.response, "result")->assign(response, Ref<Orbis::Any>(answer.result.Get()));
+  }
+  FindField(operation.response, "fault")->assign(response, answer.fault);
+  if (!task.empty()) {
+    *static_cast<std::string*>(FindField(operation.response, "task")->write(response)) = task;
+  }
+  return Ref<Orbis::DataObject>(&response);
+}
 
 // Whose the fault is: the host's, or the request's.
 const char* CodeOf(const MethodFault& fault) {
@@ -96,40 +75,42 @@ HttpAnswer TypedFault(const MethodFault& fault, std::string_view task = {}) {
   return http;
 }
 
-HttpAnswer ToSoap(std::string_view operation, const Told& told) {
-  if (Host::IsFaultAlone(told.answer)) {
-    return TypedFault(*told.answer.fault, told.task);
+// `task`: the id of the change; empty for a query.
+HttpAnswer Respond(const OperationDescriptor& operation, const Host::Answer& answer, Host::Outcome outcome,
+                   std::string_view task) {
+  if (Host::IsFaultAlone(answer)) {
+    return TypedFault(*answer.fault, task);
   }
   HttpAnswer http = Xml(200);
-  http.outcome = Host::OutcomeOf(told.answer);
-  for (const Row& row : rows) {
-    if (row.operation == operation) {
-      const Ref<Orbis::DataObject> response = row.respond(told);
-      Orbis::AppendSoapMessage(response->GetType().name, *response, http.body);
-    }
-  }
+  http.outcome = outcome;
+  const Ref<Orbis::DataObject> response = ResponseOf(operation, answer, task);
+  Orbis::AppendSoapMessage(response->GetType().name, *response, http.body);
   return http;
+}
+
+// From the text of the result, if that is all there is to say and it is a list as the plug-in writes it.
+bool AppendAsItIs(const OperationDescriptor& operation, const Host::Answer& answer, std::string& out) {
+  const bool isList = operation.result != nullptr && operation.result->kind == Orbis::TypeKind::ObjectArray;
+  return isList && !answer.fault && answer.result.GetText() != nullptr &&
+         Orbis::AppendMessageOfSoap(operation.response.name, "result", *operation.result,
+                                    *answer.result.GetText(), out);
 }
 
 }  // namespace
 
-HttpAnswer ToSoap(std::string_view operation, const Host::Answer& answer) {
-  return ToSoap(operation, Told{answer, {}});
+HttpAnswer ToSoap(const OperationDescriptor& operation, const Host::Answer& answer) {
+  HttpAnswer http = Xml(200);
+  return AppendAsItIs(operation, answer, http.body)
+             ? http
+             : Respond(operation, answer, Host::OutcomeOfQuery(answer), {});
 }
 
 HttpAnswer ToSoap(const Task& ended) {
-  return ToSoap(ended.operation, Told{ended.answer, ended.id});
+  return Respond(*Nox::FindOperation(ended.operation), ended.answer, OutcomeIn(ended.state), ended.id);
 }
 
-HttpAnswer ToSoap(std::string_view operation, const Host::WrittenAnswer& answer) {
-  using Response = Op::QueryDisksForKovaResponse;
-  const Orbis::TypeDescriptor& list = *Nox::Kova::Host::DiskResult::StaticType().array;
-  HttpAnswer http = Xml(200);
-  if (answer.fault ||
-      !Orbis::AppendMessageOfSoap(Response::StaticType().name, "result", list, answer.result, http.body)) {
-    return ToSoap(operation, Host::Read(answer));
-  }
-  return http;
+HttpAnswer ToSoapFault(const Host::Answer& answer) {
+  return TypedFault(*answer.fault);
 }
 
 HttpAnswer ToSoap(const Orbis::ParseException& refused) {
@@ -145,6 +126,18 @@ HttpAnswer SoapFault(std::string_view code, std::string_view text) {
   HttpAnswer http = Xml(500);
   Orbis::AppendSoapFault(code, text, {}, http.body);
   return http;
+}
+
+const Encoding& SoapEncoding() {
+  static constexpr Encoding encoding = {
+      .answer = [](const OperationDescriptor& operation,
+                   const Host::Answer& answer) { return ToSoap(operation, answer); },
+      .ended = [](const Task& task) { return ToSoap(task); },
+      .takenOn =
+          [](const Task& task) { return Respond(*Nox::FindOperation(task.operation), {}, {}, task.id); },
+      .fault = &ToSoapFault,
+  };
+  return encoding;
 }
 
 }  // namespace Agentd

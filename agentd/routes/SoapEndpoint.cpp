@@ -1,15 +1,13 @@
 #include "agentd/routes/SoapEndpoint.h"
 
+#include <exception>
 #include <string>
-#include <utility>
 
 #include "agentd/http/HttpTarget.h"
 #include "agentd/routes/JsonAnswers.h"
 #include "agentd/routes/Permission.h"
+#include "agentd/routes/RequestReader.h"
 #include "agentd/routes/SoapAnswer.h"
-#include "agentd/routes/SoapRequest.h"
-#include "agentd/tasks/QueryQueue.h"
-#include "agentd/tasks/TaskQueue.h"
 #include "host/Build.h"
 #include "nox/Documents.h"
 #include "orbis/ParseException.h"
@@ -19,18 +17,16 @@ namespace {
 
 constexpr std::string_view schemaFile = "nox.xsd";
 
-// What `make` makes, or what its exception comes to: an answer that cannot be made is the host's mistake, and
-// still an answer.
-template <class Make>
-HttpAnswer Made(const Make& make) {
+// Answers for a message that cannot be read, or must not be carried out.
+HttpAnswer Refused(const std::exception_ptr& reason) {
   try {
-    return make();
+    std::rethrow_exception(reason);
   } catch (const Orbis::ParseException& refused) {
     return ToSoap(refused);
   } catch (const Orbis::MethodFault::Exception& refused) {
-    return ToSoap("", Host::Answer{.result = nullptr, .fault = refused.GetFault()});
+    return ToSoapFault({.result = nullptr, .fault = refused.GetFault()});
   } catch (const std::exception& mistake) {
-    return ToSoap("", Host::FailedWith(mistake.what()));
+    return ToSoapFault(Host::FailedWith(mistake.what()));
   }
 }
 
@@ -40,47 +36,19 @@ std::string AddressFor(const HttpRequest& request) {
   return request.scheme + "://" + (request.authority.empty() ? "localhost" : request.authority) + "/soap";
 }
 
-void Submit(const SoapService& service, SoapRequest& read, const HttpResponder& responder) {
-  const std::size_t bytes = WeightOf(read.arguments);
-  service.tasks.Submit(
-      std::string(read.operation->name), read.label,
-      [&api = service.api, &operation = *read.operation, arguments = std::move(read.arguments)] {
-        return operation.call(api, arguments);
-      },
-      [responder](const Task& ended) { responder.Answer(Made([&ended] { return ToSoap(ended); })); }, bytes);
-}
-
-void Ask(const SoapService& service, SoapRequest& read, const HttpResponder& responder) {
-  auto answer = [&api = service.api, &operation = *read.operation, arguments = std::move(read.arguments)] {
-    return operation.callWritten != nullptr ? ToSoap(operation.name, operation.callWritten(api, arguments))
-                                            : ToSoap(operation.name, operation.call(api, arguments));
-  };
-  service.queries.Run([answer = std::move(answer), responder] {
-    HttpAnswer made = Made(answer);
-    const Host::Outcome outcome = OutcomeOf(made);
-    responder.Answer(std::move(made));
-    return outcome;
-  });
-}
-
 }  // namespace
 
-void ServeSoap(const SoapService& service, const HttpRequest& request, const HttpResponder& responder) {
+void ServeSoap(const Services& services, const HttpRequest& request, const HttpResponder& responder) {
   try {
-    SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
-    const Operation& operation = *read.operation;
-    if (const auto refusal = RefusalOf(request, operation.changes ? HttpRole::Change : HttpRole::Read)) {
-      responder.Answer(ToSoap("", *refusal));
+    const SoapRequest read = ReadSoapRequest(request.body, request.soapAction);
+    if (const auto refusal =
+            RefusalOf(request, read.operation->changes ? HttpRole::Change : HttpRole::Read)) {
+      responder.Answer(ToSoapFault(*refusal));
       return;
     }
-    Bound(read.arguments);
-    if (operation.changes) {
-      Submit(service, read, responder);
-    } else {
-      Ask(service, read, responder);
-    }
+    Dispatch(services, *read.operation, read.request, SoapEncoding(), responder);
   } catch (...) {
-    responder.Answer(Made([]() -> HttpAnswer { throw; }));  // that exception again
+    responder.Answer(Refused(std::current_exception()));
   }
 }
 

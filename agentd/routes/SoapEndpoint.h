@@ -4,25 +4,14 @@
 #include "agentd/http/HttpResponder.h"
 #include "agentd/http/HttpTypes.h"
 
-namespace Host {
-class ManagementApi;
-}
-
 namespace Agentd {
 
 struct HttpTarget;
-class QueryQueue;
-class TaskQueue;
-
-struct SoapService {
-  const Host::ManagementApi& api;
-  TaskQueue& tasks;
-  QueryQueue& queries;
-};
+struct Services;
 
 // Answers a message when its query has had its place, or its change its turn. Whatever is wrong is a SOAP
 // fault.
-void ServeSoap(const SoapService& service, const HttpRequest& request, const HttpResponder& responder);
+void ServeSoap(const Services& services, const HttpRequest& request, const HttpResponder& responder);
 
 // "/soap?wsdl": one document, whose address is the one that this client came by; and "/soap?xsd=nox.xsd", the
 // types alone, for people.

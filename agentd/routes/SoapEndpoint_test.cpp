@@ -70,6 +70,7 @@ TEST_F(SoapEndpoint, CallsEveryOperationWithItsParameters) {
       "<optionSecond>2</optionSecond>";
   Ask("QueryDisksForKova", "<names>a</names><names>b</names>");
   Ask("GetStorageInfo");
+  Ask("GetDiskGroups");
   Ask("GetConfigInfo");
   Ask("AddDisks", Disk("disks", "naa.1") + Disk("disks", "naa.2"));
   Ask("AddAllEligibleDisks");
@@ -81,8 +82,8 @@ TEST_F(SoapEndpoint, CallsEveryOperationWithItsParameters) {
   Ask("ClaimUnmountedDiskgroup");
   EXPECT_THAT(
       _api.Asked(),
-      ElementsAre("QueryDisksForKova a b", "GetStorageInfo", "GetConfigInfo", "AddDisks naa.1! naa.2!",
-                  "AddAllEligibleDisks", "InitializeDisks naa.1! < naa.2! >",
+      ElementsAre("QueryDisksForKova a b", "GetStorageInfo", "GetDiskGroups", "GetConfigInfo",
+                  "AddDisks naa.1! naa.2!", "AddAllEligibleDisks", "InitializeDisks naa.1! < naa.2! >",
                   "UnmountDiskMapping naa.1! < naa.2! >", "RemoveDisk naa.1 p o 1 2",
                   "RemoveDiskMapping naa.1! < naa.2! > p o 1 2", "ClaimUnmountedDiskgroup"));
 }
@@ -103,6 +104,45 @@ TEST_F(SoapEndpoint, TakesParametersInAnyOrderAndNilForAbsent) {
       "i:nil='true'/><optionText>o</optionText><disk>naa.1</disk>");
   Post(Message("<GetConfigInfo xmlns='urn:nox' i:nil='true'/>"));
   EXPECT_THAT(_api.Asked(), ElementsAre("RemoveDisk naa.1  o 0 2", "GetConfigInfo"));
+}
+
+TEST_F(SoapEndpoint, EveryChangeTakesALabel) {
+  for (const Nox::OperationDescriptor& operation : Nox::Operations()) {
+    if (operation.changes) {
+      const std::string disk = operation.name == "RemoveDisk" ? "<disk>naa.1</disk>" : "";
+      const std::string group = "<mapping>" + Disk("ssd", "naa.1") + "</mapping>";
+      const std::string mapping = operation.name == "RemoveDiskMapping" ? group : "";
+      Ask(std::string(operation.name),
+          disk + mapping + "<label>of " + std::string(operation.name) + "</label>");
+      EXPECT_EQ(_tasks.List().back().label, "of " + std::string(operation.name));
+    }
+  }
+}
+
+TEST_F(SoapEndpoint, AChangeThatNobodyWaitsForIsAnsweredByItsTaskAlone) {
+  _api.answer.result = MakeRef<MapResults>();
+  const HttpAnswer answer = Ask("AddAllEligibleDisks", "<wait>false</wait>");
+  EXPECT_EQ(answer.status, 200u);
+  EXPECT_THAT(answer.body,
+              AllOf(HasSubstr("<AddAllEligibleDisksResponse"),
+                    HasSubstr("<task>" + _tasks.List().back().id + "</task>"), Not(HasSubstr("<result"))));
+}
+
+TEST_F(SoapEndpoint, TellsTheAgentsTasks) {
+  Ask("RemoveDisk", "<disk>naa.1</disk><label>mine</label>");
+  const std::string id = _tasks.List().back().id;
+  const std::string all = Ask("GetTasks").body;
+  EXPECT_THAT(all, AllOf(HasSubstr("<id>" + id + "</id>"), HasSubstr("<label>mine</label>"),
+                         HasSubstr("<operation>RemoveDisk</operation>"), HasSubstr("<state>done</state>")));
+  EXPECT_THAT(Ask("GetTask", "<id>" + id + "</id>").body, HasSubstr("<id>" + id + "</id>"));
+  EXPECT_THAT(Ask("GetTask", "<id>no</id>").body,
+              AllOf(HasSubstr("InvalidArgument"), HasSubstr("no task of that id")));
+  EXPECT_THAT(_api.Asked(), ElementsAre("RemoveDisk naa.1   0 0")) << "the host is not asked about tasks";
+}
+
+TEST_F(SoapEndpoint, AResultOfTheHostThatCannotBeReadIsTheHostsMistake) {
+  _api.answer.result = Host::Result::OfText("<object");
+  EXPECT_THAT(Ask("GetConfigInfo").body, AllOf(HasSubstr("SystemError"), HasSubstr(":Server<")));
 }
 
 TEST_F(SoapEndpoint, TheAnswerToAChangeTellsItsTask) {

@@ -12,6 +12,7 @@
 #include "agentd/testing/RunningServer.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
+#include "orbis/Soap.h"
 #include "orbis/json/JsonText.h"
 
 namespace Agentd {
@@ -98,6 +99,35 @@ TEST_F(TaskRoutes, AChangeThatFailedAsAWholeIsNoSuccessThoughItHasAList) {
   _api.answer.fault = Tessa::MakeRef<Nox::Fault::InsufficientDisks>();
   EXPECT_EQ(Post("AddDisks", R"({"disks": []})").status, 409u);
   EXPECT_EQ(_tasks.List().at(0).state, TaskState::Failed);
+}
+
+TEST_F(TaskRoutes, AResultThatCannotBeReadIsTheHostsMistake) {
+  _api.answer.result = Host::Result::OfText("<object");
+  for (const char* operation : {"AddAllEligibleDisks", "GetConfigInfo"}) {
+    const HttpAnswer answer = Post(operation, "{}");
+    EXPECT_EQ(answer.status, 500u) << operation;
+    EXPECT_THAT(answer.body, HasSubstr(R"("@type":"SystemError")")) << operation;
+  }
+  EXPECT_EQ(_tasks.List().at(0).state, TaskState::Failed);
+}
+
+TEST_F(TaskRoutes, ATaskIsAlsoAskedForAsAnOperation) {
+  Post("RemoveDisk", R"({"disk": "naa.1", "label": "mine"})");
+  const std::string id = _tasks.List().at(0).id;
+  EXPECT_THAT(Post("GetTasks", "{}").body,
+              AllOf(HasSubstr("{\"@type\":\"Task\",\"id\":\"" + id + "\""), HasSubstr(R"("label":"mine")")));
+  EXPECT_THAT(Post("GetTask", "{\"id\": \"" + id + "\"}").body, HasSubstr(R"("operation":"RemoveDisk")"));
+  const HttpAnswer unknown = Post("GetTask", R"({"id": "no"})");
+  EXPECT_EQ(unknown.status, 400u);
+  EXPECT_THAT(unknown.body, AllOf(HasSubstr(R"("argument":"id")"), HasSubstr("no task of that id")));
+}
+
+TEST_F(TaskRoutes, ATaskKeepsTheTextOfItsResultAlone) {
+  std::string text;
+  Orbis::SerializeObjectToSoap(Orbis::DataArray<Nox::Kova::Host::DiskMapResult>(), nullptr, text);
+  _api.answer.result = Host::Result::OfText(text);
+  EXPECT_THAT(Post("AddAllEligibleDisks", "{}").body, HasSubstr("\"result\":[]"));
+  EXPECT_EQ(*_tasks.List().at(0).answer.result.GetText(), text);
 }
 
 TEST_F(TaskRoutes, AQueryIsNoTask) {

@@ -22,15 +22,6 @@ void AppendTime(const char* key, const std::optional<Orbis::DateTime>& time, std
   }
 }
 
-void AppendValue(const char* key, const Orbis::Any* value, std::string& out) {
-  out.append(",\"").append(key).append("\":");
-  if (value == nullptr) {
-    out += "null";
-  } else {
-    Orbis::WriteJson(*value, out);
-  }
-}
-
 }  // namespace
 
 const char* NameOf(TaskState state) {
@@ -41,6 +32,12 @@ const char* NameOf(TaskState state) {
 TaskState StateAfter(Host::Outcome outcome) {
   static constexpr std::array<TaskState, 3> states = {TaskState::Done, TaskState::Partly, TaskState::Failed};
   return states.at(static_cast<std::size_t>(outcome));
+}
+
+Host::Outcome OutcomeIn(TaskState ended) {
+  return ended == TaskState::Done     ? Host::Outcome::Done
+         : ended == TaskState::Partly ? Host::Outcome::Partly
+                                      : Host::Outcome::Failed;
 }
 
 void WriteJson(const Task& task, bool withResult, std::string& out) {
@@ -56,12 +53,18 @@ void WriteJson(const Task& task, bool withResult, std::string& out) {
   AppendText("step", task.step, out);
   if (task.ended) {
     if (withResult) {
-      AppendValue("result", task.answer.result.Get(), out);
+      out += ",\"result\":";
+      WriteJsonResult(task.answer.result, out);
     }
     if (task.resultForgotten) {
       out += ",\"resultForgotten\":true";
     }
-    AppendValue("fault", task.answer.fault.Get(), out);
+    out += ",\"fault\":";
+    if (task.answer.fault) {
+      Orbis::WriteJson(*task.answer.fault, out);
+    } else {
+      out += "null";
+    }
   }
   out += "}";
 }

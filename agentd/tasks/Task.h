@@ -3,11 +3,15 @@
 
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "host/Answer.h"
 #include "orbis/Any.h"
 
 namespace Agentd {
+
+// What is said of an id that no task has.
+inline constexpr std::string_view noSuchTask = "no task of that id; those that ended long ago are forgotten";
 
 enum class TaskState {
   Waiting,  // for the requests before it
@@ -17,8 +21,9 @@ enum class TaskState {
   Failed,
 };
 
-// The state of one that has ended.
+// The state of one that has ended, and back.
 TaskState StateAfter(Host::Outcome outcome);
+Host::Outcome OutcomeIn(TaskState ended);
 
 struct Task {
   std::string id;     // made by the agent; the kernel knows the request by it
@@ -30,7 +35,7 @@ struct Task {
   std::optional<Orbis::DateTime> ended;
   int percent = 0;               // as the kernel last reported
   std::string step;              // what it was doing then
-  Host::Answer answer;           // once it has ended
+  Host::Answer answer;           // once it has ended; its result as the plug-in wrote it
   bool resultForgotten = false;  // the answer had a result, which was too large to be kept for long
 };
 

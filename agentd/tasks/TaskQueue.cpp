@@ -8,10 +8,8 @@
 
 #include "agentd/tasks/Busy.h"
 #include "nox/Faults.h"
-#include "orbis/Json.h"
 #include "otxctl/TaskScope.h"
 #include "tessa/Logger.h"
-#include "tessa/Throwable.h"
 
 namespace Agentd {
 
@@ -30,19 +28,6 @@ std::string RandomPrefix() {
 
 Ref<Busy> Stopping() {
   return TooBusy("nox.agentd.tasks.stopping", "The agent is stopping; nothing of the request was done.");
-}
-
-// As JSON, which is how it is asked for. A result that cannot be written counts for nothing.
-std::size_t SizeOf(const Ref<Orbis::Any>& result) {
-  std::string text;
-  try {
-    if (result) {
-      Orbis::WriteJson(*result, text);
-    }
-  } catch (const Tessa::Throwable&) {
-    return 0;
-  }
-  return text.size();
 }
 
 }  // namespace
@@ -134,7 +119,7 @@ void TaskQueue::Close() {
     _changed.notify_all();
   }
   for (const auto& entry : refused) {
-    End(*entry, {.result = nullptr, .fault = Stopping()});
+    End(*entry, {.result = nullptr, .fault = Stopping()}, Host::Outcome::Failed);
   }
 }
 
@@ -172,24 +157,25 @@ void TaskQueue::Run(Entry& entry) {
     entry.task.percent = percent;
     entry.task.step = step;
   });
-  End(entry, Carry(entry));
+  auto [answer, outcome] = Carry(entry);
+  End(entry, std::move(answer), outcome);
 }
 
-Host::Answer TaskQueue::Carry(const Entry& entry) {
+std::pair<Host::Answer, Host::Outcome> TaskQueue::Carry(const Entry& entry) {
   try {
-    return entry.work();
+    const Host::Answer answer = entry.work();
+    return {answer, OutcomeOf(Host::Answer(answer))};  // read in a copy: the task keeps the text alone
   } catch (const std::exception& exception) {
-    return Host::FailedWith(exception.what());
+    return {Host::FailedWith(exception.what()), Host::Outcome::Failed};
   } catch (...) {
-    return Host::FailedWith("an error of an unknown kind");
+    return {Host::FailedWith("an error of an unknown kind"), Host::Outcome::Failed};
   }
 }
 
-void TaskQueue::End(Entry& entry, Host::Answer answer) {
+void TaskQueue::End(Entry& entry, Host::Answer answer, Host::Outcome outcome) {
   Listener onEnded;
   Task ended;
-  const std::size_t resultBytes = SizeOf(answer.result);
-  const Host::Outcome outcome = Host::OutcomeOf(answer);
+  const std::size_t resultBytes = answer.result.TextSize();
   {
     const std::lock_guard guard(_mutex);
     entry.task.state = StateAfter(outcome);

@@ -15,6 +15,7 @@
 #include <optional>
 #include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
 #include "agentd/tasks/OutcomeCounts.h"
@@ -26,7 +27,7 @@ struct TaskLimits {
   std::size_t waiting = 64;                 // beside the one that runs
   std::size_t remembered = 256;             // that have ended
   std::size_t waitingBytes = 64u << 20;     // of the requests that wait, unless it is a single one
-  std::size_t rememberedBytes = 64u << 20;  // of the results as JSON; the last one is kept however large
+  std::size_t rememberedBytes = 64u << 20;  // of the results as texts; the last one is kept however large
 };
 
 class TaskQueue {
@@ -75,10 +76,10 @@ class TaskQueue {
 
   void RunAll();
   void Run(Entry& entry);
-  Host::Answer Carry(const Entry& entry);
+  std::pair<Host::Answer, Host::Outcome> Carry(const Entry& entry);
   std::shared_ptr<Entry> NextWaiting(Lock& lock);
   // Ends the task, and tells its listener with the lock let go.
-  void End(Entry& entry, Host::Answer answer);
+  void End(Entry& entry, Host::Answer answer, Host::Outcome outcome);
   void ForgetOldest();
   // Of all but the one that ended last.
   void ForgetLargeResults(const Entry& last);

@@ -11,6 +11,7 @@
 #include "agentd/testing/RunningServer.h"
 #include "nox/Faults.h"
 #include "orbis/Any.h"
+#include "orbis/Soap.h"
 #include "orbis/Types.h"
 #include "otxctl/TaskScope.h"
 
@@ -250,11 +251,12 @@ TEST(TaskQueue, TakesTasksOfManyThreadsAtOnce) {
   EXPECT_EQ(queue.List().size(), 400u);
 }
 
-// A list of texts that comes to `bytes` of JSON.
+// A result of which the text has that many bytes.
 Answer AnswerOf(std::size_t bytes) {
-  const auto texts = Tessa::MakeRef<Orbis::TextList>();
-  texts->Items().emplace_back(bytes - 4, 't');
-  return {.result = texts, .fault = nullptr};
+  std::string text;
+  Orbis::SerializeObjectToSoap(Orbis::TextList(std::vector<std::string>{""}), nullptr, text);
+  text.insert(text.find("</item>"), bytes - text.size(), 't');
+  return {.result = Host::Result::OfText(text), .fault = nullptr};
 }
 
 TEST(TaskQueue, ForgetsTheResultsOfTheOldestWhenTheyAreLarge) {

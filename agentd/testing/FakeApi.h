@@ -9,9 +9,7 @@
 
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
-#include "nox/Host.h"
-#include "nox/Kova.h"
-#include "orbis/Engine.h"
+#include "host/testing/RequestInALine.h"
 
 namespace Agentd::Testing {
 
@@ -31,86 +29,36 @@ class FakeApi final : public Host::ManagementApi {
     return _asked;
   }
 
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
-    std::string text;
-    for (const std::string& name : names) {
-      text += " " + name;
+  Host::Answer Query(const Nox::Operation::Query& request) const override {
+    if (onQuery) {
+      onQuery();
     }
-    return Query("QueryDisksForKova" + text);
+    return Note(Host::Testing::InALine(request));
   }
-  Host::Answer GetStorageInfo() const override { return Query("GetStorageInfo"); }
-  Host::Answer GetDiskGroups() const override { return Query("GetDiskGroups"); }
-  Host::Answer GetConfigInfo() const override { return Query("GetConfigInfo"); }
-  Host::Answer AddDisks(const Host::DiskList& disks) const override {
-    return Change("AddDisks" + Show(&disks));
+  Host::Answer Change(const Nox::Operation::Change& request) const override {
+    return Changed(Host::Testing::InALine(request));
   }
-  Host::Answer AddAllEligibleDisks() const override { return Change("AddAllEligibleDisks"); }
-  Host::Answer InitializeDisks(const Host::MappingList& mappings) const override {
-    return Change("InitializeDisks" + Show(mappings));
-  }
-  Host::Answer UnmountDiskMapping(const Host::MappingList& mappings) const override {
-    return Change("UnmountDiskMapping" + Show(mappings));
-  }
-  Host::Answer RemoveDisk(const std::string& disk, const Host::RemovalArguments& arguments) const override {
-    return Change("RemoveDisk " + disk + Show(arguments));
-  }
-  Host::Answer RemoveDiskMapping(const Nox::Kova::Host::DiskMapping& mapping,
-                                 const Host::RemovalArguments& arguments) const override {
-    return Change("RemoveDiskMapping" + Show(mapping) + Show(arguments));
-  }
-  Host::Answer ClaimUnmountedDiskgroup() const override { return Change("ClaimUnmountedDiskgroup"); }
   std::string DescribeHost() const override {
     if (description.empty()) {
       throw Host::HostError("this is no simulated host");
     }
     return description;
   }
-  Host::Answer ChangeHost(const std::string& change) const override { return Change("ChangeHost " + change); }
+  Host::Answer ChangeHost(const std::string& change) const override {
+    return Changed("ChangeHost " + change);
+  }
 
  private:
-  Host::Answer Query(const std::string& asked) const {
-    if (onQuery) {
-      onQuery();
-    }
-    return Note(asked);
-  }
   Host::Answer Note(const std::string& asked) const {
     const std::lock_guard guard(_mutex);
     _asked.push_back(asked);
     return answerTo ? answerTo(asked) : answer;
   }
-  Host::Answer Change(const std::string& asked) const {
+  Host::Answer Changed(const std::string& asked) const {
     if (onChange) {
       onChange();
     }
     return Note(asked);
-  }
-
-  // " naa.1", " naa.1!" for one that is flash by its flag, " naa.1?" for one without.
-  static std::string Show(const Nox::Host::ScsiDisk& disk) {
-    const std::string flag = !disk.HasSsd() ? "?" : disk.GetSsd() ? "!" : "";
-    return " " + disk.GetCanonicalName() + flag;
-  }
-  static std::string Show(const Host::DiskList* disks) {
-    std::string text;
-    for (std::size_t i = 0; disks != nullptr && i < disks->Size(); ++i) {
-      text += Show(*(*disks)[i]);
-    }
-    return text;
-  }
-  static std::string Show(const Nox::Kova::Host::DiskMapping& mapping) {
-    return Show(*mapping.GetSsd()) + " <" + Show(mapping.GetNonSsd().Get()) + " >";
-  }
-  static std::string Show(const Host::MappingList& mappings) {
-    std::string text;
-    for (const Nox::Kova::Host::DiskMapping* mapping : mappings) {
-      text += Show(*mapping);
-    }
-    return text;
-  }
-  static std::string Show(const Host::RemovalArguments& arguments) {
-    return " " + arguments.passThrough + " " + arguments.optionText + " " +
-           std::to_string(arguments.optionFirst) + " " + std::to_string(arguments.optionSecond);
   }
 
   mutable std::mutex _mutex;

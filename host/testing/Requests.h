@@ -1,6 +1,7 @@
 // Requests of clients in a line: disks by name, as objects, and disk groups of them.
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -8,10 +9,13 @@
 #include "host/ManagementApi.h"
 #include "nox/Host.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/Types.h"
 
 namespace Host::Testing {
+
+namespace Op = Nox::Operation;
 
 using DiskRef = Tessa::Ref<Nox::Host::ScsiDisk>;
 using MappingRef = Tessa::Ref<Nox::Kova::Host::DiskMapping>;
@@ -57,6 +61,27 @@ inline Tessa::Ref<MappingList> Mappings(const std::vector<MappingRef>& mappings)
     list->Append(mapping);
   }
   return list;
+}
+
+inline Tessa::Ref<Orbis::TextList> Names(const std::vector<std::string>& names) {
+  return Tessa::MakeRef<Orbis::TextList>(names);
+}
+
+// What goes with a removal to the kernel.
+struct RemovalOptions {
+  std::string passThrough;
+  std::string text;
+  std::int32_t first = 0;
+  std::int32_t second = 0;
+};
+
+template <class Request>
+Request WithOptions(Request request, const RemovalOptions& options) {
+  request.SetPassThrough(options.passThrough);
+  request.SetOptionText(options.text);
+  request.SetOptionFirst(options.first);
+  request.SetOptionSecond(options.second);
+  return request;
 }
 
 // What an answer or a refusal comes to: "done", "KovaFault", "PROPERTY | MESSAGE" for an InvalidArgument with

@@ -5,10 +5,12 @@
 #include "kovactl/DiskGroups.h"
 #include "kovactl/Words.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
 
 namespace Kovactl {
 namespace {
 
+namespace Op = Nox::Operation;
 using Host::Answer;
 using Host::ManagementApi;
 using Nox::Host::ScsiDisk;
@@ -34,12 +36,23 @@ Ref<Host::DiskList> AllNamed(const Texts& names) {
   return disks;
 }
 
+template <class Request>
+Request WithOptions(Request request, const RemovalOptions& options) {
+  request.SetPassThrough(options.passThrough);
+  request.SetOptionText(options.text);
+  request.SetOptionFirst(options.first);
+  request.SetOptionSecond(options.second);
+  return request;
+}
+
 class AddDisksChange final : public Change {
  public:
   explicit AddDisksChange(Texts disks) : _disks(std::move(disks)) {}
   bool Destroys() const override { return true; }
   Texts DisksAtRisk() const override { return _disks; }
-  Answer Make(const ManagementApi& host) const override { return host.AddDisks(*AllNamed(_disks)); }
+  Answer Make(const ManagementApi& host) const override {
+    return host.Change(Op::AddDisks(AllNamed(_disks)));
+  }
   std::string Participle() const override { return "added"; }
   std::string WordsForSilence() const override { return "Nothing was added."; }
   std::optional<Texts> OfferedDisks() const override { return _disks; }
@@ -51,7 +64,7 @@ class AddDisksChange final : public Change {
 class AddAllChange final : public Change {
  public:
   Ref<MethodFault> LookAt(const ManagementApi& host) override {
-    const Answer answer = host.QueryDisksForKova({});
+    const Answer answer = host.Query(Op::QueryDisksForKova());
     const auto* const results = dynamic_cast<const Orbis::DataArray<DiskResult>*>(answer.result.Get());
     if (results == nullptr) {
       return answer.fault;
@@ -65,7 +78,7 @@ class AddAllChange final : public Change {
   }
   bool Destroys() const override { return true; }
   Texts DisksAtRisk() const override { return _eligible; }
-  Answer Make(const ManagementApi& host) const override { return host.AddAllEligibleDisks(); }
+  Answer Make(const ManagementApi& host) const override { return host.Change(Op::AddAllEligibleDisks()); }
   std::string Participle() const override { return "added"; }
   std::string WordsForSilence() const override {
     return _eligible.empty() ? "Nothing was added: no disk is eligible."
@@ -91,9 +104,9 @@ class MakeGroupChange final : public Change {
     const auto group = MakeRef<DiskMapping>();
     group->SetSsd(Named(_cacheDisk));
     group->SetNonSsd(AllNamed(_capacityDisks));
-    Host::MappingList groups;
-    groups.Append(group);
-    return host.InitializeDisks(groups);
+    const auto groups = MakeRef<Host::MappingList>();
+    groups->Append(group);
+    return host.Change(Op::InitializeDisks(groups));
   }
   std::string Participle() const override { return "made"; }
   std::string WordsForSilence() const override { return "Nothing was made."; }
@@ -105,8 +118,8 @@ class MakeGroupChange final : public Change {
 
 class RemoveDiskChange final : public Change {
  public:
-  RemoveDiskChange(std::string disk, Host::RemovalArguments arguments)
-      : _disk(std::move(disk)), _arguments(std::move(arguments)) {}
+  RemoveDiskChange(std::string disk, RemovalOptions options)
+      : _disk(std::move(disk)), _options(std::move(options)) {}
   // The cache disk takes its whole group along.
   Ref<MethodFault> LookAt(const ManagementApi& host) override {
     const DiskGroups groups = DiskGroups::Of(host);
@@ -116,21 +129,23 @@ class RemoveDiskChange final : public Change {
   }
   bool Destroys() const override { return true; }
   Texts DisksAtRisk() const override { return _atRisk; }
-  Answer Make(const ManagementApi& host) const override { return host.RemoveDisk(_disk, _arguments); }
+  Answer Make(const ManagementApi& host) const override {
+    return host.Change(WithOptions(Op::RemoveDisk(_disk), _options));
+  }
   std::string Participle() const override { return "removed"; }
   std::string WordsForSilence() const override { return "Removed " + _disk + "."; }
   bool AnswersWithGroups() const override { return false; }
 
  private:
   std::string _disk;
-  Host::RemovalArguments _arguments;
+  RemovalOptions _options;
   Texts _atRisk;
 };
 
 class RemoveGroupChange final : public Change {
  public:
-  RemoveGroupChange(std::string cacheDisk, Host::RemovalArguments arguments)
-      : _cacheDisk(std::move(cacheDisk)), _arguments(std::move(arguments)) {}
+  RemoveGroupChange(std::string cacheDisk, RemovalOptions options)
+      : _cacheDisk(std::move(cacheDisk)), _options(std::move(options)) {}
   Ref<MethodFault> LookAt(const ManagementApi& host) override {
     const DiskGroups groups = DiskGroups::Of(host);
     if (groups.Info() == nullptr) {
@@ -142,7 +157,7 @@ class RemoveGroupChange final : public Change {
   bool Destroys() const override { return true; }
   Texts DisksAtRisk() const override { return DisksOf(*_group); }
   Answer Make(const ManagementApi& host) const override {
-    return host.RemoveDiskMapping(*_group, _arguments);
+    return host.Change(WithOptions(Op::RemoveDiskMapping(_group), _options));
   }
   std::string Participle() const override { return "removed"; }
   std::string WordsForSilence() const override { return "Removed the disk group of " + _cacheDisk + "."; }
@@ -150,7 +165,7 @@ class RemoveGroupChange final : public Change {
 
  private:
   std::string _cacheDisk;
-  Host::RemovalArguments _arguments;
+  RemovalOptions _options;
   Ref<DiskMapping> _group;
 };
 
@@ -169,7 +184,9 @@ class UnmountChange final : public Change {
     return nullptr;
   }
   bool Destroys() const override { return false; }
-  Answer Make(const ManagementApi& host) const override { return host.UnmountDiskMapping(*_groups); }
+  Answer Make(const ManagementApi& host) const override {
+    return host.Change(Op::UnmountDiskMapping(_groups));
+  }
   std::string Participle() const override { return "unmounted"; }
   std::string WordsForSilence() const override { return "Nothing was unmounted."; }
 
@@ -181,7 +198,7 @@ class UnmountChange final : public Change {
 class ClaimChange final : public Change {
  public:
   bool Destroys() const override { return false; }
-  Answer Make(const ManagementApi& host) const override { return host.ClaimUnmountedDiskgroup(); }
+  Answer Make(const ManagementApi& host) const override { return host.Change(Op::ClaimUnmountedDiskgroup()); }
   std::string Participle() const override { return "mounted"; }
   std::string WordsForSilence() const override { return "Asked the host to mount its disk groups."; }
   bool AnswersWithGroups() const override { return false; }
@@ -205,12 +222,12 @@ ChangeRef MakeGroup(std::string cacheDisk, Texts capacityDisks) {
   return std::make_unique<MakeGroupChange>(std::move(cacheDisk), std::move(capacityDisks));
 }
 
-ChangeRef RemoveOneDisk(std::string disk, Host::RemovalArguments arguments) {
-  return std::make_unique<RemoveDiskChange>(std::move(disk), std::move(arguments));
+ChangeRef RemoveOneDisk(std::string disk, RemovalOptions options) {
+  return std::make_unique<RemoveDiskChange>(std::move(disk), std::move(options));
 }
 
-ChangeRef RemoveGroup(std::string cacheDisk, Host::RemovalArguments arguments) {
-  return std::make_unique<RemoveGroupChange>(std::move(cacheDisk), std::move(arguments));
+ChangeRef RemoveGroup(std::string cacheDisk, RemovalOptions options) {
+  return std::make_unique<RemoveGroupChange>(std::move(cacheDisk), std::move(options));
 }
 
 ChangeRef UnmountGroups(Texts cacheDisks) {

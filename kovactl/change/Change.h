@@ -4,6 +4,7 @@
 // and for its plan alike. Not shared between threads.
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <optional>
 #include <string>
@@ -41,13 +42,21 @@ class Change {
   virtual std::optional<Texts> OfferedDisks() const { return std::nullopt; }
 };
 
+// Handed to the host's kernel as they are.
+struct RemovalOptions {
+  std::string passThrough;
+  std::string text;
+  std::int32_t first = 0;
+  std::int32_t second = 0;
+};
+
 using ChangeRef = std::unique_ptr<Change>;
 
 ChangeRef AddTheseDisks(Texts disks);
 ChangeRef AddEveryEligibleDisk();
 ChangeRef MakeGroup(std::string cacheDisk, Texts capacityDisks);
-ChangeRef RemoveOneDisk(std::string disk, Host::RemovalArguments arguments);
-ChangeRef RemoveGroup(std::string cacheDisk, Host::RemovalArguments arguments);
+ChangeRef RemoveOneDisk(std::string disk, RemovalOptions options);
+ChangeRef RemoveGroup(std::string cacheDisk, RemovalOptions options);
 ChangeRef UnmountGroups(Texts cacheDisks);
 ChangeRef ClaimGroups();
 

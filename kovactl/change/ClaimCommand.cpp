@@ -50,7 +50,7 @@ ExitStatus RunClaim(const Host::ManagementApi& host, const ChangeOptions& option
     PrintFault(*before.Fault(), err);
     return ExitStatus::Fault;
   }
-  const Host::Answer answer = host.ClaimUnmountedDiskgroup();
+  const Host::Answer answer = host.Change(Nox::Operation::ClaimUnmountedDiskgroup());
   const DiskGroups now = DiskGroups::Of(host);
   for (const auto& fault : {answer.fault, now.Fault()}) {
     if (fault) {

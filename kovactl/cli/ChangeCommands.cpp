@@ -40,25 +40,25 @@ void AddInit(CLI::App& parent, const auto& take) {
 }
 
 // What the kernel is handed with a removal.
-void AddRemovalArguments(CLI::App& command, Host::RemovalArguments& arguments) {
-  command.add_option("--pass-through", arguments.passThrough, "Text handed to the kernel as it is");
-  command.add_option("--option-text", arguments.optionText, "Text of the kernel's removal options");
-  command.add_option("--option-first", arguments.optionFirst, "Their first number")->capture_default_str();
-  command.add_option("--option-second", arguments.optionSecond, "Their second number")->capture_default_str();
+void AddRemovalOptions(CLI::App& command, RemovalOptions& options) {
+  command.add_option("--pass-through", options.passThrough, "Text handed to the kernel as it is");
+  command.add_option("--option-text", options.text, "Text of the kernel's removal options");
+  command.add_option("--option-first", options.first, "Their first number")->capture_default_str();
+  command.add_option("--option-second", options.second, "Their second number")->capture_default_str();
 }
 
-using MakeRemoval = ChangeRef (*)(std::string disk, Host::RemovalArguments arguments);
+using MakeRemoval = ChangeRef (*)(std::string disk, RemovalOptions options);
 
 void AddRemoval(CLI::App& parent, const auto& take, const char* name, const char* what, const char* argument,
                 const char* argumentIs, MakeRemoval makeRemoval) {
   struct Arguments {
     std::string disk;
-    Host::RemovalArguments removal;
+    RemovalOptions removal;
   };
   const auto arguments = std::make_shared<Arguments>();
   auto* const command = parent.add_subcommand(name, what);
   command->add_option(argument, arguments->disk, argumentIs)->required();
-  AddRemovalArguments(*command, arguments->removal);
+  AddRemovalOptions(*command, arguments->removal);
   take(*command, [arguments, makeRemoval] { return makeRemoval(arguments->disk, arguments->removal); });
 }
 

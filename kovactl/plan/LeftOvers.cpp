@@ -11,6 +11,7 @@
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
 #include "nox/Kova.h"
+#include "nox/Operations.h"
 #include "otxctl/sim/SimRules.h"
 
 namespace Kovactl {
@@ -99,7 +100,8 @@ LeftOverDisk Explain(const DiskResult& verdict, const std::optional<LeftOver>& r
 
 std::vector<LeftOverDisk> FindLeftOvers(const Host::ManagementApi& host, const HostDescription& before,
                                         const Names& offered, const NameSet& placed) {
-  const Host::Answer answer = host.QueryDisksForKova(offered);
+  const Host::Answer answer =
+      host.Query(Nox::Operation::QueryDisksForKova(Tessa::MakeRef<Orbis::TextList>(offered)));
   const auto* const verdicts = dynamic_cast<const Orbis::DataArray<DiskResult>*>(answer.result.Get());
   std::vector<LeftOverDisk> leftOver;
   if (verdicts == nullptr) {

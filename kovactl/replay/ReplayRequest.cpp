@@ -1,18 +1,26 @@
 #include "kovactl/replay/ReplayRequest.h"
 
 #include <algorithm>
+#include <functional>
 #include <limits>
 
-#include "nox/Host.h"
+#include "nox/OperationTable.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
+#include "orbis/TypeDescriptor.h"
 #include "orbis/json/JsonText.h"
 
 namespace Kovactl {
 namespace {
 
+using Orbis::FieldDescriptor;
+using Orbis::FieldKind;
 using Orbis::Json::Kind;
 using Orbis::Json::Value;
+
+constexpr std::string_view raw = "raw";
+constexpr std::string_view host = "host";
+constexpr std::string_view tagKey = "requestTag";
 
 [[noreturn]] void Refuse(const Value& value, const std::string& path, const std::string& reason) {
   throw Orbis::ParseException(path, value.line, reason);
@@ -24,12 +32,21 @@ void Demand(Kind kind, const char* wanted, const Value& value, const std::string
   }
 }
 
-std::string ReadText(const Value& value, const std::string& path) {
+const std::string& TextOf(const Value& value, const std::string& path) {
   Demand(Kind::String, "a text", value, path);
   return value.text;
 }
 
-std::int32_t ReadInt(const Value& value, const std::string& path) {
+std::vector<std::string> TextsOf(const Value& value, const std::string& path) {
+  Demand(Kind::Array, "an array", value, path);
+  std::vector<std::string> texts;
+  for (const Value& item : value.items) {
+    texts.push_back(TextOf(item, path + "[" + std::to_string(texts.size()) + "]"));
+  }
+  return texts;
+}
+
+std::int32_t IntOf(const Value& value, const std::string& path) {
   Demand(Kind::Integer, "an integer", value, path);
   if (value.integer < std::numeric_limits<std::int32_t>::min() ||
       value.integer > std::numeric_limits<std::int32_t>::max()) {
@@ -38,131 +55,114 @@ std::int32_t ReadInt(const Value& value, const std::string& path) {
   return static_cast<std::int32_t>(value.integer);
 }
 
-template <class Item, class Read>
-std::vector<Item> ReadList(const Value& value, const std::string& path, Read read) {
-  Demand(Kind::Array, "an array", value, path);
-  std::vector<Item> items;
-  for (const Value& item : value.items) {
-    items.push_back(read(item, path + "[" + std::to_string(items.size()) + "]"));
-  }
-  return items;
-}
-
-DiskArgument ReadDisk(const Value& value, const std::string& path) {
-  if (value.kind == Kind::String) {
-    return value.text;
-  }
-  const auto object =
-      Orbis::ReadJson(value, &Nox::Host::ScsiDisk::StaticType(), path, Orbis::Missing::Default);
-  return Tessa::Ref<Nox::Host::ScsiDisk>(static_cast<Nox::Host::ScsiDisk*>(object.Get()));
-}
-
-MappingArgument ReadMapping(const Value& value, const std::string& path) {
-  Demand(Kind::Object, "a mapping", value, path);
-  MappingArgument mapping{Tessa::MakeRef<Nox::Host::ScsiDisk>(), {}};
-  for (const auto& [key, member] : value.members) {
-    const std::string place = path + "." + key;
-    if (key == "ssd") {
-      mapping.ssd = ReadDisk(member, place);
-    } else if (key == "nonSsd") {
-      mapping.nonSsd = ReadList<DiskArgument>(member, place, &ReadDisk);
-    } else if (key != "@type" || ReadText(member, place) != "KovaHostDiskMapping") {
-      Refuse(member, place, "a mapping has ssd and nonSsd");
-    }
-  }
-  return mapping;
-}
-
-nlohmann::json ReadHostPart(const Value& value, std::string_view line, const std::string& key) {
-  Demand(Kind::Object, "an object", value, key);
-  return nlohmann::json::parse(line)[key];  // sound and free of double keys: it was read before
-}
-
-// What each operation is called by, and the keys it takes.
-struct Operation {
+// What hooks are given beside objects, by the names of parameters.
+template <class Type>
+struct Member {
   std::string_view name;
-  std::string_view hook;
-  std::vector<std::string_view> keys;
+  Type HookArguments::*member;
 };
 
-const std::vector<Operation>& Operations() {
-  static const std::vector<Operation> operations = {
-      {"QueryDisksForKova", "QueryDisksForKovaHookFn", {"names"}},
-      {"AddDisks", "AddDisksHookFn", {"disks", "requestTag"}},
-      {"InitializeDisks", "InitializeDisksHookFn", {"mappings", "requestTag"}},
-      {"RemoveDisk",
-       "RemoveDisksHookFn",
-       {"disk", "passThrough", "optionText", "optionFirst", "optionSecond"}},
-      {"RemoveDiskMapping",
-       "RemoveDiskMappingHookFn",
-       {"mapping", "passThrough", "optionText", "optionFirst", "optionSecond"}},
-      {"UnmountDiskMapping", "UnmountDiskMappingHookFn", {"mappings", "requestTag"}},
-      {"AddAllEligibleDisks", "AddAllEligibleDisksHookFn", {"requestTag"}},
-      {"GetStorageInfo", "GetStorageInfoHookFn", {}},
-      {"GetConfigInfo", "GetConfigInfoHookFn", {}},
-      {"ClaimUnmountedDiskgroup", "ClaimUnmountedDiskgroupHookFn", {}},
-      {"raw",
-       "",
-       {"hook", "texts", "names", "disk", "requestTag", "passThrough", "optionText", "optionFirst",
-        "optionSecond"}},
-      {"host", "", {"set", "disk"}},
+constexpr Member<std::string> textMembers[] = {{"disk", &HookArguments::disk},
+                                               {tagKey, &HookArguments::requestTag},
+                                               {"passThrough", &HookArguments::passThrough},
+                                               {"optionText", &HookArguments::optionText}};
+constexpr Member<std::int32_t> intMembers[] = {{"optionFirst", &HookArguments::optionFirst},
+                                               {"optionSecond", &HookArguments::optionSecond}};
+constexpr Member<std::vector<std::string>> listMembers[] = {{"names", &HookArguments::names},
+                                                            {"texts", &HookArguments::texts}};
+
+// Whether the hook is given something of that name.
+bool ReadArgument(const std::string& key, const Value& value, HookArguments& arguments) {
+  const auto read = [&](const auto& members, const auto& reader) {
+    for (const auto& one : members) {
+      if (one.name == key) {
+        arguments.*one.member = reader(value, key);
+        return true;
+      }
+    }
+    return false;
   };
-  return operations;
+  return read(textMembers, TextOf) || read(intMembers, IntOf) || read(listMembers, TextsOf);
 }
 
-const Operation& FindOperation(const Value& root) {
-  const Value* const name = root.Find("operation");
-  if (name == nullptr) {
-    Refuse(root, "operation", "is missing");
-  }
-  for (const Operation& operation : Operations()) {
-    if (operation.name == ReadText(*name, "operation")) {
-      return operation;
+// A parameter that the log may give: label and wait are the agent's.
+bool Takes(const Nox::OperationDescriptor& operation, std::string_view key) {
+  const auto isOfThatName = [key](const FieldDescriptor* field) { return field->name == key; };
+  const auto& fields = operation.request.fields;
+  return key != "label" && key != "wait" && std::any_of(fields.begin(), fields.end(), isOfThatName);
+}
+
+Tessa::Ref<Orbis::DataObject> MakeNamed(const Orbis::TypeDescriptor&, const std::string& name) {
+  return Tessa::MakeRef<NamedDisk>(name);
+}
+
+// The objects among the parameters. One that the log does not give is null, and missing fields of objects
+// have defaults.
+Tessa::Ref<Orbis::DataObject> ReadParameters(const Nox::OperationDescriptor& operation, const Value& root) {
+  Value parameters = root;
+  std::erase_if(parameters.members, [&](const auto& member) { return !Takes(operation, member.key); });
+  const Orbis::JsonRules rules{.missing = Orbis::Missing::Default, .named = &MakeNamed};
+  const auto read = Orbis::ReadJson(parameters, &operation.request, {}, rules);
+  auto& request = static_cast<Orbis::DataObject&>(*read);
+  for (const FieldDescriptor* field : operation.request.fields) {
+    if (field->kind == FieldKind::Object && root.Find(field->name) == nullptr) {
+      field->assign(request, nullptr);
     }
   }
-  Refuse(*name, "operation", "unknown operation '" + name->text + "'");
+  return Tessa::Ref<Orbis::DataObject>(&request);
 }
 
-void CheckHook(const Value& value) {
-  for (const Operation& operation : Operations()) {
-    if (!operation.hook.empty() && operation.hook == ReadText(value, "hook")) {
-      return;
+const HookCall* FindCall(std::string_view HookCall::*name, std::string_view wanted) {
+  const auto calls = HookCalls();
+  const auto found =
+      std::find_if(calls.begin(), calls.end(), [&](const HookCall& call) { return call.*name == wanted; });
+  return found == calls.end() ? nullptr : &*found;
+}
+
+void CheckKeys(const Value& root, const std::string& operation,
+               const std::function<bool(const std::string&)>& takes) {
+  for (const auto& [key, value] : root.members) {
+    if (key != "operation" && !takes(key)) {
+      Refuse(value, key, "unknown key; " + operation + " has none of that name");
     }
   }
-  Refuse(value, "hook", "unknown hook '" + value.text + "'");
 }
 
-void ReadMember(const std::string& key, const Value& value, std::string_view line, ReplayRequest& request) {
-  if (key == "names") {
-    request.names = ReadList<std::string>(value, key, &ReadText);
-  } else if (key == "disks") {
-    request.disks = ReadList<DiskArgument>(value, key, &ReadDisk);
-  } else if (key == "mappings") {
-    request.mappings = ReadList<MappingArgument>(value, key, &ReadMapping);
-  } else if (key == "mapping") {
-    request.mappings = {ReadMapping(value, key)};
-  } else if (key == "texts") {
-    request.texts = ReadList<std::string>(value, key, &ReadText);
-  } else if (key == "hook") {
-    CheckHook(value);
-    request.hook = value.text;
-  } else if (key == "set") {
-    request.hostSet = ReadHostPart(value, line, key);
-  } else if (key == "disk" && request.operation == "host") {
-    request.hostDisk = ReadHostPart(value, line, key);
-  } else if (key == "disk") {
-    request.disk = ReadText(value, key);
-  } else if (key == "requestTag") {
-    request.requestTag = ReadText(value, key);
-  } else if (key == "passThrough") {
-    request.passThrough = ReadText(value, key);
-  } else if (key == "optionText") {
-    request.optionText = ReadText(value, key);
-  } else if (key == "optionFirst") {
-    request.optionFirst = ReadInt(value, key);
-  } else if (key == "optionSecond") {
-    request.optionSecond = ReadInt(value, key);
+void ParseOperation(const Value& root, ReplayRequest& request) {
+  const Nox::OperationDescriptor& operation = *Nox::FindOperation(request.operation);
+  CheckKeys(root, request.operation, [&](const std::string& key) {
+    return Takes(operation, key) || (request.hook->takesTag && key == tagKey);
+  });
+  request.parameters = ReadParameters(operation, root);
+  for (const auto& [key, value] : root.members) {
+    ReadArgument(key, value, request.arguments);
   }
+}
+
+void ParseRaw(const Value& root, ReplayRequest& request) {
+  CheckKeys(root, request.operation, [&](const std::string& key) {
+    return key == "hook" || ReadArgument(key, *root.Find(key), request.arguments);
+  });
+  const Value* const hook = root.Find("hook");
+  if (hook == nullptr) {
+    Refuse(root, "hook", "is missing");
+  }
+  request.hook = FindCall(&HookCall::hook, TextOf(*hook, "hook"));
+  if (request.hook == nullptr) {
+    Refuse(*hook, "hook", "unknown hook '" + hook->text + "'");
+  }
+}
+
+void ParseHost(const Value& root, std::string_view line, ReplayRequest& request) {
+  const auto read = [&](const std::string& key, nlohmann::json& part) {
+    if (const Value* const value = root.Find(key)) {
+      Demand(Kind::Object, "an object", *value, key);
+      part = nlohmann::json::parse(line)[key];  // sound and free of double keys: it was read before
+    }
+  };
+  CheckKeys(root, request.operation, [](const std::string& key) { return key == "set" || key == "disk"; });
+  read("set", request.hostSet);
+  read("disk", request.hostDisk);
 }
 
 }  // namespace
@@ -170,21 +170,21 @@ void ReadMember(const std::string& key, const Value& value, std::string_view lin
 ReplayRequest ParseReplayRequest(std::string_view line) {
   const Value root = Orbis::Json::Parse(line, Orbis::Limits::OwnOutput());
   Demand(Kind::Object, "an object", root, "(root)");
-  const Operation& operation = FindOperation(root);
-  ReplayRequest request;
-  request.operation = operation.name;
-  request.hook = operation.hook;
-  for (const auto& [key, value] : root.members) {
-    if (key == "operation") {
-      continue;
-    }
-    if (std::find(operation.keys.begin(), operation.keys.end(), key) == operation.keys.end()) {
-      Refuse(value, key, "unknown key; " + request.operation + " has none of that name");
-    }
-    ReadMember(key, value, line, request);
+  const Value* const operation = root.Find("operation");
+  if (operation == nullptr) {
+    Refuse(root, "operation", "is missing");
   }
-  if (request.operation == "raw" && request.hook.empty()) {
-    Refuse(root, "hook", "is missing");
+  ReplayRequest request;
+  request.operation = TextOf(*operation, "operation");
+  request.hook = FindCall(&HookCall::operation, request.operation);
+  if (request.operation == raw) {
+    ParseRaw(root, request);
+  } else if (request.operation == host) {
+    ParseHost(root, line, request);
+  } else if (request.hook != nullptr) {
+    ParseOperation(root, request);
+  } else {
+    Refuse(*operation, "operation", "unknown operation '" + request.operation + "'");
   }
   return request;
 }

@@ -4,6 +4,8 @@
 #include <gtest/gtest.h>
 
 #include "nox/Host.h"
+#include "nox/Kova.h"
+#include "nox/Operations.h"
 #include "orbis/ParseException.h"
 
 namespace Kovactl {
@@ -14,11 +16,15 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 
-const std::string& NameIn(const DiskArgument& disk) {
-  return std::get<std::string>(disk);
+namespace Op = Nox::Operation;
+
+template <class Request>
+const Request& Parameters(const ReplayRequest& request) {
+  return dynamic_cast<const Request&>(*request.parameters);
 }
-const ScsiDisk& ObjectIn(const DiskArgument& disk) {
-  return *std::get<Tessa::Ref<ScsiDisk>>(disk);
+
+bool IsByName(const ScsiDisk* disk) {
+  return dynamic_cast<const NamedDisk*>(disk) != nullptr;
 }
 
 struct Hooked {
@@ -31,14 +37,13 @@ class EveryOperation : public testing::TestWithParam<Hooked> {};
 TEST_P(EveryOperation, HasItsHookAndEmptyArgumentsWhereNoneAreGiven) {
   const auto request = ParseReplayRequest(R"({"operation": ")" + std::string(GetParam().operation) + R"("})");
   EXPECT_EQ(request.operation, GetParam().operation);
-  EXPECT_EQ(request.hook, GetParam().hook);
-  EXPECT_THAT(request.names, IsEmpty());
-  EXPECT_THAT(request.disks, IsEmpty());
-  EXPECT_THAT(request.mappings, IsEmpty());
-  EXPECT_THAT(request.texts, IsEmpty());
-  EXPECT_EQ(request.disk + request.requestTag + request.passThrough + request.optionText, "");
-  EXPECT_EQ(request.optionFirst, 0);
-  EXPECT_EQ(request.optionSecond, 0);
+  EXPECT_EQ(request.hook == nullptr ? "" : request.hook->hook, GetParam().hook);
+  const HookArguments& arguments = request.arguments;
+  EXPECT_THAT(arguments.names, IsEmpty());
+  EXPECT_THAT(arguments.texts, IsEmpty());
+  EXPECT_EQ(arguments.disk + arguments.requestTag + arguments.passThrough + arguments.optionText, "");
+  EXPECT_EQ(arguments.optionFirst, 0);
+  EXPECT_EQ(arguments.optionSecond, 0);
   EXPECT_TRUE(request.hostSet.is_null());
   EXPECT_TRUE(request.hostDisk.is_null());
 }
@@ -57,23 +62,32 @@ INSTANTIATE_TEST_SUITE_P(Operations, EveryOperation,
                                          Hooked{"host", ""}),
                          [](const auto& tested) { return std::string(tested.param.operation); });
 
+TEST(EveryHook, CarriesOutAnOperationOfTheApi) {
+  for (const HookCall& call : HookCalls()) {
+    EXPECT_NE(Nox::FindOperation(call.operation), nullptr) << call.operation;
+  }
+}
+
 TEST(ReplayRequest, ReadsNames) {
   const auto request = ParseReplayRequest(R"({"operation": "QueryDisksForKova", "names": ["naa.1", ""]})");
-  EXPECT_THAT(request.names, ElementsAre("naa.1", ""));
+  EXPECT_THAT(request.arguments.names, ElementsAre("naa.1", ""));
 }
 
 TEST(ReplayRequest, ReadsDisksByNameAndInFull) {
   const auto request = ParseReplayRequest(
       R"({"operation": "AddDisks", "requestTag": "t1",
           "disks": ["naa.1", {"@type": "HostScsiDisk", "canonicalName": "naa.2", "ssd": true}, {}]})");
-  EXPECT_EQ(request.requestTag, "t1");
-  ASSERT_EQ(request.disks.size(), 3u);
-  EXPECT_EQ(NameIn(request.disks[0]), "naa.1");
-  EXPECT_EQ(ObjectIn(request.disks[1]).GetCanonicalName(), "naa.2");
-  EXPECT_TRUE(ObjectIn(request.disks[1]).GetSsd());
-  EXPECT_EQ(ObjectIn(request.disks[1]).GetUuid(), "") << "a required field that is missing has its default";
-  EXPECT_EQ(ObjectIn(request.disks[1]).GetCapacity()->GetBlock(), 0);
-  EXPECT_FALSE(ObjectIn(request.disks[2]).HasCanonicalName()) << "an object is taken as it is";
+  EXPECT_EQ(request.arguments.requestTag, "t1");
+  const auto& disks = *Parameters<Op::AddDisks>(request).GetDisks();
+  ASSERT_EQ(disks.Size(), 3u);
+  EXPECT_TRUE(IsByName(disks[0]));
+  EXPECT_EQ(disks[0]->GetCanonicalName(), "naa.1");
+  EXPECT_FALSE(IsByName(disks[1])) << "an object is taken as it is";
+  EXPECT_EQ(disks[1]->GetCanonicalName(), "naa.2");
+  EXPECT_TRUE(disks[1]->GetSsd());
+  EXPECT_EQ(disks[1]->GetUuid(), "") << "a required field that is missing has its default";
+  EXPECT_EQ(disks[1]->GetCapacity()->GetBlock(), 0);
+  EXPECT_FALSE(disks[2]->HasCanonicalName());
 }
 
 TEST(ReplayRequest, ReadsMappings) {
@@ -81,67 +95,74 @@ TEST(ReplayRequest, ReadsMappings) {
       R"({"operation": "InitializeDisks", "requestTag": "t2", "mappings": [
           {"ssd": "naa.1", "nonSsd": ["naa.2", {"canonicalName": "naa.3"}]},
           {"@type": "KovaHostDiskMapping", "ssd": {"ssd": true}}, {}]})");
-  ASSERT_EQ(request.mappings.size(), 3u);
-  EXPECT_EQ(NameIn(request.mappings[0].ssd), "naa.1");
-  ASSERT_EQ(request.mappings[0].nonSsd.size(), 2u);
-  EXPECT_EQ(NameIn(request.mappings[0].nonSsd[0]), "naa.2");
-  EXPECT_EQ(ObjectIn(request.mappings[0].nonSsd[1]).GetCanonicalName(), "naa.3");
-  EXPECT_TRUE(ObjectIn(request.mappings[1].ssd).GetSsd());
-  EXPECT_THAT(request.mappings[1].nonSsd, IsEmpty());
-  EXPECT_FALSE(ObjectIn(request.mappings[2].ssd).HasCanonicalName());
+  const auto& mappings = *Parameters<Op::InitializeDisks>(request).GetMappings();
+  ASSERT_EQ(mappings.Size(), 3u);
+  EXPECT_TRUE(IsByName(mappings[0]->GetSsd().Get()));
+  ASSERT_EQ(mappings[0]->GetNonSsd()->Size(), 2u);
+  EXPECT_TRUE(IsByName((*mappings[0]->GetNonSsd())[0]));
+  EXPECT_EQ((*mappings[0]->GetNonSsd())[1]->GetCanonicalName(), "naa.3");
+  EXPECT_TRUE(mappings[1]->GetSsd()->GetSsd());
+  EXPECT_FALSE(mappings[1]->GetNonSsd());
+  EXPECT_FALSE(mappings[2]->GetSsd()->HasCanonicalName());
 }
 
 TEST(ReplayRequest, ReadsTheMappingsOfAnUnmount) {
   const auto request = ParseReplayRequest(
       R"({"operation": "UnmountDiskMapping", "mappings": [{"ssd": "naa.1"}], "requestTag": "t3"})");
-  EXPECT_EQ(request.mappings.size(), 1u);
-  EXPECT_EQ(request.requestTag, "t3");
+  EXPECT_EQ(Parameters<Op::UnmountDiskMapping>(request).GetMappings()->Size(), 1u);
+  EXPECT_EQ(request.arguments.requestTag, "t3");
 }
 
 TEST(ReplayRequest, ReadsARemovalOfADiskWithItsOptions) {
   const auto request = ParseReplayRequest(
       R"({"operation": "RemoveDisk", "disk": "naa.2", "passThrough": "p", "optionText": "o",
           "optionFirst": 2147483647, "optionSecond": -2147483648})");
-  EXPECT_EQ(request.disk, "naa.2");
-  EXPECT_EQ(request.passThrough, "p");
-  EXPECT_EQ(request.optionText, "o");
-  EXPECT_EQ(request.optionFirst, 2147483647);
-  EXPECT_EQ(request.optionSecond, -2147483647 - 1);
+  const HookArguments& arguments = request.arguments;
+  EXPECT_EQ(arguments.disk, "naa.2");
+  EXPECT_EQ(arguments.passThrough, "p");
+  EXPECT_EQ(arguments.optionText, "o");
+  EXPECT_EQ(arguments.optionFirst, 2147483647);
+  EXPECT_EQ(arguments.optionSecond, -2147483647 - 1);
 }
 
 TEST(ReplayRequest, ReadsARemovalOfAMapping) {
   const auto request = ParseReplayRequest(
       R"({"operation": "RemoveDiskMapping", "mapping": {"ssd": "naa.1", "nonSsd": []}, "passThrough": "p",
           "optionText": "o", "optionFirst": 1, "optionSecond": 2})");
-  ASSERT_EQ(request.mappings.size(), 1u);
-  EXPECT_EQ(NameIn(request.mappings[0].ssd), "naa.1");
-  EXPECT_EQ(request.passThrough, "p");
-  EXPECT_EQ(request.optionSecond, 2);
+  EXPECT_TRUE(IsByName(Parameters<Op::RemoveDiskMapping>(request).GetMapping()->GetSsd().Get()));
+  EXPECT_EQ(request.arguments.passThrough, "p");
+  EXPECT_EQ(request.arguments.optionSecond, 2);
+}
+
+TEST(ReplayRequest, OfARemovalWithoutAMappingHasNone) {
+  const auto request = ParseReplayRequest(R"({"operation": "RemoveDiskMapping"})");
+  EXPECT_FALSE(Parameters<Op::RemoveDiskMapping>(request).GetMapping());
 }
 
 TEST(ReplayRequest, ReadsARequestTagOfTheRequestThatHasNothingElse) {
-  EXPECT_EQ(ParseReplayRequest(R"({"operation": "AddAllEligibleDisks", "requestTag": "t4"})").requestTag,
-            "t4");
+  const auto request = ParseReplayRequest(R"({"operation": "AddAllEligibleDisks", "requestTag": "t4"})");
+  EXPECT_EQ(request.arguments.requestTag, "t4");
 }
 
 TEST(ReplayRequest, LeavesRawTextsUntouched) {
   const auto request = ParseReplayRequest(
       R"({"operation": "raw", "hook": "AddDisksHookFn", "texts": ["<any text/>", "", "\u0000\n"], "requestTag": "t"})");
   EXPECT_EQ(request.operation, "raw");
-  EXPECT_EQ(request.hook, "AddDisksHookFn");
-  EXPECT_THAT(request.texts, ElementsAre("<any text/>", "", std::string("\0\n", 2)));
-  EXPECT_EQ(request.requestTag, "t");
+  EXPECT_EQ(request.hook->hook, "AddDisksHookFn");
+  EXPECT_THAT(request.arguments.texts, ElementsAre("<any text/>", "", std::string("\0\n", 2)));
+  EXPECT_EQ(request.arguments.requestTag, "t");
 }
 
 TEST(ReplayRequest, ReadsTheOtherArgumentsOfARawRequest) {
   EXPECT_THAT(
-      ParseReplayRequest(R"({"operation": "raw", "hook": "QueryDisksForKovaHookFn", "names": ["\n"]})").names,
+      ParseReplayRequest(R"({"operation": "raw", "hook": "QueryDisksForKovaHookFn", "names": ["\n"]})")
+          .arguments.names,
       ElementsAre("\n"));
   const auto removal = ParseReplayRequest(
       R"({"operation": "raw", "hook": "RemoveDisksHookFn", "disk": "", "passThrough": "p", "optionText": "o",
           "optionFirst": 1, "optionSecond": 2})");
-  EXPECT_EQ(removal.disk, "");
-  EXPECT_EQ(removal.optionFirst, 1);
+  EXPECT_EQ(removal.arguments.disk, "");
+  EXPECT_EQ(removal.arguments.optionFirst, 1);
 }
 
 TEST(ReplayRequest, ReadsAChangeOfTheHost) {
@@ -175,6 +196,10 @@ INSTANTIATE_TEST_SUITE_P(
         Refused{R"({"operation": 1})", "operation"}, Refused{R"({"operation": "Fly"})", "operation"},
         Refused{R"({"operation": "queryDisksForKova"})", "operation"},
         Refused{R"({"operation": "GetStorageInfo", "names": []})", "names"},
+        Refused{R"({"operation": "GetDiskGroups"})", "operation"},
+        Refused{R"({"operation": "AddDisks", "label": "a"})", "label"},
+        Refused{R"({"operation": "AddDisks", "wait": true})", "wait"},
+        Refused{R"({"operation": "AddDisks", "texts": []})", "texts"},
         Refused{R"({"operation": "QueryDisksForKova", "requestTag": "t"})", "requestTag"},
         Refused{R"({"operation": "QueryDisksForKova", "names": "naa.1"})", "names"},
         Refused{R"({"operation": "QueryDisksForKova", "names": ["a", null]})", "names[1]"},

@@ -47,50 +47,6 @@ std::string TypeName(const std::type_info& type) {
   return name.substr(0, name.find('<'));
 }
 
-using Hooks = Host::PluginHooks;
-using HookCall = void (*)(const Hooks&, ReplayRequest&, const Texts&, std::string& fault,
-                          std::string& result);
-
-struct HookRow {
-  std::string_view hook;
-  HookCall call;
-};
-
-const HookRow hookRows[] = {
-    {"QueryDisksForKovaHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts&, std::string& fault, std::string& result) {
-       hooks.queryDisksForKova(request.names, fault, result);
-     }},
-    {"AddDisksHookFn", [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault,
-                          std::string& result) { hooks.addDisks(texts, request.requestTag, fault, result); }},
-    {"InitializeDisksHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault,
-        std::string& result) { hooks.initializeDisks(texts, request.requestTag, fault, result); }},
-    {"RemoveDisksHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts&, std::string& fault, std::string&) {
-       hooks.removeDisks(request.disk, request.passThrough, request.optionText, request.optionFirst,
-                         request.optionSecond, fault);
-     }},
-    {"RemoveDiskMappingHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault, std::string&) {
-       hooks.removeDiskMapping(texts.empty() ? std::string() : texts.front(), request.passThrough,
-                               request.optionText, request.optionFirst, request.optionSecond, fault);
-     }},
-    {"AddAllEligibleDisksHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts&, std::string& fault, std::string& result) {
-       hooks.addAllEligibleDisks(request.requestTag, fault, result);
-     }},
-    {"UnmountDiskMappingHookFn",
-     [](const Hooks& hooks, ReplayRequest& request, const Texts& texts, std::string& fault,
-        std::string& result) { hooks.unmountDiskMapping(texts, request.requestTag, fault, result); }},
-    {"GetStorageInfoHookFn", [](const Hooks& hooks, ReplayRequest&, const Texts&, std::string&,
-                                std::string& result) { hooks.getStorageInfo(result); }},
-    {"GetConfigInfoHookFn", [](const Hooks& hooks, ReplayRequest&, const Texts&, std::string&,
-                               std::string& result) { hooks.getConfigInfo(result); }},
-    {"ClaimUnmountedDiskgroupHookFn", [](const Hooks& hooks, ReplayRequest&, const Texts&, std::string&,
-                                         std::string&) { hooks.claimUnmountedDiskgroup(); }},
-};
-
 template <class T>
 void AppendOrNull(const Ref<T>& value, std::string& out) {
   if (value) {
@@ -144,20 +100,16 @@ class Replay {
       Answer({});
       return;
     }
-    const Texts texts = HookTexts(request);
+    AddTexts(request);
     TakeNoise();
-    Answer(Call(request, texts));
+    Answer(Call(request));
   }
 
  private:
   // How the hook ended; empty: as it should.
-  std::string Call(ReplayRequest& request, const Texts& texts) {
+  std::string Call(ReplayRequest& request) {
     try {
-      for (const HookRow& row : hookRows) {
-        if (row.hook == request.hook) {
-          row.call(_runtime->Hooks(), request, texts, _faultText, _resultText);
-        }
-      }
+      request.hook->call(_runtime->Hooks(), request.arguments, _faultText, _resultText);
       return "";
     } catch (const std::exception& exception) {
       return "exception: " + TypeName(typeid(exception)) + ": " + exception.what();
@@ -174,13 +126,13 @@ class Replay {
 
   // Throws Orbis::ParseException when what the hook appended cannot be read, a mistake of the plug-in.
   void Answer(const std::string& ended) {
-    const Host::Answer answer = Host::ReadAnswer(_faultText, _resultText);
+    const Host::Answer answer = Host::AnswerOf(_faultText, _resultText);
     std::string line = "{\"operation\":";
     Orbis::Json::AppendString(_operation, line);
     line += ",\"fault\":";
     AppendOrNull(answer.fault, line);
     line += ",\"result\":";
-    AppendOrNull(answer.result, line);
+    Host::WriteJsonResult(answer.result, line);
     line += ",\"ended\":";
     if (ended.empty()) {
       line += "null";

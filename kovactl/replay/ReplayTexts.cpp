@@ -6,12 +6,14 @@
 #include "nox/Kova.h"
 #include "nox/StorageSystem.h"
 #include "orbis/Soap.h"
+#include "orbis/TypeDescriptor.h"
 #include "tessa/App.h"
 
 namespace Kovactl {
 namespace {
 
 using Nox::Host::ScsiDisk;
+using Nox::Kova::Host::DiskMapping;
 using Tessa::MakeRef;
 using Tessa::Ref;
 
@@ -41,51 +43,63 @@ class DiskIndex {
     }
   }
 
-  Ref<ScsiDisk> Resolve(const DiskArgument& disk) const {
-    const auto* const name = std::get_if<std::string>(&disk);
-    return name != nullptr ? Find(*name) : std::get<Ref<ScsiDisk>>(disk);
+  // The disk to hand on: the inventory's for one that is given by name.
+  Ref<ScsiDisk> Resolve(ScsiDisk* disk) const {
+    if (dynamic_cast<const NamedDisk*>(disk) == nullptr) {
+      return Ref<ScsiDisk>(disk);
+    }
+    const auto found = _disks.find(disk->GetCanonicalName());
+    return Ref<ScsiDisk>(found != _disks.end() ? found->second : disk);
   }
 
  private:
-  Ref<ScsiDisk> Find(const std::string& name) const {
-    if (const auto found = _disks.find(name); found != _disks.end()) {
-      return Ref<ScsiDisk>(found->second);
-    }
-    const auto unknown = MakeRef<ScsiDisk>();
-    unknown->SetCanonicalName(name);
-    return unknown;
-  }
-
   Ref<Nox::Host::StorageDeviceInfo> _info;  // owns the disks
   std::unordered_map<std::string, ScsiDisk*> _disks;
 };
 
-std::string MappingText(const MappingArgument& argument, const DiskIndex& index) {
-  const auto mapping = MakeRef<Nox::Kova::Host::DiskMapping>();
-  mapping->SetSsd(index.Resolve(argument.ssd));
-  const auto disks = MakeRef<Orbis::DataArray<ScsiDisk>>();
-  for (const DiskArgument& disk : argument.nonSsd) {
-    disks->Append(index.Resolve(disk));
+Ref<Orbis::DataArray<ScsiDisk>> Resolve(const Orbis::DataArray<ScsiDisk>& disks, const DiskIndex& index) {
+  const auto resolved = MakeRef<Orbis::DataArray<ScsiDisk>>();
+  for (ScsiDisk* disk : disks) {
+    resolved->Append(index.Resolve(disk));
   }
-  mapping->SetNonSsd(disks);
+  return resolved;
+}
+
+std::string MappingText(const DiskMapping& given, const DiskIndex& index) {
+  const auto mapping = MakeRef<DiskMapping>();
+  mapping->SetSsd(index.Resolve(given.GetSsd().Get()));
+  if (given.GetNonSsd()) {
+    mapping->SetNonSsd(Resolve(*given.GetNonSsd(), index));
+  }
   return ToSoap(*mapping);
+}
+
+void AddTextsOf(const Orbis::Any* value, const DiskIndex& index, std::vector<std::string>& texts) {
+  if (const auto* const mapping = dynamic_cast<const DiskMapping*>(value)) {
+    texts.push_back(MappingText(*mapping, index));
+  } else if (const auto* const mappings = dynamic_cast<const Orbis::DataArray<DiskMapping>*>(value)) {
+    for (const DiskMapping* one : *mappings) {
+      texts.push_back(MappingText(*one, index));
+    }
+  } else if (const auto* const disks = dynamic_cast<const Orbis::DataArray<ScsiDisk>*>(value)) {
+    for (ScsiDisk* disk : *disks) {
+      texts.push_back(ToSoap(*index.Resolve(disk)));
+    }
+  }
 }
 
 }  // namespace
 
-std::vector<std::string> HookTexts(const ReplayRequest& request) {
-  std::vector<std::string> texts = request.texts;
-  if (request.disks.empty() && request.mappings.empty()) {
-    return texts;
+void AddTexts(ReplayRequest& request) {
+  if (!request.parameters) {
+    return;
   }
   const DiskIndex index;
-  for (const DiskArgument& disk : request.disks) {
-    texts.push_back(ToSoap(*index.Resolve(disk)));
+  for (const Orbis::FieldDescriptor* field : request.parameters->GetType().fields) {
+    if (field->kind == Orbis::FieldKind::Object && field->get(*request.parameters) != nullptr) {
+      AddTextsOf(field->get(*request.parameters), index, request.arguments.texts);
+    }
   }
-  for (const MappingArgument& mapping : request.mappings) {
-    texts.push_back(MappingText(mapping, index));
-  }
-  return texts;
 }
 
 }  // namespace Kovactl

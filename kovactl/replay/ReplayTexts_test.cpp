@@ -32,7 +32,11 @@ class ReplayTexts : public testing::Test {
   }
   ~ReplayTexts() override { Tessa::Service::SetApp(_before); }
 
-  static std::vector<std::string> TextsOf(const char* line) { return HookTexts(ParseReplayRequest(line)); }
+  static std::vector<std::string> TextsOf(const char* line) {
+    ReplayRequest request = ParseReplayRequest(line);
+    AddTexts(request);
+    return request.arguments.texts;
+  }
 
   template <class T>
   static Ref<T> Read(const std::string& text) {
@@ -105,6 +109,7 @@ TEST_F(ReplayTexts, OfARawRequestAreUntouched) {
 TEST_F(ReplayTexts, OfARequestWithoutDisksAreNone) {
   EXPECT_THAT(TextsOf(R"({"operation": "QueryDisksForKova", "names": ["naa.1"]})"), ElementsAre());
   EXPECT_THAT(TextsOf(R"({"operation": "AddDisks"})"), ElementsAre());
+  EXPECT_THAT(TextsOf(R"({"operation": "RemoveDiskMapping"})"), ElementsAre());
 }
 
 }  // namespace

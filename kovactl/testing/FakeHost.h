@@ -6,48 +6,24 @@
 
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
-#include "nox/Kova.h"
+#include "host/testing/RequestInALine.h"
+#include "nox/Operations.h"
 
 namespace Kovactl::Testing {
 
 class FakeHost final : public Host::ManagementApi {
  public:
-  Host::Answer QueryDisksForKova(const std::vector<std::string>& names) const override {
-    asked = names;
-    return answer;
-  }
-  Host::Answer GetStorageInfo() const override { return answer; }
-  // The last of the prepared states stays; the others are given once.
-  Host::Answer GetDiskGroups() const override {
-    if (groups.empty()) {
+  Host::Answer Query(const Nox::Operation::Query& request) const override {
+    if (const auto* const disks = dynamic_cast<const Nox::Operation::QueryDisksForKova*>(&request)) {
+      asked = disks->GetNames() ? disks->GetNames()->Items() : std::vector<std::string>();
       return answer;
     }
-    const Host::Answer now = groups.front();
-    if (groups.size() > 1) {
-      groups.erase(groups.begin());
-    }
-    return now;
+    const bool isGroups = dynamic_cast<const Nox::Operation::GetDiskGroups*>(&request) != nullptr;
+    return isGroups ? NextGroups() : answer;
   }
-  Host::Answer GetConfigInfo() const override { return answer; }
-
-  Host::Answer AddDisks(const Host::DiskList& disks) const override {
-    return Changed("AddDisks" + NamesOf(disks));
+  Host::Answer Change(const Nox::Operation::Change& request) const override {
+    return Changed(Host::Testing::InALine(request));
   }
-  Host::Answer AddAllEligibleDisks() const override { return Changed("AddAllEligibleDisks"); }
-  Host::Answer InitializeDisks(const Host::MappingList& mappings) const override {
-    return Changed("InitializeDisks" + NamesOf(mappings));
-  }
-  Host::Answer UnmountDiskMapping(const Host::MappingList& mappings) const override {
-    return Changed("UnmountDiskMapping" + NamesOf(mappings));
-  }
-  Host::Answer RemoveDisk(const std::string& disk, const Host::RemovalArguments& arguments) const override {
-    return Changed("RemoveDisk " + disk + TextOf(arguments));
-  }
-  Host::Answer RemoveDiskMapping(const Nox::Kova::Host::DiskMapping& mapping,
-                                 const Host::RemovalArguments& arguments) const override {
-    return Changed("RemoveDiskMapping" + NamesOf(mapping) + TextOf(arguments));
-  }
-  Host::Answer ClaimUnmountedDiskgroup() const override { return Changed("ClaimUnmountedDiskgroup"); }
 
   std::string DescribeHost() const override {
     if (descriptions.empty()) {
@@ -75,26 +51,16 @@ class FakeHost final : public Host::ManagementApi {
     changes.push_back(what);
     return changeAnswer;
   }
-  static std::string NamesOf(const Host::DiskList& disks) {
-    std::string text;
-    for (const Nox::Host::ScsiDisk* disk : disks) {
-      text += " " + disk->GetCanonicalName();
+  // The last of the prepared states stays; the others are given once.
+  Host::Answer NextGroups() const {
+    if (groups.empty()) {
+      return answer;
     }
-    return text;
-  }
-  static std::string NamesOf(const Nox::Kova::Host::DiskMapping& mapping) {
-    return " [" + mapping.GetSsd()->GetCanonicalName() + ":" + NamesOf(*mapping.GetNonSsd()) + "]";
-  }
-  static std::string NamesOf(const Host::MappingList& mappings) {
-    std::string text;
-    for (const Nox::Kova::Host::DiskMapping* mapping : mappings) {
-      text += NamesOf(*mapping);
+    const Host::Answer now = groups.front();
+    if (groups.size() > 1) {
+      groups.erase(groups.begin());
     }
-    return text;
-  }
-  static std::string TextOf(const Host::RemovalArguments& arguments) {
-    return " '" + arguments.passThrough + "' '" + arguments.optionText + "' " +
-           std::to_string(arguments.optionFirst) + " " + std::to_string(arguments.optionSecond);
+    return now;
   }
 };
 

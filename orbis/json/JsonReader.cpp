@@ -50,7 +50,7 @@ void Demand(Kind kind, const char* wanted, const Value& value, const Place& plac
 
 class JsonReader {
  public:
-  explicit JsonReader(Missing missing) : _missing(missing) {}
+  explicit JsonReader(const JsonRules& rules) : _rules(rules) {}
 
   // A value whose declared type is null (any) or a data object's or list's.
   Ref<Any> Read(const Value& value, const TypeDescriptor* declared, const Place& place) const {
@@ -59,7 +59,11 @@ class JsonReader {
     if (list) {
       return ReadList(value, *declared, place);
     }
-    Demand(Kind::Object, "an object", value, place);
+    const bool named = _rules.named != nullptr && declared != nullptr && declared->key != nullptr;
+    if (named && value.kind == Kind::String) {
+      return _rules.named(*declared, value.text);
+    }
+    Demand(Kind::Object, named ? "an object or its name" : "an object", value, place);
     const TypeDescriptor& type = TypeOf(value, declared, place);
     return type.kind == TypeKind::DataObject ? ReadObject(value, type, place)
                                              : ReadWrapped(value, type, place);
@@ -103,7 +107,7 @@ class JsonReader {
       if (member != nullptr) {
         ReadField(*member, *field, object, Place{&place, field->name});
         ++used;
-      } else if (field->presence == Presence::Required && _missing == Missing::Refused) {
+      } else if (field->presence == Presence::Required && IsNeeded(*field)) {
         Refuse(value, place, "required field '" + std::string(field->name) + "' is missing");
       }
     }
@@ -111,6 +115,11 @@ class JsonReader {
       RefuseUnknown(value, type, place);
     }
     return made;
+  }
+
+  bool IsNeeded(const FieldDescriptor& required) const {
+    return _rules.missing == Missing::Refused ||
+           (_rules.missing == Missing::InRequest && required.kind == FieldKind::Object && !required.output);
   }
 
   [[noreturn]] static void RefuseUnknown(const Value& value, const TypeDescriptor& type, const Place& place) {
@@ -210,19 +219,25 @@ class JsonReader {
     }
   }
 
-  Missing _missing;
+  const JsonRules& _rules;
 };
 
 }  // namespace
 
+Ref<DataObject> ObjectOfKey(const TypeDescriptor& type, const std::string& key) {
+  const Ref<DataObject> object(static_cast<DataObject*>(type.create().Get()));
+  *static_cast<std::string*>(type.key->write(*object)) = key;
+  return object;
+}
+
 Ref<Any> ReadJson(std::string_view text, const Limits& limits, const TypeDescriptor* declared,
-                  Missing missing) {
-  return ReadJson(Json::Parse(text, limits), declared, {}, missing);
+                  const JsonRules& rules) {
+  return ReadJson(Json::Parse(text, limits), declared, {}, rules);
 }
 
 Ref<Any> ReadJson(const Json::Value& value, const TypeDescriptor* declared, std::string_view path,
-                  Missing missing) {
-  return JsonReader(missing).Read(value, declared, Place{nullptr, path});
+                  const JsonRules& rules) {
+  return JsonReader(rules).Read(value, declared, Place{nullptr, path});
 }
 
 }  // namespace Orbis

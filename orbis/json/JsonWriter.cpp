@@ -1,4 +1,5 @@
 #include <string>
+#include <utility>
 
 #include "orbis/Json.h"
 #include "orbis/Scalar.h"
@@ -12,6 +13,15 @@ namespace {
 class JsonWriter {
  public:
   explicit JsonWriter(std::string& out) : _out(out) {}
+
+  void WriteFields(const DataObject& object) {
+    _out += '{';
+    _isFirst = true;
+    for (const FieldDescriptor* field : object.GetType().fields) {
+      WriteField(*field, object);
+    }
+    _out += '}';
+  }
 
   // `any`: the value stands where any may stand, so a list must say its type.
   void Write(const Any& value, bool any) {
@@ -51,7 +61,9 @@ class JsonWriter {
     _out += '}';
   }
 
-  void WriteKey(std::string_view name) { _out.append(",\"").append(name).append("\":"); }
+  void WriteKey(std::string_view name) {
+    _out.append(std::exchange(_isFirst, false) ? "\"" : ",\"").append(name).append("\":");
+  }
 
   void WriteField(const FieldDescriptor& field, const DataObject& object) {
     if (IsScalar(field.kind)) {
@@ -122,18 +134,29 @@ class JsonWriter {
   }
 
   std::string& _out;
+  bool _isFirst = false;  // of an object that does not say its type
 };
 
-}  // namespace
-
-void WriteJson(const Any& value, std::string& out) {
+// What has been appended is taken back when it throws.
+template <class Write>
+void AppendOrLeave(std::string& out, Write write) {
   const std::size_t before = out.size();
   try {
-    JsonWriter(out).Write(value, false);
+    write();
   } catch (...) {
     out.resize(before);
     throw;
   }
+}
+
+}  // namespace
+
+void WriteJson(const Any& value, std::string& out) {
+  AppendOrLeave(out, [&] { JsonWriter(out).Write(value, false); });
+}
+
+void WriteJsonFields(const DataObject& object, std::string& out) {
+  AppendOrLeave(out, [&] { JsonWriter(out).WriteFields(object); });
 }
 
 }  // namespace Orbis

@@ -252,7 +252,7 @@ TEST(DeclaredJson, MustBeOfTheDeclaredType) {
 
 TEST(MissingFields, TakeTheValuesOfANewObjectWhenThatIsWanted) {
   const Ref<Any> read = Orbis::ReadJson("{\"canonicalName\": \"naa.1\"}", untrusted,
-                                        &Nox::Host::ScsiDisk::StaticType(), Missing::Default);
+                                        &Nox::Host::ScsiDisk::StaticType(), {.missing = Missing::Default});
   const auto& disk = static_cast<const Nox::Host::ScsiDisk&>(*read);
   EXPECT_EQ(disk.GetCanonicalName(), "naa.1");
   EXPECT_EQ(disk.GetUuid(), "");
@@ -263,7 +263,7 @@ TEST(MissingFields, TakeTheValuesOfANewObjectWhenThatIsWanted) {
 TEST(MissingFields, AreTheOnlyThingThatIsForgiven) {
   ExpectRefused(
       {"unknown key", "{\"colour\": \"red\"}", "colour", 1, "unknown field"}, [](const std::string& text) {
-        return Orbis::ReadJson(text, untrusted, &Nox::Host::ScsiDisk::StaticType(), Missing::Default);
+        return Orbis::ReadJson(text, untrusted, &Nox::Host::ScsiDisk::StaticType(), {.missing = Missing::Default});
       });
 }
 

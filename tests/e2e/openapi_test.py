@@ -65,6 +65,8 @@ class Described(ProgramTest):
         self.assertEqual(made["fault"]["@type"], "DiskHasPartitions")
         self.ask("GET", "/api/v1/tasks", "200")
         self.ask("GET", f"/api/v1/tasks/{made['task']}", "200", described="/api/v1/tasks/{id}")
+        self.ask("POST", "/api/v1/GetTasks", "200", {})
+        self.ask("POST", "/api/v1/GetTask", "200", {"id": made["task"]})
         self.ask("GET", "/api/v1/tasks/nobody", "404", described="/api/v1/tasks/{id}")
         self.ask("GET", "/api/v1/disks?names=%00", "400")
         self.ask("GET", "/api/v1/groups", "200")

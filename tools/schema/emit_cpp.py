@@ -58,11 +58,12 @@ def declare_field(schema, f):
             f"  void Set{name}(::Tessa::Ref<{target}> value);",
         ]
     cpp, taken, _, _ = SCALARS[f.type]
+    override = " override" if f.common else ""
     if f.optional:
         return doc + [
-            f"  {taken} Get{name}() const;",
-            f"  bool Has{name}() const noexcept {{ return _{f.name}.has_value(); }}",
-            f"  void Set{name}(std::optional<{cpp}> value);",
+            f"  {taken} Get{name}() const{override};",
+            f"  bool Has{name}() const noexcept{override} {{ return _{f.name}.has_value(); }}",
+            f"  void Set{name}(std::optional<{cpp}> value){override};",
         ]
     return doc + [
         f"  {taken} Get{name}() const noexcept {{ return _{f.name}; }}",
@@ -81,6 +82,8 @@ def member(schema, f):
 
 def construct_parameter(schema, type_):
     f = next(f for f in schema.all_fields(type_) if f.name == type_.construct)
+    if not is_scalar(f):
+        return f, f"::Tessa::Ref<{referred(schema, f)}>"
     cpp = SCALARS[f.type][0]
     return f, f"std::optional<{cpp}>" if f.optional else cpp
 
@@ -115,7 +118,7 @@ def declare_class(schema, type_):
         name = f"{schema.outer(outer).cpp_name}::{name}"
     short = type_.cpp_name
     lines = [f"// {type_.doc}"] if type_.doc else []
-    lines += [f"class TESSA_API {name} : public {base_cpp(schema, type_)} {{", " public:"]
+    lines += [f"class TESSA_API {name} : public {type_.cpp_base or base_cpp(schema, type_)} {{", " public:"]
     nested = [other for other in schema.types.values() if schema.outer(other) is type_]
     lines += [f"  class {other.cpp_name};" for other in nested]
     lines += [f'  static constexpr const char* {key} = "{value}";' for key, value in type_.constants]
@@ -190,7 +193,7 @@ def forward_declarations(schema, types):
 
 def descriptor_field(schema, type_, f):
     described = plain_descriptor_field(schema, type_, f)
-    return f"Output({described})" if f.output else described
+    return f"Output({described})" if f.output else f"Key({described})" if f.key else described
 
 
 def plain_descriptor_field(schema, type_, f):
@@ -292,6 +295,8 @@ def messages(schema, origin):
     for o in schema.operations:
         request = Type(o.name, f"Nox::Operation::{o.name}", "DataObject", False, False, "Operations", origin, o.doc)
         request.fields = o.parameters
+        request.construct = next((f.name for f in o.parameters if not f.common), "")
+        request.cpp_base = "Change" if o.changes else "Query"
         answer = Type(f"{o.name}Response", f"{request.cpp}Response", "DataObject", False, False, "Operations", origin)
         if o.returns:
             answer.fields.append(Field("result", o.returns, not o.returns_list, o.returns_list))
@@ -300,6 +305,22 @@ def messages(schema, origin):
             answer.fields.append(Field("task", "string", True, False))
         types += [request, answer]
     return types
+
+
+def operation_table(schema):
+    """What Nox::Operations() tells."""
+    rows = []
+    for o in schema.operations:
+        result = "nullptr"
+        if o.returns:
+            result = f"&::{schema.types[o.returns].cpp}::StaticType()"
+            result = f"({result})->array" if o.returns_list else result
+        changes = "true" if o.changes else "false"
+        rows += [f'      {{"{o.name}", {changes}, Operation::{o.name}::StaticType(),',
+                 f"       Operation::{o.name}Response::StaticType(), {result}}},"]
+    return ["", "namespace Nox {", "", "std::span<const OperationDescriptor> Operations() {",
+            "  static const auto& operations = *new std::vector<OperationDescriptor>{", *rows, "  };",
+            "  return operations;", "}", "", "}  // namespace Nox"]
 
 
 def documents_header(origin):
@@ -381,8 +402,10 @@ def emit(schema, origin, module, out_dir):
     if wrappers := messages(schema, origin):
         for type_ in wrappers:
             type_.origin_name = f"{module}/schema/{os.path.basename(origin)}"
+        needs = needs + [f"{module}/OperationTable.h"]
         write(f"{out_dir}/{module}/Operations.h", header(schema, module, "Operations", wrappers, needs))
-        write(f"{out_dir}/{module}/Operations.cpp", source(schema, module, "Operations", wrappers, registered=False))
+        lines = source(schema, module, "Operations", wrappers, registered=False)
+        write(f"{out_dir}/{module}/Operations.cpp", lines + operation_table(schema))
         write(f"{out_dir}/{module}/Documents.h", documents_header(wrappers[0].origin_name))
         write(f"{out_dir}/{module}/Documents.cpp", documents_source(schema, wrappers[0].origin_name))
     if module != "orbis":

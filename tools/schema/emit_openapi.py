@@ -3,7 +3,7 @@
 import json
 import re
 
-from openapi_examples import EXAMPLES, FAULTS, WAITING
+from openapi_examples import FAULTS, WAITING, example_of
 
 SIMPLE = {
     "boolean": {"type": "boolean"},
@@ -37,27 +37,7 @@ TAGS = {
     "agent": "The agent itself.",
 }
 NOT_KNOWN = {"lunType": [""]}  # of a disk that has left
-# Read by nobody's program name, written by every request that changes disks.
-TASK = {
-    "type": "object",
-    "description": "A request that changes disks, from the moment the agent takes it on.",
-    "properties": {
-        "id": {"type": "string"},
-        "label": {"type": "string", "description": "The client's own."},
-        "operation": {"type": "string"},
-        "state": {"type": "string", "enum": ["waiting", "running", "done", "partly", "failed"]},
-        "created": SIMPLE["dateTime"],
-        "started": SIMPLE["dateTime"],
-        "ended": SIMPLE["dateTime"],
-        "percent": {"type": "integer"},
-        "step": {"type": "string"},
-        "result": {"description": "Of one that has ended, and asked for by its id."},
-        "resultForgotten": {"type": "boolean", "description": "Of one whose result was too large to be kept."},
-        "fault": {"anyOf": [{"$ref": "#/components/schemas/AnyMethodFault"}, {"type": "null"}]},
-    },
-    "required": ["id", "label", "operation", "state", "created", "percent", "step"],
-    "additionalProperties": False,
-}
+TASK = "Task"
 
 
 def ref(name):
@@ -130,6 +110,16 @@ def disks(schema):
     }
 
 
+def task_of(schema):
+    """A task, as an object or, by GET, without its type; there, what one that has ended came to may be null."""
+    task = object_of(schema, schema.types[TASK], [f.name for f in schema.types[TASK].fields if not f.optional and not f.list])
+    for name in ("result", "fault"):
+        value = dict(task["properties"][name])
+        doc = value.pop("description")
+        task["properties"][name] = {"description": doc, "anyOf": [value, {"type": "null"}]}
+    return task
+
+
 def arguments():
     """Disks and groups as requests name them."""
     return {
@@ -152,14 +142,12 @@ def argument_of(f):
 
 
 def body_of(operation):
-    properties = {f.name: described(f.doc, argument_of(f)) for f in operation.parameters if f.name != "label"}
+    properties = {f.name: described(f.doc, argument_of(f)) for f in operation.parameters}
     # A list that changes something is never left out; one that only asks may be.
-    required = [f.name for f in operation.parameters
-                if f.name in properties and not f.optional and (not f.list or operation.changes)]
+    required = [f.name for f in operation.parameters if not f.optional and (not f.list or operation.changes)]
     if operation.changes:
-        properties["label"] = {"type": "string", "maxLength": 256, "description": "The client's own, kept with the task."}
-        properties["wait"] = {"type": "boolean", "default": True,
-                              "description": "false: the answer is the task as it was taken on, with 202."}
+        properties["label"] |= {"maxLength": 256}
+        properties["wait"] |= {"default": True}
     schema = {"type": "object", "properties": properties, "additionalProperties": False}
     return {**schema, "required": required} if required else schema
 
@@ -216,7 +204,7 @@ def refusals():
 
 def operation(operation_id, tag, summary, answer, refused, **more):
     """One operation. `answer` is its schema, none: a text; `refused` the statuses of its refusals."""
-    body, example = EXAMPLES[operation_id]
+    body, example = example_of(operation_id)
     if "requestBody" in more:
         more["requestBody"] = {"required": True, "content": content(more["requestBody"], body)}
     done = "A result, perhaps beside a fault where a part failed; or neither: done."
@@ -231,7 +219,7 @@ def operation(operation_id, tag, summary, answer, refused, **more):
 
 def change(operation_id, tag, summary, answer, body):
     found = operation(operation_id, tag, summary, answer, ASKED + ["415"], requestBody=body)
-    taken_on = {"description": "Taken on; asked for without waiting.", "content": content(ref("Task"), WAITING)}
+    taken_on = {"description": "Taken on; asked for without waiting.", "content": content(ref(TASK), WAITING)}
     found["responses"] = {"200": found["responses"].pop("200"), "202": taken_on, **found["responses"]}
     return found
 
@@ -249,20 +237,17 @@ def reports(schema):
         "/api/v1/config": {"get": operation(
             "readConfig", "reports", "The host's cluster, network and fault domain",
             answer_of(schema, "KovaHostConfigInfo", False, False), ASKED)},
-        "/api/v1/GetDiskGroups": {"post": operation(
-            "GetDiskGroups", "operations", GROUPS, answer_of(schema, STORAGE, False, False), ASKED + ["415"],
-            requestBody={"type": "object", "additionalProperties": False})},
     }
 
 
 def tasks():
-    every = {"type": "object", "properties": {"tasks": {"type": "array", "items": ref("Task")}}, "required": ["tasks"]}
+    every = {"type": "object", "properties": {"tasks": {"type": "array", "items": ref(TASK)}}, "required": ["tasks"]}
     task_id = {"name": "id", "in": "path", "required": True, "description": "As the answer to the change told it.",
                "schema": {"type": "string"}}
     return {
         "/api/v1/tasks": {"get": operation("listTasks", "tasks", "What became of the requests that change disks",
                                            every, READ)},
-        "/api/v1/tasks/{id}": {"get": operation("readTask", "tasks", "One of them, with its result", ref("Task"),
+        "/api/v1/tasks/{id}": {"get": operation("readTask", "tasks", "One of them, with its result", ref(TASK),
                                                 READ + ["404"], parameters=[task_id])},
     }
 
@@ -305,7 +290,7 @@ def types_of(schema):
         if schema.derived(type_):
             found["Any" + type_.name] = {"description": type_.doc, "oneOf": [ref(name) for name in kinds(schema, type_)],
                                          "discriminator": {"propertyName": "@type"}}
-    return {**found, **disks(schema), **arguments(), "Task": TASK, "Refusal": REFUSAL}
+    return {**found, **disks(schema), **arguments(), TASK: task_of(schema), "Refusal": REFUSAL}
 
 
 def used(types, *roots):

@@ -35,6 +35,16 @@ def type_section(schema, type_):
     return lines
 
 
+def operation_table(schema):
+    """The operations in rows, as docs/agent.md shows them."""
+    lines = ["| Operation | What it does | Parameters |", "| --- | --- | --- |"]
+    for operation in schema.operations:
+        parameters = [f"`{f.name}`" for f in operation.parameters if not f.common]
+        route = f"`POST /api/v1/{operation.name}`"
+        lines += [f"| {route} | {operation.doc} | {', '.join(parameters)} |"]
+    return lines
+
+
 def operation_section(schema, operation):
     kind = "Changes the host." if operation.changes else "Changes nothing."
     lines = [f"### {operation.name}", "", f"{operation.doc} {kind}", ""]

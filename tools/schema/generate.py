@@ -6,6 +6,7 @@
     generate.py wsdl OUT_FILE SCHEMA...          the service: messages, port type, binding
     generate.py openapi OUT_FILE SCHEMA...       the JSON API, OpenAPI 3.1
     generate.py page OUT_FILE SCHEMA...          reference page, Markdown
+    generate.py table OUT_FILE SCHEMA...         the operations in rows, for docs/agent.md
 
 Later schemas build on earlier ones.
 """
@@ -21,7 +22,7 @@ import schema as schema_language
 
 def main(arguments):
     kinds = {"xsd": emit_xsd.xsd, "wsdl": emit_xsd.wsdl, "openapi": emit_openapi.openapi,
-             "page": emit_page.page}
+             "page": emit_page.page, "table": emit_page.operation_table}
     if len(arguments) >= 4 and arguments[0] == "cpp":
         module, out_dir, paths = arguments[1], arguments[2], arguments[3:]
         emit_cpp.emit(schema_language.read(paths), paths[-1], module, out_dir)

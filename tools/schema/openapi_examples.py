@@ -35,8 +35,9 @@ MADE = answer([{"@type": "KovaHostDiskMapResult", "mapping": MAPPING,
                 "diskResult": [result(CACHE_DISK, "inUse"), result(CAPACITY_DISK, "inUse")]}], task=TASK_ID)
 UNMOUNTED = answer([{"@type": "KovaHostDiskMapResult", "mapping": MAPPING}], task=TASK_ID)
 SILENT = answer(task=TASK_ID)
-TASK = {"id": TASK_ID, "label": "rack 3", "operation": "AddDisks", "state": "done", "created": "2024-03-01T10:00:00Z",
-        "started": "2024-03-01T10:00:00Z", "ended": "2024-03-01T10:00:04Z", "percent": 100, "step": "", "fault": None}
+TASK_FIELDS = {"id": TASK_ID, "label": "rack 3", "operation": "AddDisks", "state": "done", "created": "2024-03-01T10:00:00Z",
+        "started": "2024-03-01T10:00:00Z", "ended": "2024-03-01T10:00:04Z", "percent": 100, "step": ""}
+TASK = {**TASK_FIELDS, "fault": None}
 
 # operationId: (body or None, answer)
 EXAMPLES = {
@@ -49,6 +50,8 @@ EXAMPLES = {
     "InitializeDisks": ({"mappings": [BY_NAME]}, MADE),
     "UnmountDiskMapping": ({"mappings": [BY_NAME]}, UNMOUNTED),
     "ClaimUnmountedDiskgroup": ({}, SILENT),
+    "GetTasks": ({}, answer([{"@type": "Task", **TASK_FIELDS}])),
+    "GetTask": ({"id": TASK_ID}, answer({"@type": "Task", **TASK_FIELDS, "result": MADE["result"]})),
     "RemoveDisk": ({"disk": CAPACITY}, SILENT),
     "RemoveDiskMapping": ({"mapping": BY_NAME}, SILENT),
     "listDisks": (None, DISKS),
@@ -61,6 +64,13 @@ EXAMPLES = {
     "readHealth": (None, "ok\n"),
     "readMetrics": (None, "kova_agent_queries_waiting 0\n"),
 }
+
+
+
+def example_of(operation_id):
+    """(body or None, answer). An operation that has none of its own: nothing is asked, nothing said."""
+    return EXAMPLES.get(operation_id, ({}, answer()))
+
 
 WAITING = {**{key: TASK[key] for key in ("id", "label", "operation", "created")}, "state": "waiting", "percent": 0,
            "step": ""}

@@ -18,7 +18,9 @@ class Field:
     list: bool
     lazy: bool = False
     output: bool = False
+    key: bool = False
     doc: str = ""
+    common: bool = False  # every change has it
 
     @property
     def is_object(self):
@@ -38,6 +40,7 @@ class Type:
     fields: list = field(default_factory=list)
     constants: list = field(default_factory=list)
     construct: str = ""
+    cpp_base: str = ""  # where the class has another base than the type
 
     @property
     def cpp_path(self):
@@ -62,6 +65,7 @@ class Operation:
 class Schema:
     types: dict
     operations: list
+    common: list = field(default_factory=list)  # parameters of every change
 
     def all_fields(self, type_):
         """Fields in wire order: those of the bases first."""
@@ -76,6 +80,10 @@ class Schema:
     def derived(self, type_):
         return [other for other in self.types.values() if other.base == type_.name]
 
+    def key(self, type_):
+        """The field that identifies objects of the type, or None."""
+        return next((f for f in self.all_fields(type_) if f.key), None)
+
     def outer(self, type_):
         """The type whose C++ class the given one is nested in, or None."""
         path = "::".join(type_.cpp_path[:-1])
@@ -83,9 +91,10 @@ class Schema:
 
 
 TYPE = re.compile(r"(abstract )?(type|fault) (\w+) = ([\w:]+) : (\w+) \{$")
-FIELD = re.compile(r"(\w+)(\?|\[\])?: (\w+)( lazy| output)?$")
+FIELD = re.compile(r"(\w+)(\?|\[\])?: (\w+)( lazy| output| key)?$")
 CONSTANT = re.compile(r'const (\w+) = "([^"]*)"$')
 CONSTRUCT = re.compile(r"construct\((\w+)\)$")
+EVERY_CHANGE = "every change {"
 OPERATION = re.compile(r"(query|change) (\w+)(?: returns (\w+)(\[\])?)? \{$")
 
 
@@ -98,7 +107,9 @@ def _field(text, where):
         raise SchemaError(f"{where}: only a list of data objects can be lazy: {text}")
     if word == " output" and mark:
         raise SchemaError(f"{where}: only a field that is always there can be output: {text}")
-    return Field(name, type_, mark == "?", mark == "[]", word == " lazy", word == " output")
+    if word == " key" and (mark != "?" or type_ != "string"):
+        raise SchemaError(f"{where}: only an optional text can be a key: {text}")
+    return Field(name, type_, mark == "?", mark == "[]", word == " lazy", word == " output", word == " key")
 
 
 def _read(path, schema):
@@ -132,6 +143,8 @@ def _read(path, schema):
                 raise SchemaError(f"{where}: {current.name} is not closed before {name}")
             current = Operation(name, kind == "change", returns or "", bool(many), " ".join(doc))
             schema.operations.append(current)
+        elif text == EVERY_CHANGE and not current:
+            current = Operation("every change", True, "", False, parameters=schema.common)
         elif isinstance(current, Type) and (match := CONSTANT.match(text)):
             current.constants.append(match.groups())
         elif isinstance(current, Type) and (match := CONSTRUCT.match(text)):
@@ -207,7 +220,10 @@ def _check(schema):
 def _check_operation(schema, operation):
     if not operation.doc:
         raise SchemaError(f"{operation.name}: an operation says what it is for")
+    names = [f.name for f in operation.parameters]
     for f in operation.parameters:
+        if names.count(f.name) > 1:
+            raise SchemaError(f"{operation.name}: parameter {f.name} is defined twice")
         if f.is_object and f.type not in schema.types:
             raise SchemaError(f"{operation.name}({f.name}): unknown type {f.type}")
         if not f.doc:
@@ -224,5 +240,9 @@ def read(paths):
             _read(path, schema)
         except (OSError, UnicodeDecodeError) as error:
             raise SchemaError(f"{path}: cannot be read: {error}") from error
+    for f in schema.common:
+        f.common = True
+    for operation in schema.operations:
+        operation.parameters += schema.common if operation.changes else []
     _check(schema)
     return schema

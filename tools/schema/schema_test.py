@@ -178,6 +178,24 @@ class Language(InFolder):
                          [("lamps", False, True, "Which."), ("label", True, False, "In words of your own.")])
         self.assertEqual((query.name, query.changes, query.returns, query.parameters), ("LampsThatAreOn", False, "", []))
 
+    def test_every_change_takes_what_is_said_of_every_change_behind_its_own_parameters(self):
+        schema = self.read(types(LAMP, "every change {", "  ## In words.", "  label?: string", "}",
+                                 "## Turns lamps on.", "change TurnOn {", "  ## Which.", "  lamps[]: Lamp", "}",
+                                 "## Which are on.", "query LampsThatAreOn {", "}"))
+        change, query = schema.operations
+        self.assertEqual([(f.name, f.common) for f in change.parameters], [("lamps", False), ("label", True)])
+        self.assertEqual(query.parameters, [])
+        with self.assertRaisesRegex(schema_language.SchemaError, "TurnOn: parameter label is defined twice"):
+            self.read(types("every change {", "  ## In words.", "  label?: string", "}", "## Turns lamps on.",
+                            "change TurnOn {", "  ## Again.", "  label?: string", "}"))
+
+    def test_a_key_identifies_objects_of_a_type_and_of_what_derives_from_it(self):
+        schema = self.read(types("type Lamp = Test::Lamp : DataObject {", "  name?: string key", "}",
+                                 "type Torch = Test::Torch : Lamp {", "}"))
+        self.assertEqual(schema.key(schema.types["Torch"]).name, "name")
+        with self.assertRaisesRegex(schema_language.SchemaError, "only an optional text can be a key"):
+            self.read(types("type Lamp = Test::Lamp : DataObject {", "  watts?: int key", "}"))
+
     def test_fields_that_only_answers_must_have_say_so(self):
         schema = self.read(types("type Lamp = Test::Lamp : DataObject {", "  name: string", "  watts: int output", "}"))
         self.assertEqual([f.output for f in schema.types["Lamp"].fields], [False, True])
@@ -316,6 +334,17 @@ class Documents(unittest.TestCase):
         service = wsdl.find(WSDL + "service")
         self.assertEqual(service.find(WSDL + "port").find(SOAP + "address").get("location"), "https://a:1/soap")
         self.assertTrue(service.find(WSDL + "documentation").text.endswith(" Version 7."))
+
+    def test_the_page_about_the_agent_shows_every_operation(self):
+        table = "\n".join(emit_page.operation_table(self.schema))
+        page = (ROOT / "docs" / "agent.md").read_text(encoding="utf-8")
+        self.assertIn(table, page, "renew it: tools/schema/generate.py table OUT_FILE SCHEMA...")
+
+    def test_every_change_takes_the_common_parameters_behind_its_own(self):
+        for operation in self.schema.operations:
+            names = [f.name for f in operation.parameters]
+            common = [f.name for f in self.schema.common]
+            self.assertEqual(names[len(names) - len(common):] == common, operation.changes, operation.name)
 
     def test_every_operation_parameter_and_field_is_documented(self):
         for operation in self.schema.operations:

@@ -1,0 +1,26 @@
+// A host's management API as its agent offers it: with what the agent itself knows, its tasks.
+//
+// Threads: any. The host and the queue outlive it.
+#pragma once
+
+#include "host/ManagementApi.h"
+
+namespace Agentd {
+
+class TaskQueue;
+
+class TaskApi final : public Host::ManagementApi {
+ public:
+  TaskApi(const Host::ManagementApi& host, const TaskQueue& tasks) : _host(host), _tasks(tasks) {}
+
+  Host::Answer Query(const Nox::Operation::Query& request) const override;
+  Host::Answer Change(const Nox::Operation::Change& request) const override { return _host.Change(request); }
+  std::string DescribeHost() const override { return _host.DescribeHost(); }
+  Host::Answer ChangeHost(const std::string& change) const override { return _host.ChangeHost(change); }
+
+ private:
+  const Host::ManagementApi& _host;
+  const TaskQueue& _tasks;
+};
+
+}  // namespace Agentd

@@ -7,10 +7,10 @@
 #include <type_traits>
 #include <vector>
 
+#include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/KovaNetwork.h"
 #include "kova/agentd/include/KovaRecords.h"
 #include "kova/agentd/marshal/StatusTexts.h"
-#include "kova/agentd/query/DiskQuery.h"
 
 namespace HostCtl::Kova {
 namespace {

@@ -2,11 +2,11 @@
 
 #include <utility>
 
+#include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/include/KovaPlugin.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
-#include "kova/agentd/query/DiskQuery.h"
 #include "nox/Kova.h"
 #include "orbis/Soap.h"
 #include "orbis/Types.h"

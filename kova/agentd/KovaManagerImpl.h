@@ -163,8 +163,6 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
  private:
   // The kernel's groups, unmounted ones too; a failing kernel is a warning and none.
   std::vector<HostCtl::Kova::DiskMapping> KernelGroupsOrNone();
-  // The inventory's disks; without an inventory, a warning and null.
-  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> InventoryOrNone();
   // The candidates that the kernel calls eligible flash disks, as planning sees them.
   Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> QueryEligibleFlash(
       const Orbis::DataArray<Nox::Host::ScsiDisk>* candidates);

@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "kova/agentd/planning/DiskMappings.h"
+#include "kova/agentd/disks/DiskMappings.h"
 #include "tests/support/InitializeFixture.h"
 #include "tests/support/SpyManager.h"
 

@@ -7,7 +7,7 @@
 #include "host/LogSink.h"
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
-#include "kova/agentd/query/DiskQuery.h"
+#include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "nox/Kova.h"
 #include "orbis/Soap.h"

@@ -18,7 +18,7 @@ class IncludeRules(unittest.TestCase):
 
     def test_a_higher_room_may_know_a_lower_one(self):
         self.assertEqual(reasons("orbis/Any.h", '#include "tessa/Ref.h"'), [])
-        self.assertEqual(reasons("kova/agentd/query/DiskQuery.h", '#include "kova/agentd/include/KovaRecords.h"'), [])
+        self.assertEqual(reasons("kova/agentd/disks/DiskQuery.h", '#include "kova/agentd/include/KovaRecords.h"'), [])
 
     def test_the_plug_in_knows_the_kernel_library_by_its_shared_headers_only(self):
         self.assertEqual(len(reasons("kova/agentd/KovaManagerImpl.cpp", '#include "otxctl/TaskScope.h"')), 1)
@@ -28,6 +28,12 @@ class IncludeRules(unittest.TestCase):
 
     def test_the_pure_planning_rules_know_nothing(self):
         self.assertEqual(len(reasons("kova/agentd/planning/pure/Plan.h", '#include "tessa/Ref.h"')), 1)
+
+    def test_the_plug_ins_folders_stand_in_a_row(self):
+        self.assertEqual(len(reasons("kova/agentd/marshal/A.h", '#include "kova/agentd/query/B.h"')), 1)
+        self.assertEqual(len(reasons("kova/agentd/query/A.h", '#include "kova/agentd/planning/B.h"')), 1)
+        self.assertEqual(len(reasons("kova/agentd/disks/A.h", '#include "kova/agentd/KovaManagerImpl.h"')), 1)
+        self.assertEqual(reasons("kova/agentd/planning/A.h", '#include "kova/agentd/disks/B.h"'), [])
 
     def test_libraries_stay_in_their_rooms(self):
         self.assertEqual(len(reasons("orbis/soap/SoapReader.cpp", "#include <expat.h>")), 1)

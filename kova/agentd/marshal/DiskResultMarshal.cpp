@@ -2,11 +2,10 @@
 
 #include <array>
 
-#include "kova/agentd/marshal/AbsentDisk.h"
-#include "kova/agentd/marshal/DiskInventory.h"
-#include "kova/agentd/marshal/ExceptionMarshal.h"
-#include "kova/agentd/query/DiskQuery.h"
-#include "kova/agentd/query/NameList.h"
+#include "kova/agentd/disks/AbsentDisk.h"
+#include "kova/agentd/disks/DiskInventory.h"
+#include "kova/agentd/disks/DiskQuery.h"
+#include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
@@ -132,7 +131,7 @@ void MarshalHostCtlDiskResults(Logger& logger, const std::vector<HostCtl::Kova::
   try {
     Util::KovaUtil::GetDisksFromAgentd(disks);
   } catch (const Orbis::Fault::SystemError::Exception& exception) {
-    LogInternal(logger, LogLevel::Warning, "GetDisksFromAgentd %1", ReasonOf(exception));
+    LogInternal(logger, LogLevel::Warning, "GetDisksFromAgentd %1", Util::ReasonOf(exception));
     throw;
   }
   NameList names(NamesOfRecords(records));

@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "kova/agentd/marshal/DiskInventory.h"
+#include "kova/agentd/disks/DiskInventory.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"

@@ -83,8 +83,4 @@ void PrepareKovaDiskFault(const Ref<MethodFault>& fault, Ref<MethodFault>& combi
   }
 }
 
-const std::string& ReasonOf(const SystemError::Exception& exception) {
-  return static_cast<const SystemError&>(*exception.GetFault()).GetReason();
-}
-
 }  // namespace Kovasvc

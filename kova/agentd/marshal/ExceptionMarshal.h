@@ -3,8 +3,6 @@
 // Threads: any. Nothing is logged here.
 #pragma once
 
-#include <string>
-
 #include "orbis/Types.h"
 #include "tessa/Ref.h"
 
@@ -23,8 +21,5 @@ void MarshalHostCtlException(const HostCtl::Lib::HostCtlException& exception,
 // there is one KovaFault with the messages of all, in order. A null fault changes nothing.
 void PrepareKovaDiskFault(const Tessa::Ref<Orbis::MethodFault>& fault,
                           Tessa::Ref<Orbis::MethodFault>& combined);
-
-// The reason that the thrown fault carries.
-const std::string& ReasonOf(const Orbis::Fault::SystemError::Exception& exception);
 
 }  // namespace Kovasvc

@@ -208,9 +208,5 @@ TEST(FoldedFault, KeepsANullMessageInItsPlace) {
   EXPECT_EQ((*combined->GetFaultMessage())[1], nullptr);
 }
 
-TEST(Reason, IsReadFromAThrownSystemError) {
-  EXPECT_EQ(ReasonOf(SystemError::Exception(MakeRef<SystemError>("no such host"))), "no such host");
-}
-
 }  // namespace
 }  // namespace Kovasvc

@@ -4,10 +4,10 @@
 // leaves nothing to plan, and invalidates the disk cache also after a fault.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/DiskMappings.h"
+#include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/operations/OperationSteps.h"
-#include "kova/agentd/planning/DiskMappings.h"
-#include "kova/agentd/query/DiskQuery.h"
 #include "nox/Kova.h"
 
 namespace Kovasvc {

@@ -1,10 +1,10 @@
 // Plans disk groups from the disks of a request and makes them.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/DiskMappings.h"
+#include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/operations/OperationSteps.h"
-#include "kova/agentd/planning/DiskMappings.h"
-#include "kova/agentd/query/DiskQuery.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 

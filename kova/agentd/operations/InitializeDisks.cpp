@@ -3,11 +3,11 @@
 // No lock is held across a request, so another may run between two of its groups.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/AbsentDisk.h"
+#include "kova/agentd/disks/DiskMappings.h"
+#include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/KovaInfo.h"
-#include "kova/agentd/marshal/AbsentDisk.h"
 #include "kova/agentd/operations/OperationSteps.h"
-#include "kova/agentd/planning/DiskMappings.h"
-#include "kova/agentd/query/DiskQuery.h"
 #include "nox/Kova.h"
 #include "tessa/Formatter.h"
 

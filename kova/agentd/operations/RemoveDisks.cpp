@@ -1,10 +1,10 @@
 // Takes disks and whole disk groups out of the service.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/AbsentDisk.h"
+#include "kova/agentd/disks/DiskMappings.h"
 #include "kova/agentd/include/KovaInfo.h"
-#include "kova/agentd/marshal/AbsentDisk.h"
 #include "kova/agentd/operations/OperationSteps.h"
-#include "kova/agentd/planning/DiskMappings.h"
 #include "nox/Kova.h"
 #include "orbis/Any.h"
 

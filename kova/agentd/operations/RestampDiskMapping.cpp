@@ -1,9 +1,9 @@
 // Gives a disk group that is there but off-line new identity stamps, and mounts it.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/AbsentDisk.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
-#include "kova/agentd/marshal/AbsentDisk.h"
 
 namespace Kovasvc {
 

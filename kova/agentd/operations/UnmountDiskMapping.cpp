@@ -1,9 +1,9 @@
 // Takes disk groups out of use without erasing them, and brings them back.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/DiskMappings.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/operations/OperationSteps.h"
-#include "kova/agentd/planning/DiskMappings.h"
 #include "nox/Kova.h"
 #include "tessa/Formatter.h"
 

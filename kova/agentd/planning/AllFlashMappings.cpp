@@ -4,12 +4,12 @@
 // so the planner of hybrid groups deals them out like hard disks.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/DiskMappings.h"
+#include "kova/agentd/disks/DiskQuery.h"
+#include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
-#include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/planning/pure/AllFlashPlan.h"
-#include "kova/agentd/query/DiskQuery.h"
-#include "kova/agentd/query/NameList.h"
 #include "nox/Kova.h"
 #include "orbis/Types.h"
 

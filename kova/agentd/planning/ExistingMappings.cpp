@@ -5,12 +5,13 @@
 #include <unordered_set>
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/DiskInventory.h"
+#include "kova/agentd/disks/DiskMappings.h"
+#include "kova/agentd/disks/DiskQuery.h"
+#include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
-#include "kova/agentd/marshal/DiskInventory.h"
-#include "kova/agentd/planning/DiskMappings.h"
-#include "kova/agentd/query/DiskQuery.h"
-#include "kova/agentd/query/NameList.h"
+#include "kova/agentd/util/KovaUtil.h"
 #include "nox/Kova.h"
 
 namespace Kovasvc {
@@ -108,7 +109,7 @@ void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candida
     return;
   }
   const std::vector<HostCtl::Kova::DiskMapping> groups = KernelGroupsOrNone();
-  const Ref<DataArray<ScsiDisk>> disks = InventoryOrNone();
+  const Ref<DataArray<ScsiDisk>> disks = Util::InventoryOrNone(*_logger);
   if (!disks) {
     return;
   }

@@ -5,13 +5,13 @@
 #include <utility>
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/DiskInventory.h"
+#include "kova/agentd/disks/DiskMappings.h"
+#include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
-#include "kova/agentd/marshal/DiskInventory.h"
-#include "kova/agentd/marshal/ExceptionMarshal.h"
-#include "kova/agentd/planning/DiskMappings.h"
 #include "kova/agentd/planning/pure/HybridPlan.h"
-#include "kova/agentd/query/NameList.h"
+#include "kova/agentd/util/KovaUtil.h"
 #include "nox/Kova.h"
 
 namespace Kovasvc {
@@ -132,16 +132,6 @@ std::vector<HostCtl::Kova::DiskMapping> KovaManagerImpl::KernelGroupsOrNone() {
   return groups;
 }
 
-Ref<DataArray<ScsiDisk>> KovaManagerImpl::InventoryOrNone() {
-  Ref<DataArray<ScsiDisk>> inventory;
-  try {
-    Util::KovaUtil::GetDisksFromAgentd(inventory);
-  } catch (const Orbis::Fault::SystemError::Exception& exception) {
-    LogInternal(_logger, LogLevel::Warning, "GetDisksFromAgentd error %1", ReasonOf(exception));
-  }
-  return inventory;
-}
-
 void KovaManagerImpl::ComputeDiskMappings(DataArray<ScsiDisk>* candidates, bool allFlash,
                                           Ref<DataArray<DiskMapping>>& mappings, bool& limitReached) {
   const std::vector<HostCtl::Kova::DiskMapping> kernelGroups = KernelGroupsOrNone();
@@ -161,7 +151,7 @@ void KovaManagerImpl::ComputeDiskMappings(DataArray<ScsiDisk>* candidates, bool 
   }
   if (tally.ssds.empty() && !kernelGroups.empty()) {
     const Unlocked unlocked(*this);
-    if (const Ref<DataArray<ScsiDisk>> inventory = InventoryOrNone()) {
+    if (const Ref<DataArray<ScsiDisk>> inventory = Util::InventoryOrNone(*_logger)) {
       tally = ExtendableGroups(kernelGroups, allFlash, inventory);
     }
   }

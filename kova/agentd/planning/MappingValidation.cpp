@@ -3,10 +3,10 @@
 #include <algorithm>
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/DiskMappings.h"
+#include "kova/agentd/disks/DiskQuery.h"
+#include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/KovaInfo.h"
-#include "kova/agentd/planning/DiskMappings.h"
-#include "kova/agentd/query/DiskQuery.h"
-#include "kova/agentd/query/NameList.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 

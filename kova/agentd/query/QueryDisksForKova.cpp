@@ -1,10 +1,10 @@
 // Which disks the service could use, and why it cannot use the others.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
-#include "kova/agentd/marshal/ExceptionMarshal.h"
-#include "kova/agentd/query/DiskQuery.h"
+#include "kova/agentd/util/KovaUtil.h"
 #include "nox/Kova.h"
 #include "orbis/Types.h"
 
@@ -30,7 +30,7 @@ void KovaManagerImpl::QueryDisksForKova(Texts& names, std::string& faultText, st
     SerializeKovaResultAndFault(resultText, faultText, result, noFault);
   } catch (const Orbis::Fault::SystemError::Exception& exception) {
     // Without an inventory there is no answer, and that is not a fault of the request.
-    LogInternal(_logger, LogLevel::Info, "Cannot marshal DiskResult due to %1", ReasonOf(exception));
+    LogInternal(_logger, LogLevel::Info, "Cannot marshal DiskResult due to %1", Util::ReasonOf(exception));
   }
 }
 

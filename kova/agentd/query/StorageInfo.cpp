@@ -1,12 +1,13 @@
 // The host's disk groups: which there are, of which disks, and whether they are mounted.
 
 #include "kova/agentd/KovaManagerImpl.h"
+#include "kova/agentd/disks/AbsentDisk.h"
+#include "kova/agentd/disks/DiskInventory.h"
+#include "kova/agentd/disks/DiskMappings.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
-#include "kova/agentd/marshal/AbsentDisk.h"
-#include "kova/agentd/marshal/DiskInventory.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
-#include "kova/agentd/planning/DiskMappings.h"
+#include "kova/agentd/util/KovaUtil.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
 #include "orbis/Types.h"
@@ -108,7 +109,7 @@ void KovaManagerImpl::GetStorageInfo(std::string& resultText) {
   std::optional<bool> autoClaim;
   const std::vector<HostCtl::Kova::DiskMapping> groups = ReadStorage(autoClaim);
   info->SetAutoClaim(autoClaim);
-  const Ref<DataArray<ScsiDisk>> disks = groups.empty() ? nullptr : InventoryOrNone();
+  const Ref<DataArray<ScsiDisk>> disks = groups.empty() ? nullptr : Util::InventoryOrNone(*_logger);
   if (disks) {
     const DiskInventory inventory(disks);
     for (const HostCtl::Kova::DiskMapping& group : groups) {

@@ -64,6 +64,21 @@ void KovaUtil::GetDisksFromAgentd(Ref<DataArray<Nox::Host::ScsiDisk>>& disks) {
   disks = std::move(found);
 }
 
+Ref<DataArray<Nox::Host::ScsiDisk>> InventoryOrNone(Tessa::Service::Logger& logger) {
+  Ref<DataArray<Nox::Host::ScsiDisk>> inventory;
+  try {
+    KovaUtil::GetDisksFromAgentd(inventory);
+  } catch (const SystemError::Exception& exception) {
+    LogInternal(logger, Tessa::Service::LogLevel::Warning, "GetDisksFromAgentd error %1",
+                ReasonOf(exception));
+  }
+  return inventory;
+}
+
+const std::string& ReasonOf(const SystemError::Exception& exception) {
+  return static_cast<const SystemError&>(*exception.GetFault()).GetReason();
+}
+
 void EnumScsiDiskDevice(Nox::Host::StorageDeviceInfo* info, Ref<DataArray<Nox::Host::ScsiDisk>>& disks) {
   const Ref<DataArray<Nox::Host::ScsiDisk>> found = MakeRef<DataArray<Nox::Host::ScsiDisk>>();
   if (info != nullptr && info->GetScsiLun()) {

@@ -4,8 +4,11 @@
 // clears it. They are not guarded; the manager makes its one KovaUtil before the first hook is called.
 #pragma once
 
+#include <string>
+
 #include "nox/Fwd.h"
 #include "orbis/DataArray.h"
+#include "orbis/Types.h"
 #include "tessa/Lockable.h"
 #include "tessa/Logger.h"
 #include "tessa/Ref.h"
@@ -39,6 +42,12 @@ class KovaUtil : public virtual Tessa::ObjectImpl {
   static Tessa::Ref<Tessa::Service::Logger> _logger;
   static Tessa::Ref<SessionImpl> _session;
 };
+
+// The host's disks as above; without an inventory, a warning and null.
+Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> InventoryOrNone(Tessa::Service::Logger& logger);
+
+// The reason that the thrown fault carries: why there is no inventory.
+const std::string& ReasonOf(const Orbis::Fault::SystemError::Exception& exception);
 
 // Replaces `disks` with a new array of those logical units that are disks, in order. No information, or no
 // list in it, gives an empty array.

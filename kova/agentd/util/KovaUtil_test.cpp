@@ -302,5 +302,23 @@ TEST_F(Inventory, TakesNoLockAndWritesNoLine) {
   EXPECT_THAT(_logger->Lines(), IsEmpty());
 }
 
+TEST_F(Inventory, OrNoneIsTheHostsDisks) {
+  _storage->SetDisks({AScsiDisk("naa.1")});
+  EXPECT_THAT(Elements(*InventoryOrNone(*_logger)), SizeIs(1));
+  EXPECT_THAT(_logger->Lines(), IsEmpty());
+}
+
+TEST_F(Inventory, OrNoneIsAWarningAndNullWithoutAStorageSystem) {
+  _app.SetObject("storageSystem", nullptr);
+  EXPECT_FALSE(InventoryOrNone(*_logger));
+  EXPECT_THAT(_logger->Lines(), ElementsAre(TestSupport::LogLineIs(Tessa::Service::LogLevel::Warning,
+                                                                   "GetDisksFromAgentd error %1",
+                                                                   "Failed to lookup STORAGE_SYSTEM_MO.")));
+}
+
+TEST(Reason, IsReadFromAThrownSystemError) {
+  EXPECT_EQ(ReasonOf(SystemError::Exception(MakeRef<SystemError>("no such host"))), "no such host");
+}
+
 }  // namespace
 }  // namespace Kovasvc::Util

@@ -1,8 +1,8 @@
-#include "kova/agentd/marshal/DiskInventory.h"
+#include "kova/agentd/disks/DiskInventory.h"
 
 #include <utility>
 
-#include "kova/agentd/query/NameList.h"
+#include "kova/agentd/disks/NameList.h"
 #include "nox/Host.h"
 #include "tessa/Throwable.h"
 

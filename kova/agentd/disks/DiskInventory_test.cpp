@@ -1,4 +1,4 @@
-#include "kova/agentd/marshal/DiskInventory.h"
+#include "kova/agentd/disks/DiskInventory.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "kova/agentd/query/NameList.h"
+#include "kova/agentd/disks/NameList.h"
 #include "nox/Host.h"
 #include "tests/support/Builders.h"
 #include "tests/support/Seed.h"

@@ -1,4 +1,4 @@
-#include "kova/agentd/query/DiskQuery.h"
+#include "kova/agentd/disks/DiskQuery.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

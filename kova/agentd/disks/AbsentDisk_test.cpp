@@ -1,4 +1,4 @@
-#include "kova/agentd/marshal/AbsentDisk.h"
+#include "kova/agentd/disks/AbsentDisk.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

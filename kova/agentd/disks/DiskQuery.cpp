@@ -1,7 +1,7 @@
-#include "kova/agentd/query/DiskQuery.h"
+#include "kova/agentd/disks/DiskQuery.h"
 
+#include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/HostCtlException.h"
-#include "kova/agentd/query/NameList.h"
 
 namespace Kovasvc {
 

@@ -1,4 +1,4 @@
-#include "kova/agentd/planning/DiskMappings.h"
+#include "kova/agentd/disks/DiskMappings.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

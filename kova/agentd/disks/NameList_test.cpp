@@ -1,4 +1,4 @@
-#include "kova/agentd/query/NameList.h"
+#include "kova/agentd/disks/NameList.h"
 
 #include <gtest/gtest.h>
 

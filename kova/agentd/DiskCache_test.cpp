@@ -36,7 +36,7 @@ using Results = Orbis::DataArray<Nox::Kova::Host::DiskResult>;
 constexpr const char* stillValid = "Disk cache is valid, no need to refresh.";
 constexpr const char* refreshFailed = "Failed to refresh KOVA disk cache %1";
 
-class DiskCache : public TestSupport::PluginFixture {
+class ManagersDiskCache : public TestSupport::PluginFixture {
  protected:
   // How many disks the manager's cache holds, as a query of all disks sees it.
   std::size_t CachedDisks(KovaManagerImpl& manager) {
@@ -48,7 +48,7 @@ class DiskCache : public TestSupport::PluginFixture {
   }
 };
 
-TEST_F(DiskCache, RefreshesTheKernelsViewAndThenReadsEveryDiskUnderItsLock) {
+TEST_F(ManagersDiskCache, RefreshesTheKernelsViewAndThenReadsEveryDiskUnderItsLock) {
   const auto manager = MakeManager();
   manager->RefreshKovaDiskCache();
   EXPECT_THAT(_timeline.Events(), ElementsAre("take KovaManager.diskCache", "RefreshKovaInfo()",
@@ -56,7 +56,7 @@ TEST_F(DiskCache, RefreshesTheKernelsViewAndThenReadsEveryDiskUnderItsLock) {
   EXPECT_THAT(_logger->Lines(), IsEmpty());
 }
 
-TEST_F(DiskCache, IsNotRefreshedASecondTime) {
+TEST_F(ManagersDiskCache, IsNotRefreshedASecondTime) {
   const auto manager = MakeManager();
   manager->RefreshKovaDiskCache();
   _kernel.ForgetCalls();
@@ -65,13 +65,7 @@ TEST_F(DiskCache, IsNotRefreshedASecondTime) {
   EXPECT_THAT(_logger->Lines(), ElementsAre(LogLineIs(LogLevel::Verbose, stillValid)));
 }
 
-TEST_F(DiskCache, TakesNoLockWhenItsCallerHoldsIt) {
-  const auto manager = MakeManager();
-  manager->RefreshKovaDiskCacheLocked();
-  EXPECT_THAT(_timeline.Events(), ElementsAre("RefreshKovaInfo()", "QueryDisks([], true)"));
-}
-
-TEST_F(DiskCache, AsksTheKernelAgainAfterAnInvalidation) {
+TEST_F(ManagersDiskCache, AsksTheKernelAgainAfterAnInvalidation) {
   const auto manager = MakeManager();
   manager->RefreshKovaDiskCache();
   _timeline.Take();
@@ -83,7 +77,7 @@ TEST_F(DiskCache, AsksTheKernelAgainAfterAnInvalidation) {
   EXPECT_THAT(_logger->Lines(), IsEmpty());
 }
 
-TEST_F(DiskCache, IsInvalidatedUnderItsLock) {
+TEST_F(ManagersDiskCache, IsInvalidatedUnderItsLock) {
   const auto manager = MakeManager();
   _locks.SetTakeObserver([&](const std::string&) {
     _locks.SetTakeObserver({});
@@ -95,7 +89,7 @@ TEST_F(DiskCache, IsInvalidatedUnderItsLock) {
   EXPECT_FALSE(_kernel.Calls().empty());
 }
 
-TEST_F(DiskCache, ForgetsDisksThatHaveGoneSinceTheLastRefresh) {
+TEST_F(ManagersDiskCache, ForgetsDisksThatHaveGoneSinceTheLastRefresh) {
   SetHost({AScsiDisk("naa.1"), AScsiDisk("naa.2")}, {ARecord("naa.1"), ARecord("naa.2")});
   const auto manager = MakeManager();
   manager->RefreshKovaDiskCache();
@@ -110,16 +104,26 @@ class OpenManager final : public KovaManagerImpl {
  public:
   using KovaManagerImpl::GetDiskCache;
   using KovaManagerImpl::KovaManagerImpl;
+  std::vector<HostCtl::Kova::DiskResult> Records() { return DiskCache::Locked(GetDiskCache()).Records(); }
 };
 
-TEST_F(DiskCache, KeepsItsRecordsInMemoryWhenItIsInvalidated) {
+TEST_F(ManagersDiskCache, IsNotLockedAgainForACallerThatHoldsTheLock) {
+  Ref<Tessa::Service::Logger> logger = _logger;
+  const auto manager = MakeRef<OpenManager>(logger);
+  DiskCache::Locked cache(manager->GetDiskCache());
+  _timeline.Take();
+  manager->RefreshKovaDiskCacheLocked(cache);
+  EXPECT_THAT(_timeline.Events(), ElementsAre("RefreshKovaInfo()", "QueryDisks([], true)"));
+}
+
+TEST_F(ManagersDiskCache, KeepsItsRecordsInMemoryWhenItIsInvalidated) {
   _kernel.records = {ARecord("naa.1")};
   Ref<Tessa::Service::Logger> logger = _logger;
   const auto manager = MakeRef<OpenManager>(logger);
-  EXPECT_THAT(manager->GetDiskCache(), IsEmpty());
+  EXPECT_THAT(manager->Records(), IsEmpty());
   manager->RefreshKovaDiskCache();
   manager->InvalidateKovaDiskCache();
-  EXPECT_THAT(manager->GetDiskCache(), ElementsAre(HostCtl::Kova::DiskResult(ARecord("naa.1"))));
+  EXPECT_THAT(manager->Records(), ElementsAre(HostCtl::Kova::DiskResult(ARecord("naa.1"))));
 }
 
 struct FailingRefresh {
@@ -127,7 +131,7 @@ struct FailingRefresh {
   FakeKernel::When when;
 };
 
-class FailedRefresh : public DiskCache, public testing::WithParamInterface<FailingRefresh> {};
+class FailedRefresh : public ManagersDiskCache, public testing::WithParamInterface<FailingRefresh> {};
 
 INSTANTIATE_TEST_SUITE_P(Kernel, FailedRefresh,
                          testing::Values(FailingRefresh{"RefreshKovaInfo", FakeKernel::When::BeforeEffect},
@@ -163,10 +167,10 @@ TEST_P(FailedRefresh, LeavesNoRecordInMemoryWhateverWasThrown) {
   manager->InvalidateKovaDiskCache();
   _kernel.Fail(GetParam().operation, HostCtlException("the kernel is away"), GetParam().when);
   manager->RefreshKovaDiskCache();
-  EXPECT_THAT(manager->GetDiskCache(), IsEmpty());
+  EXPECT_THAT(manager->Records(), IsEmpty());
   _kernel.Fail(GetParam().operation, std::runtime_error("not the kernel's"), GetParam().when);
   EXPECT_THROW(manager->RefreshKovaDiskCache(), std::runtime_error);
-  EXPECT_THAT(manager->GetDiskCache(), IsEmpty());
+  EXPECT_THAT(manager->Records(), IsEmpty());
 }
 
 TEST_P(FailedRefresh, IsTriedAgainByTheNextOne) {
@@ -206,7 +210,7 @@ TEST_P(FailedRefresh, ByAnyOtherExceptionLeavesAnInvalidCacheToo) {
   EXPECT_THAT(_kernel.CallTexts(), ElementsAre("RefreshKovaInfo()", "QueryDisks([], true)"));
 }
 
-TEST_F(DiskCache, ThatAFailedRefreshEmptiedIsNotTakenForValid) {
+TEST_F(ManagersDiskCache, ThatAFailedRefreshEmptiedIsNotTakenForValid) {
   _kernel.Fail("QueryDisks", HostCtlException("the kernel is away"));
   const auto manager = MakeManager();
   manager->RefreshKovaDiskCache();
@@ -215,7 +219,7 @@ TEST_F(DiskCache, ThatAFailedRefreshEmptiedIsNotTakenForValid) {
   EXPECT_THAT(_logger->Lines(LogLevel::Verbose), IsEmpty());
 }
 
-TEST_F(DiskCache, StaysSoundWhileEightThreadsQueryAndInvalidate) {
+TEST_F(ManagersDiskCache, StaysSoundWhileEightThreadsQueryAndInvalidate) {
   SetHost({AScsiDisk("naa.1"), AScsiDisk("naa.2").Ssd()}, {ARecord("naa.1"), ARecord("naa.2")});
   _logger->SetLevel(LogLevel::Info);
   const auto manager = MakeManager();

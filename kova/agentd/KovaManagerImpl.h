@@ -16,10 +16,10 @@
 #pragma once
 
 #include <memory>
-#include <optional>
 #include <string>
 #include <vector>
 
+#include "kova/agentd/disks/DiskCache.h"
 #include "kova/agentd/include/KovaRecords.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "nox/Fwd.h"
@@ -28,16 +28,11 @@
 #include "tessa/Logger.h"
 #include "tessa/Ref.h"
 
-namespace HostCtl::Kova {
-class KovaInfo;
-}
 namespace Orbis {
 class MethodFault;
 }
 
 namespace Kovasvc {
-
-struct DiskQueryLimit;
 
 class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
  public:
@@ -143,13 +138,11 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
   void ComputeNotMountedDiskMappings(Orbis::DataArray<Nox::Host::ScsiDisk>* candidates,
                                      Tessa::Ref<Orbis::DataArray<Mapping>>& mappings);
 
-  // Makes the cache valid, if it is not, by asking the kernel for every disk's record. A failing kernel is
-  // a warning and an empty, invalid cache, not an error. Takes the disk-cache lock.
+  // Makes the disk cache valid, as DiskCache::Locked::Refresh does. Takes the disk-cache lock.
   void RefreshKovaDiskCache();
-  // The same for a caller that holds the disk-cache lock.
-  void RefreshKovaDiskCacheLocked();
-  // The next refresh will ask the kernel again. The records stay in memory until then. Takes the
-  // disk-cache lock.
+  // The same for a caller that holds the lock.
+  void RefreshKovaDiskCacheLocked(DiskCache::Locked& cache);
+  // The next refresh will ask the kernel again. Takes the disk-cache lock.
   void InvalidateKovaDiskCache();
 
   // Appends the SOAP texts of what is there; both, one or none may be null.
@@ -157,53 +150,14 @@ class KovaManagerImpl : public Tessa::System::LockableObjectImpl {
                                    Tessa::Ref<Orbis::Any>& result, Tessa::Ref<Orbis::MethodFault>& fault);
 
  protected:
-  // The records as they are in memory, valid or not. The caller sees to it that nobody refreshes them.
-  const std::vector<HostCtl::Kova::DiskResult>& GetDiskCache() const noexcept { return _diskCache; }
+  DiskCache& GetDiskCache() noexcept { return *_diskCache; }
 
  private:
-  // The kernel's groups, unmounted ones too; a failing kernel is a warning and none.
-  std::vector<HostCtl::Kova::DiskMapping> KernelGroupsOrNone();
-  // The candidates that the kernel calls eligible flash disks, as planning sees them.
-  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> QueryEligibleFlash(
-      const Orbis::DataArray<Nox::Host::ScsiDisk>* candidates);
-  // The cached records of these disks, or of all without names, that pass the limit, as disk results for
-  // planning. Replaces `results`. The caller holds the disk-cache lock. Throws
-  // Orbis::Fault::SystemError::Exception without an inventory.
-  void QueryDiskCacheLocked(const Texts& names, const DiskQueryLimit& limit,
-                            Tessa::Ref<DiskResults>& results);
-  // The groups that an addition of these disks makes: hybrid ones, those that are there but not mounted, and
-  // all-flash ones. The flags say which planner could plan nothing because of a limit. Throws
-  // Nox::Fault::DuplicateDisks::Exception.
-  Tessa::Ref<Orbis::DataArray<Mapping>> PlanGroups(Orbis::DataArray<Nox::Host::ScsiDisk>& disks,
-                                                   bool& allFlashExceeded, bool& hybridExceeded);
-  // Those of the disks that the kernel calls eligible, as planning sees them. Throws
-  // Orbis::Fault::SystemError::Exception without an inventory.
-  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> EligibleOf(const Texts& names);
-  // Every disk that the kernel offers without a reason against it, as it is now.
-  Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> QueryOfferedDisks();
-  // The groups that these make: hybrid ones, then all-flash ones.
-  Tessa::Ref<Orbis::DataArray<Mapping>> PlanOfferedDisks(Orbis::DataArray<Nox::Host::ScsiDisk>& candidates);
-  // Whether the kernel knows exactly one disk of that name, and as part of a group that is not mounted.
-  bool IsOffline(const std::string& ssdName);
-  // The results of the group's disks, as the kernel knows them now.
-  Tessa::Ref<DiskResults> QueryGroupAfresh(const Tessa::Ref<Mapping>& mapping);
-  // Takes a disk that has left out of the service. Provider exceptions pass.
-  void RemoveAbsentDisk(const std::string& disk, const std::string& passThrough);
-  // Tells the log which disk that has left a request is about. Its UUID.
-  std::string ReadAbsentDisk(const std::string& disk);
-  // How an operation ends that answers with a fault or nothing.
-  void FinishWithoutResult(std::string& faultText, Tessa::Ref<Orbis::MethodFault>& fault);
-  // The kernel's mounted groups, and whether it claims disks on its own; a failing kernel is a warning and no
-  // groups.
-  std::vector<HostCtl::Kova::DiskMapping> ReadStorage(std::optional<bool>& autoClaim);
-
   // In reverse, the order in which a manager goes down: the provider first.
   Tessa::Ref<Tessa::Service::Logger> _logger;
   Tessa::Ref<Util::KovaUtil> _util;  // held for its life alone: the logger that it shares goes with it
-  std::vector<HostCtl::Kova::DiskResult> _diskCache;  // guarded by _diskCacheLock
-  bool _diskCacheValid = false;                       // guarded by _diskCacheLock
   Tessa::Ref<Tessa::System::Lock> _operationLock;
-  Tessa::Ref<Tessa::System::Lock> _diskCacheLock;
+  std::unique_ptr<DiskCache> _diskCache;
   std::unique_ptr<HostCtl::Kova::KovaInfo> _provider;
 };
 

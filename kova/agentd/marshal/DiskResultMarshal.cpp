@@ -150,4 +150,14 @@ void MarshalHostCtlDiskResults(Logger& logger, const std::vector<HostCtl::Kova::
   results = marshalled;
 }
 
+Ref<DataArray<DiskResult>> MarshalCachedDisks(Logger& logger, const DiskCache::Locked& cache,
+                                              const std::vector<std::string>& names,
+                                              const DiskQueryLimit& limit) {
+  std::vector<HostCtl::Kova::DiskResult> records;
+  LimitQueryDisksForKova(logger, names, limit, cache.Records(), records);
+  Ref<DataArray<DiskResult>> results;
+  MarshalHostCtlDiskResults(logger, records, results, false);
+  return results;
+}
+
 }  // namespace Kovasvc

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "kova/agentd/disks/DiskCache.h"
 #include "kova/agentd/include/KovaRecords.h"
 #include "nox/Fwd.h"
 #include "orbis/DataArray.h"
@@ -20,6 +21,7 @@ class MethodFault;
 namespace Kovasvc {
 
 class DiskInventory;
+struct DiskQueryLimit;
 
 // The state's text; ineligible for values that nobody knows.
 const char* MarshalDiskState(HostCtl::Kova::DiskState state);
@@ -45,5 +47,10 @@ void MarshalHostCtlDiskResults(Tessa::Service::Logger& logger,
                                const std::vector<HostCtl::Kova::DiskResult>& records,
                                Tessa::Ref<Orbis::DataArray<Nox::Kova::Host::DiskResult>>& results,
                                bool queryMode);
+
+// The cached records of these disks, or of all without names, that pass the limit, as above, for planning.
+Tessa::Ref<Orbis::DataArray<Nox::Kova::Host::DiskResult>> MarshalCachedDisks(
+    Tessa::Service::Logger& logger, const DiskCache::Locked& cache, const std::vector<std::string>& names,
+    const DiskQueryLimit& limit);
 
 }  // namespace Kovasvc

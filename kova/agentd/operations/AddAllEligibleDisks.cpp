@@ -7,6 +7,7 @@
 #include "kova/agentd/disks/DiskMappings.h"
 #include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "kova/agentd/operations/OperationSteps.h"
 #include "nox/Kova.h"
 
@@ -32,46 +33,43 @@ constexpr DiskQueryLimit offered = {.byState = true,
                                     .reason = DiskReason::None,
                                     .fifthFlag = false};
 
-}  // namespace
-
-Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryOfferedDisks() {
-  Ref<DiskResults> results;
-  {
-    const LockGuard operationGuard(*_operationLock);
-    const LockGuard cacheGuard(*_diskCacheLock);
-    RefreshKovaDiskCacheLocked();
-    QueryDiskCacheLocked({}, offered, results);
-  }
-  LogInternal(_logger, LogLevel::Verbose, "Queried %1 eligible disks to be added to KOVA", results->Size());
-  const auto disks = MakeRef<DataArray<ScsiDisk>>();
-  AppendDisks(*results, *disks);
-  return disks;
-}
-
-Ref<DataArray<DiskMapping>> KovaManagerImpl::PlanOfferedDisks(DataArray<ScsiDisk>& candidates) {
+// The groups that these make: hybrid ones, then all-flash ones.
+Ref<DataArray<DiskMapping>> PlanOfferedDisks(KovaManagerImpl& manager, Tessa::Service::Logger& logger,
+                                             DataArray<ScsiDisk>& candidates) {
   bool limitReached = false;  // one flag for both planners, and nobody asks for it
   Ref<DataArray<DiskMapping>> allFlash;
   Ref<DataArray<ScsiDisk>> remaining;
-  AllFlashDiskMappingSwitch(&candidates, allFlash, remaining, limitReached);
+  manager.AllFlashDiskMappingSwitch(&candidates, allFlash, remaining, limitReached);
   Ref<DataArray<DiskMapping>> planned;
-  ComputeDiskMappings(remaining.Get(), false, planned, limitReached);
+  manager.ComputeDiskMappings(remaining.Get(), false, planned, limitReached);
   AppendMappings(allFlash.Get(), *planned);
-  LogInternal(_logger, LogLevel::Verbose, "Computed %1 mappings from the queried %2 disks for KOVA",
+  LogInternal(logger, LogLevel::Verbose, "Computed %1 mappings from the queried %2 disks for KOVA",
               planned->Size(), candidates.Size());
-  LogDiskMappings(*_logger, planned.Get());
+  LogDiskMappings(logger, planned.Get());
   return planned;
 }
+
+}  // namespace
 
 void KovaManagerImpl::AddAllEligibleDisks(const std::string& requestTag, std::string& faultText,
                                           std::string& resultText) {
   Ref<Orbis::Any> result;
   Ref<MethodFault> fault;
   const bool cameThrough = RunIntoFault(*_logger, fault, [&] {
-    const Ref<DataArray<ScsiDisk>> candidates = QueryOfferedDisks();
-    if (candidates->IsEmpty()) {
+    Ref<DiskResults> results;
+    {
+      const LockGuard guard(*_operationLock);
+      DiskCache::Locked cache(*_diskCache);
+      RefreshKovaDiskCacheLocked(cache);
+      results = MarshalCachedDisks(*_logger, cache, {}, offered);
+    }
+    LogInternal(_logger, LogLevel::Verbose, "Queried %1 eligible disks to be added to KOVA", results->Size());
+    if (results->IsEmpty()) {
       return;
     }
-    const Ref<DataArray<DiskMapping>> planned = PlanOfferedDisks(*candidates);
+    const auto candidates = MakeRef<DataArray<ScsiDisk>>();
+    AppendDisks(*results, *candidates);
+    const Ref<DataArray<DiskMapping>> planned = PlanOfferedDisks(*this, *_logger, *candidates);
     if (!planned->IsEmpty()) {
       InitializeDisksInt(planned.Get(), requestTag, result, fault);
     }

@@ -4,6 +4,7 @@
 #include "kova/agentd/disks/DiskMappings.h"
 #include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "kova/agentd/operations/OperationSteps.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
@@ -17,6 +18,7 @@ using Orbis::DataArray;
 using Orbis::MethodFault;
 using Tessa::MakeRef;
 using Tessa::Ref;
+using Tessa::Service::Logger;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
 using Tessa::System::LockGuard;
@@ -25,7 +27,7 @@ namespace {
 
 // Only neighbours count: a disk that is named twice with another between them passes. The name told is
 // names[k], k being the count of names without repeats; it need not be a repeated one.
-void DemandNoRepeat(Tessa::Service::Logger& logger, const std::vector<std::string>& names) {
+void DemandNoRepeat(Logger& logger, const std::vector<std::string>& names) {
   std::size_t withoutRepeats = 0;
   for (std::size_t i = 0; i < names.size(); ++i) {
     withoutRepeats += i == 0 || names[i] != names[i - 1] ? 1 : 0;
@@ -51,36 +53,42 @@ Ref<MethodFault> LimitReached(bool allFlash) {
   return fault;
 }
 
-}  // namespace
-
-Ref<DataArray<ScsiDisk>> KovaManagerImpl::EligibleOf(const Texts& names) {
+// Those of the disks that the kernel calls eligible, as planning sees them.
+Ref<DataArray<ScsiDisk>> EligibleOf(Logger& logger, DiskCache& cache, const std::vector<std::string>& names) {
   const auto candidates = MakeRef<DataArray<ScsiDisk>>();
   if (names.empty()) {
     return candidates;  // a query without names would answer for every disk of the host
   }
-  Ref<DiskResults> results;
-  {
-    const LockGuard guard(*_diskCacheLock);
-    QueryDiskCacheLocked(names, eligibleDisks, results);
-  }
+  const auto results = MarshalCachedDisks(logger, DiskCache::Locked(cache), names, eligibleDisks);
   AppendDisks(*results, *candidates);
   return candidates;
 }
 
-Ref<DataArray<DiskMapping>> KovaManagerImpl::PlanGroups(DataArray<ScsiDisk>& disks, bool& allFlashExceeded,
-                                                        bool& hybridExceeded) {
+// The groups that an addition of these disks makes: hybrid ones, those that are there but not mounted, and
+// all-flash ones.
+struct Addition {
+  Ref<DataArray<DiskMapping>> groups;
+  // Which planner could plan nothing because of a limit.
+  bool allFlashExceeded = false;
+  bool hybridExceeded = false;
+};
+
+Addition PlanAddition(KovaManagerImpl& manager, Logger& logger, DiskCache& cache,
+                      DataArray<ScsiDisk>& disks) {
+  Addition addition;
   Ref<DataArray<DiskMapping>> allFlash;
   Ref<DataArray<ScsiDisk>> remaining;
-  AllFlashDiskMappingSwitch(&disks, allFlash, remaining, allFlashExceeded);
-  const Texts names = NamesOf(remaining.Get());
-  DemandNoRepeat(*_logger, names);
-  const Ref<DataArray<ScsiDisk>> candidates = EligibleOf(names);
-  Ref<DataArray<DiskMapping>> planned;
-  ComputeDiskMappings(candidates.Get(), false, planned, hybridExceeded);
-  ComputeNotMountedDiskMappings(&disks, planned);
-  AppendMappings(allFlash.Get(), *planned);
-  return planned;
+  manager.AllFlashDiskMappingSwitch(&disks, allFlash, remaining, addition.allFlashExceeded);
+  const std::vector<std::string> names = NamesOf(remaining.Get());
+  DemandNoRepeat(logger, names);
+  const Ref<DataArray<ScsiDisk>> candidates = EligibleOf(logger, cache, names);
+  manager.ComputeDiskMappings(candidates.Get(), false, addition.groups, addition.hybridExceeded);
+  manager.ComputeNotMountedDiskMappings(&disks, addition.groups);
+  AppendMappings(allFlash.Get(), *addition.groups);
+  return addition;
 }
+
+}  // namespace
 
 void KovaManagerImpl::AddDisks(const Texts& disks, const std::string& requestTag, std::string& faultText,
                                std::string& resultText) {
@@ -92,17 +100,15 @@ void KovaManagerImpl::AddDisks(const Texts& disks, const std::string& requestTag
   Ref<Orbis::Any> result;
   Ref<MethodFault> fault;
   const bool cameThrough = RunIntoFault(*_logger, fault, [&] {
-    bool allFlashExceeded = false;
-    bool hybridExceeded = false;
-    const Ref<DataArray<DiskMapping>> planned = PlanGroups(*given, allFlashExceeded, hybridExceeded);
+    const Addition planned = PlanAddition(*this, *_logger, *_diskCache, *given);
     // The number of disks is passed and, by this format, not shown.
     LogInternal(_logger, LogLevel::Verbose, "Computed %1 mappings from the given %3 disks for KOVA",
-                planned->Size(), given->Size());
-    LogDiskMappings(*_logger, planned.Get());
-    if (planned->IsEmpty() && (allFlashExceeded || hybridExceeded)) {
-      fault = LimitReached(allFlashExceeded);
+                planned.groups->Size(), given->Size());
+    LogDiskMappings(*_logger, planned.groups.Get());
+    if (planned.groups->IsEmpty() && (planned.allFlashExceeded || planned.hybridExceeded)) {
+      fault = LimitReached(planned.allFlashExceeded);
     } else {
-      InitializeDisksInt(planned.Get(), requestTag, result, fault);
+      InitializeDisksInt(planned.groups.Get(), requestTag, result, fault);
     }
   });
   // After a fault the disk cache stays valid.

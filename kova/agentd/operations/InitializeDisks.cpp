@@ -7,6 +7,7 @@
 #include "kova/agentd/disks/DiskMappings.h"
 #include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "kova/agentd/operations/OperationSteps.h"
 #include "nox/Kova.h"
 #include "tessa/Formatter.h"
@@ -20,9 +21,22 @@ using Orbis::DataArray;
 using Orbis::MethodFault;
 using Tessa::MakeRef;
 using Tessa::Ref;
+using Tessa::Service::Logger;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
 using Tessa::System::LockGuard;
+
+namespace {
+
+// Whether the kernel knows exactly one disk of that name, and as part of a group that is not mounted.
+bool IsOffline(Logger& logger, DiskCache& diskCache, const std::string& ssdName) {
+  std::vector<HostCtl::Kova::DiskResult> records;
+  const DiskCache::Locked cache(diskCache);
+  LimitQueryDisksForKova(logger, {ssdName}, DiskQueryLimit(), cache.Records(), records);
+  return records.size() == 1 && records.front().reason == DiskReason::GroupNotMounted;
+}
+
+}  // namespace
 
 void KovaManagerImpl::InitializeDisks(const Texts& mappings, const std::string& requestTag,
                                       std::string& faultText, std::string& resultText) {
@@ -76,7 +90,7 @@ void KovaManagerImpl::InitializeMapping(Ref<DiskMapping> mapping, const std::str
   AskKernel(*_logger, "Error formatting KOVA disks: %1", refused, [&] {
     const std::string ssdName = SsdNameOf(mapping.Get());
     Texts capacityNames = CapacityNamesOf(mapping.Get());
-    if (IsOffline(ssdName) || IsPDLDiskInput(ssdName)) {
+    if (IsOffline(*_logger, *_diskCache, ssdName) || IsPDLDiskInput(ssdName)) {
       RestampDiskMapping(ssdName, capacityNames);
     } else {
       FormatDiskMapping(ssdName, capacityNames, requestTag, mappingCount, mappingIndex);
@@ -85,26 +99,13 @@ void KovaManagerImpl::InitializeMapping(Ref<DiskMapping> mapping, const std::str
   if (refused) {
     result->SetError(refused);
   }
-  result->SetDiskResult(QueryGroupAfresh(mapping));
-}
-
-bool KovaManagerImpl::IsOffline(const std::string& ssdName) {
-  std::vector<HostCtl::Kova::DiskResult> records;
-  const LockGuard guard(*_diskCacheLock);
-  LimitQueryDisksForKova(*_logger, {ssdName}, DiskQueryLimit(), _diskCache, records);
-  return records.size() == 1 && records.front().reason == DiskReason::GroupNotMounted;
-}
-
-Ref<KovaManagerImpl::DiskResults> KovaManagerImpl::QueryGroupAfresh(const Ref<DiskMapping>& mapping) {
   InvalidateKovaDiskCache();  // also after a refusal: what is reported is what the kernel says now
   Texts names;
   DiskMappingToDeviceNames(mapping, names);
-  Ref<DiskResults> results;
-  const LockGuard operationGuard(*_operationLock);
-  const LockGuard cacheGuard(*_diskCacheLock);
-  RefreshKovaDiskCacheLocked();
-  QueryDiskCacheLocked(names, DiskQueryLimit(), results);
-  return results;
+  const LockGuard guard(*_operationLock);
+  DiskCache::Locked cache(*_diskCache);
+  RefreshKovaDiskCacheLocked(cache);
+  result->SetDiskResult(MarshalCachedDisks(*_logger, cache, names, DiskQueryLimit()));
 }
 
 void KovaManagerImpl::FormatDiskMapping(const std::string& ssdName, Texts& nonSsdNames,

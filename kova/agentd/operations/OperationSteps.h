@@ -52,6 +52,9 @@ Tessa::Ref<Orbis::DataArray<T>> ReadObjects(const std::vector<std::string>& text
   return objects;
 }
 
+// Tells the log which disk that has left a request is about. Its UUID.
+std::string ReadAbsentDisk(Tessa::Service::Logger& logger, const std::string& disk);
+
 // Does the work. A fault that it throws becomes the operation's, in place of any before; false then.
 template <class Work>
 bool RunIntoFault(Tessa::Service::Logger& logger, Tessa::Ref<Orbis::MethodFault>& fault, Work work) {

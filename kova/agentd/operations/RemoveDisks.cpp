@@ -15,6 +15,7 @@ using Nox::Kova::Host::DiskMapping;
 using Orbis::MethodFault;
 using Tessa::MakeRef;
 using Tessa::Ref;
+using Tessa::Service::Logger;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
 using Tessa::System::LockGuard;
@@ -35,6 +36,21 @@ Ref<MethodFault> MappingNotFound(const std::string& mappingText) {
   return fault;
 }
 
+// Takes a disk that has left out of the service. Provider exceptions pass.
+void RemoveAbsentDisk(Logger& logger, HostCtl::Kova::KovaInfo& provider, const std::string& disk,
+                      const std::string& passThrough) {
+  const std::string uuid = ReadAbsentDisk(logger, disk);
+  provider.RemoveDiskByUuid(uuid, passThrough);
+}
+
+// How an operation ends that answers with a fault or nothing.
+void FinishWithoutResult(KovaManagerImpl& manager, std::string& faultText, Ref<MethodFault>& fault) {
+  manager.InvalidateKovaDiskCache();
+  std::string resultText;
+  Ref<Orbis::Any> noResult;
+  manager.SerializeKovaResultAndFault(resultText, faultText, noResult, fault);
+}
+
 }  // namespace
 
 void KovaManagerImpl::RemoveDisk(const std::string& disk, const std::string& passThrough,
@@ -46,13 +62,13 @@ void KovaManagerImpl::RemoveDisk(const std::string& disk, const std::string& pas
     RefreshKovaDiskCache();
     AskKernel(*_logger, "Error removing KOVA disks: %1", fault, [&] {
       if (IsPDLDiskInput(disk)) {
-        RemoveAbsentDisk(disk, passThrough);
+        RemoveAbsentDisk(*_logger, *_provider, disk, passThrough);
       } else {
         _provider->RemoveDisk(disk, passThrough, RemovalOptions{optionText, optionFirst, optionSecond});
       }
     });
   }
-  FinishWithoutResult(faultText, fault);
+  FinishWithoutResult(*this, faultText, fault);
 }
 
 void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::string& passThrough,
@@ -68,7 +84,7 @@ void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::s
     if (IsPDLDiskInput(ssdName)) {
       // A group whose cache disk has left is not looked for.
       AskKernel(*_logger, "Error removing PDL'd KOVA disk mapping: %1", fault,
-                [&] { RemoveAbsentDisk(ssdName, passThrough); });
+                [&] { RemoveAbsentDisk(*_logger, *_provider, ssdName, passThrough); });
     } else if (!DiskMappingExists(group)) {
       const std::string text = "SSD: " + ssdName + ", Disks: " + JoinNames(CapacityNamesOf(group.Get()));
       LogInternal(_logger, LogLevel::Warning, "Failed to validate existing disk mapping: %1", text);
@@ -80,26 +96,7 @@ void KovaManagerImpl::RemoveDiskMapping(const std::string& mapping, const std::s
       });
     }
   }
-  FinishWithoutResult(faultText, fault);
-}
-
-void KovaManagerImpl::RemoveAbsentDisk(const std::string& disk, const std::string& passThrough) {
-  const std::string uuid = ReadAbsentDisk(disk);
-  _provider->RemoveDiskByUuid(uuid, passThrough);
-}
-
-std::string KovaManagerImpl::ReadAbsentDisk(const std::string& disk) {
-  std::string uuid;
-  PDLDiskToKovaUuid(disk, uuid);
-  LogInternal(_logger, LogLevel::Verbose, "Given PDL'd disk input (KOVA UUID: '%1')", uuid);
-  return uuid;
-}
-
-void KovaManagerImpl::FinishWithoutResult(std::string& faultText, Ref<MethodFault>& fault) {
-  InvalidateKovaDiskCache();
-  std::string resultText;
-  Ref<Orbis::Any> noResult;
-  SerializeKovaResultAndFault(resultText, faultText, noResult, fault);
+  FinishWithoutResult(*this, faultText, fault);
 }
 
 }  // namespace Kovasvc

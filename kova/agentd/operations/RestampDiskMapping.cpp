@@ -4,6 +4,7 @@
 #include "kova/agentd/disks/AbsentDisk.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/operations/OperationSteps.h"
 
 namespace Kovasvc {
 
@@ -18,7 +19,7 @@ void KovaManagerImpl::RestampDiskMapping(const std::string& ssdName, Texts& capa
     if (IsPDLDiskInput(ssdName)) {
       LogInternal(_logger, LogLevel::Verbose, "UUID input %1", ssdName);
       try {
-        const std::string uuid = ReadAbsentDisk(ssdName);
+        const std::string uuid = ReadAbsentDisk(*_logger, ssdName);
         _provider->RestampDiskMappingByUuid(uuid);
       } catch (const HostCtl::Lib::HostCtlException& exception) {
         LogInternal(_logger, LogLevel::Warning, "Error restamping PDL'd KOVA disk mapping: %1",

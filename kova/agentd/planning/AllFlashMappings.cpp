@@ -22,9 +22,9 @@ using Orbis::DataArray;
 using Orbis::MethodFault;
 using Tessa::MakeRef;
 using Tessa::Ref;
+using Tessa::Service::Logger;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
-using Tessa::System::LockGuard;
 
 namespace {
 
@@ -32,32 +32,34 @@ bool IsFlash(const DiskResult& record) {
   return Planning::IsFlash(record.isSsd, record.capacityFlash);
 }
 
-}  // namespace
-
-Ref<DataArray<ScsiDisk>> KovaManagerImpl::QueryEligibleFlash(const DataArray<ScsiDisk>* candidates) {
+// The candidates that the kernel calls eligible flash disks, as planning sees them.
+Ref<DataArray<ScsiDisk>> QueryEligibleFlash(Logger& logger, DiskCache& diskCache,
+                                            const DataArray<ScsiDisk>* candidates) {
   const auto flash = MakeRef<DataArray<ScsiDisk>>();
-  Ref<DiskResults> results;
+  Ref<KovaManagerImpl::DiskResults> results;
   {
-    const LockGuard guard(*_diskCacheLock);
-    const Texts names = NamesOf(candidates);
+    const DiskCache::Locked cache(diskCache);
+    const std::vector<std::string> names = NamesOf(candidates);
     if (names.empty()) {
       return flash;  // a query without names would answer for every disk of the host
     }
     std::vector<DiskResult> records;
-    LimitQueryDisksForKova(*_logger, names, eligibleDisks, _diskCache, records);
+    LimitQueryDisksForKova(logger, names, eligibleDisks, cache.Records(), records);
     std::erase_if(records, [](const DiskResult& record) { return !IsFlash(record); });
-    MarshalHostCtlDiskResults(*_logger, records, results, false);
+    MarshalHostCtlDiskResults(logger, records, results, false);
   }
   AppendDisks(*results, *flash);
   return flash;
 }
+
+}  // namespace
 
 void KovaManagerImpl::ComputeAllFlashDiskMappings(DataArray<ScsiDisk>* candidates,
                                                   Ref<DataArray<DiskMapping>>& mappings, Texts& takenNames,
                                                   bool& limitReached) {
   Ref<DataArray<DiskMapping>> planned;
   try {
-    const Ref<DataArray<ScsiDisk>> flash = QueryEligibleFlash(candidates);
+    const Ref<DataArray<ScsiDisk>> flash = QueryEligibleFlash(*_logger, *_diskCache, candidates);
     if (flash->IsEmpty()) {
       mappings = nullptr;
       return;

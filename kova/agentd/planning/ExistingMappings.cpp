@@ -11,6 +11,7 @@
 #include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/planning/KernelGroups.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "nox/Kova.h"
 
@@ -26,7 +27,6 @@ using Tessa::MakeRef;
 using Tessa::Ref;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
-using Tessa::System::LockGuard;
 
 namespace {
 
@@ -100,15 +100,15 @@ void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candida
   }
   std::vector<DiskResult> records;
   {
-    const LockGuard guard(*_diskCacheLock);
-    LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), _diskCache, records);
+    const DiskCache::Locked cache(*_diskCache);
+    LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), cache.Records(), records);
   }
   std::erase_if(records, [](const DiskResult& record) { return !IsOfflineSsd(record); });
   NameList notMounted(NamesOfRecords(records));
   if (notMounted.IsEmpty()) {
     return;
   }
-  const std::vector<HostCtl::Kova::DiskMapping> groups = KernelGroupsOrNone();
+  const std::vector<HostCtl::Kova::DiskMapping> groups = KernelGroupsOrNone(*_logger, *_provider);
   const Ref<DataArray<ScsiDisk>> disks = Util::InventoryOrNone(*_logger);
   if (!disks) {
     return;

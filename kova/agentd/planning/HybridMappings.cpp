@@ -8,8 +8,8 @@
 #include "kova/agentd/disks/DiskInventory.h"
 #include "kova/agentd/disks/DiskMappings.h"
 #include "kova/agentd/disks/NameList.h"
-#include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/planning/KernelGroups.h"
 #include "kova/agentd/planning/pure/HybridPlan.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "nox/Kova.h"
@@ -21,8 +21,6 @@ using Nox::Kova::Host::DiskMapping;
 using Orbis::DataArray;
 using Tessa::MakeRef;
 using Tessa::Ref;
-using Tessa::Service::LogInternal;
-using Tessa::Service::LogLevel;
 
 namespace {
 
@@ -121,20 +119,9 @@ Ref<DataArray<DiskMapping>> ToMappings(const std::vector<PlannedGroup>& groups,
 
 }  // namespace
 
-std::vector<HostCtl::Kova::DiskMapping> KovaManagerImpl::KernelGroupsOrNone() {
-  std::vector<HostCtl::Kova::DiskMapping> groups;
-  try {
-    _provider->GetDiskMappings(groups, true);
-  } catch (const HostCtl::Lib::HostCtlException& exception) {
-    LogInternal(_logger, LogLevel::Warning, "Error retrieving disk mappings: %1", exception.Describe());
-    groups.clear();
-  }
-  return groups;
-}
-
 void KovaManagerImpl::ComputeDiskMappings(DataArray<ScsiDisk>* candidates, bool allFlash,
                                           Ref<DataArray<DiskMapping>>& mappings, bool& limitReached) {
-  const std::vector<HostCtl::Kova::DiskMapping> kernelGroups = KernelGroupsOrNone();
+  const std::vector<HostCtl::Kova::DiskMapping> kernelGroups = KernelGroupsOrNone(*_logger, *_provider);
   const auto noCandidates = MakeRef<DataArray<ScsiDisk>>();
   const DataArray<ScsiDisk>& disks = candidates != nullptr ? *candidates : *noCandidates;
   std::vector<bool> candidateIsSsd;

@@ -7,6 +7,7 @@
 #include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/KovaInfo.h"
+#include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 
@@ -23,7 +24,6 @@ using Tessa::Ref;
 using Tessa::Service::Logger;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
-using Tessa::System::LockGuard;
 
 namespace {
 
@@ -107,10 +107,7 @@ void KovaManagerImpl::ValidateDiskMapping(Ref<DiskMapping> mapping, Ref<DiskMapR
   DiskMappingToDeviceNames(mapping, names);
   Ref<MethodFault> fault = CheckShape(*_logger, *mapping, names);
   if (!fault) {
-    {
-      const LockGuard guard(*_diskCacheLock);
-      QueryDiskCacheLocked(names, DiskQueryLimit(), results);
-    }
+    results = MarshalCachedDisks(*_logger, DiskCache::Locked(*_diskCache), names, DiskQueryLimit());
     fault = CheckEligibility(*_logger, *results);
   }
   result->SetMapping(mapping);

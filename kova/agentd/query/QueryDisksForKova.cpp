@@ -13,14 +13,13 @@ namespace Kovasvc {
 using Tessa::Ref;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
-using Tessa::System::LockGuard;
 
 void KovaManagerImpl::QueryDisksForKova(Texts& names, std::string& faultText, std::string& resultText) {
   std::vector<HostCtl::Kova::DiskResult> records;
   {
-    const LockGuard guard(*_diskCacheLock);
-    RefreshKovaDiskCacheLocked();
-    LimitQueryDisksForKova(*_logger, names, DiskQueryLimit(), _diskCache, records);
+    DiskCache::Locked cache(*_diskCache);
+    RefreshKovaDiskCacheLocked(cache);
+    LimitQueryDisksForKova(*_logger, names, DiskQueryLimit(), cache.Records(), records);
   }
   try {
     Ref<Orbis::DataArray<Nox::Kova::Host::DiskResult>> disks;

@@ -1,5 +1,7 @@
 // The host's disk groups: which there are, of which disks, and whether they are mounted.
 
+#include <optional>
+
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/disks/AbsentDisk.h"
 #include "kova/agentd/disks/DiskInventory.h"
@@ -87,27 +89,31 @@ bool IsMounted(Logger& logger, HostCtl::Kova::KovaInfo& provider, const std::str
   }
 }
 
-}  // namespace
-
-std::vector<HostCtl::Kova::DiskMapping> KovaManagerImpl::ReadStorage(std::optional<bool>& autoClaim) {
+// The kernel's mounted groups, and whether it claims disks on its own; a failing kernel is a warning and no
+// groups.
+std::vector<HostCtl::Kova::DiskMapping> ReadStorage(KovaManagerImpl& manager, Logger& logger,
+                                                    HostCtl::Kova::KovaInfo& provider,
+                                                    std::optional<bool>& autoClaim) {
   std::vector<HostCtl::Kova::DiskMapping> groups;
   try {
-    _provider->RefreshKovaInfo();
-    autoClaim = _provider->IsAutoModeEnabled();
-    GetKovaDiskMapping(groups);
+    provider.RefreshKovaInfo();
+    autoClaim = provider.IsAutoModeEnabled();
+    manager.GetKovaDiskMapping(groups);
   } catch (const HostCtl::Lib::HostCtlException& exception) {
-    LogInternal(_logger, LogLevel::Warning, "Error retrieving storage info: %1", exception.Describe());
+    LogInternal(logger, LogLevel::Warning, "Error retrieving storage info: %1", exception.Describe());
     groups.clear();
   }
   return groups;
 }
+
+}  // namespace
 
 void KovaManagerImpl::GetStorageInfo(std::string& resultText) {
   const auto info = MakeRef<StorageInfo>();
   const auto mappings = MakeRef<DataArray<DiskMapping>>();
   const auto mapInfos = MakeRef<DataArray<DiskMapInfo>>();
   std::optional<bool> autoClaim;
-  const std::vector<HostCtl::Kova::DiskMapping> groups = ReadStorage(autoClaim);
+  const std::vector<HostCtl::Kova::DiskMapping> groups = ReadStorage(*this, *_logger, *_provider, autoClaim);
   info->SetAutoClaim(autoClaim);
   const Ref<DataArray<ScsiDisk>> disks = groups.empty() ? nullptr : Util::InventoryOrNone(*_logger);
   if (disks) {

@@ -35,18 +35,54 @@ NameSet Listed(const HostDescription& host) {
   return names;
 }
 
-std::vector<Kovasvc::Planning::HostGroup> GroupsOf(const OtxCtl::Sim::SimRules& kernel,
-                                                   const NameSet& listed) {
-  std::vector<HostCtl::Kova::DiskMapping> records;
-  kernel.GetDiskMappings(records, true);
+using KernelGroups = std::vector<HostCtl::Kova::DiskMapping>;
+using KernelRecords = std::vector<HostCtl::Kova::DiskResult>;
+
+// The names stay the kernel's.
+std::vector<Kovasvc::Planning::HostGroup> GroupsOf(const KernelGroups& kernelGroups, const NameSet& listed) {
   std::vector<Kovasvc::Planning::HostGroup> groups;
-  groups.reserve(records.size());
-  for (const HostCtl::Kova::DiskMapping& record : records) {
-    groups.push_back({.group = {.allFlash = record.allFlash, .heldBack = record.thirdFlag},
-                      .capacityDisks = record.capacityDisks.size(),
-                      .cacheListed = listed.count(record.ssd.deviceName) != 0});
+  groups.reserve(kernelGroups.size());
+  for (const HostCtl::Kova::DiskMapping& group : kernelGroups) {
+    groups.push_back({.allFlash = group.allFlash,
+                      .heldBack = group.thirdFlag,
+                      .capacityDisks = group.capacityDisks.size(),
+                      .cacheDisk = group.ssd.deviceName,
+                      .cacheListed = listed.count(group.ssd.deviceName) != 0});
   }
   return groups;
+}
+
+// In which of the groups each disk is.
+std::map<std::string, std::size_t> GroupPerDisk(const KernelGroups& kernelGroups) {
+  std::map<std::string, std::size_t> groups;
+  for (std::size_t position = 0; position < kernelGroups.size(); ++position) {
+    groups.emplace(kernelGroups[position].ssd.deviceName, position);
+    for (const HostCtl::Kova::DiskName& disk : kernelGroups[position].capacityDisks) {
+      groups.emplace(disk.deviceName, position);
+    }
+  }
+  return groups;
+}
+
+// Only the addition of every eligible disk minds a reason beside the state. The names stay the records'.
+std::vector<Kovasvc::Planning::OfferedDisk> OfferedOf(const KernelRecords& records, bool areNamed,
+                                                      const KernelGroups& kernelGroups,
+                                                      const NameSet& listed) {
+  const std::map<std::string, std::size_t> groups = GroupPerDisk(kernelGroups);
+  std::vector<Kovasvc::Planning::OfferedDisk> disks;
+  disks.reserve(records.size());
+  for (const HostCtl::Kova::DiskResult& record : records) {
+    const bool isFree = areNamed || record.reason == HostCtl::Kova::DiskReason::None;
+    const auto group = groups.find(record.name);
+    disks.push_back({.name = record.name,
+                     .eligible = record.state == HostCtl::Kova::DiskState::Eligible && isFree &&
+                                 listed.count(record.name) != 0,
+                     .isSsd = record.isSsd,
+                     .capacityFlash = record.capacityFlash,
+                     .offline = record.reason == HostCtl::Kova::DiskReason::GroupNotMounted,
+                     .group = group == groups.end() ? std::nullopt : std::optional(group->second)});
+  }
+  return disks;
 }
 
 using Reasons = std::map<std::string, std::optional<LeftOver>>;  // nothing: planning would use the disk
@@ -55,19 +91,15 @@ using Reasons = std::map<std::string, std::optional<LeftOver>>;  // nothing: pla
 Reasons AskPlanning(const HostDescription& host, const Names& offered) {
   const OtxCtl::Sim::SimRules kernel(host);
   const NameSet listed = Listed(host);
-  std::vector<HostCtl::Kova::DiskResult> records;
+  KernelRecords records;
   kernel.QueryDisks(offered, records);
-  std::vector<Kovasvc::Planning::OfferedDisk> disks;
-  disks.reserve(records.size());
-  for (const HostCtl::Kova::DiskResult& record : records) {
-    // Only the addition of every eligible disk minds a reason beside the state.
-    const bool isFree = !offered.empty() || record.reason == HostCtl::Kova::DiskReason::None;
-    disks.push_back({.eligible = record.state == HostCtl::Kova::DiskState::Eligible && isFree &&
-                                 listed.count(record.name) != 0,
-                     .isSsd = record.isSsd,
-                     .capacityFlash = record.capacityFlash});
-  }
-  const auto plan = Kovasvc::Planning::PlanAddition(disks, GroupsOf(kernel, listed));
+  KernelGroups kernelGroups;
+  kernel.GetDiskMappings(kernelGroups, true);
+  const auto disks = OfferedOf(records, !offered.empty(), kernelGroups, listed);
+  const auto groups = GroupsOf(kernelGroups, listed);
+  const auto plan =
+      offered.empty() ? Kovasvc::Planning::PlanAddition(disks, groups)
+                      : Kovasvc::Planning::PlanNamedAddition(disks, groups, {offered.begin(), offered.end()});
   Reasons reasons;
   for (std::size_t i = 0; i < records.size(); ++i) {
     reasons.emplace(records[i].name, plan.leftOver[i]);

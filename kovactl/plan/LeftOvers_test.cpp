@@ -89,6 +89,20 @@ TEST_F(LeftOvers, OfARequestThatFailedAsAWholeSaySo) {
               ElementsAre("ssd1 requestFailed", "hdd1 requestFailed"));
 }
 
+TEST_F(LeftOvers, OfARequestThatRepeatsADiskWouldHaveBeenUsedWithoutThat) {
+  HostSays({AVerdict("ssd1", "eligible"), AVerdict("hdd1", "eligible")});
+  EXPECT_THAT(Find(AHost().WithSsd("ssd1").WithHdd("hdd1"), {"ssd1", "ssd1", "hdd1"}),
+              ElementsAre("ssd1 requestFailed", "hdd1 requestFailed"));
+}
+
+TEST_F(LeftOvers, KnowThatANamedCacheDiskBringsBackItsGroup) {
+  const auto host = AHost().WithSsd("ssd1").WithHdd("hdd1").WithUnmountedGroup("ssd1", {"hdd1"});
+  HostSays({AVerdict("ssd1", "ineligible"), AVerdict("hdd1", "ineligible")});
+  EXPECT_THAT(Find(host, {"ssd1", "hdd1"}), ElementsAre("ssd1 requestFailed", "hdd1 requestFailed"));
+  EXPECT_THAT(Find(host, {"hdd1"}), testing::Contains("hdd1 notEligible")) << "its cache disk is not named";
+  EXPECT_THAT(Find(host), testing::Contains("ssd1 notEligible")) << "that is for named disks only";
+}
+
 TEST_F(LeftOvers, MindAReasonBesideTheStateOnlyWhenNobodyNamedTheDisk) {
   const auto host = AHost().WithSsd("ssd1").WithDisk("hdd1", false, [](auto& disk) {
     disk.verdict = OtxCtl::Sim::HostVerdict{1, 3};

@@ -46,7 +46,7 @@ void DiskInventory::Index(std::size_t most, IsWanted isWanted) {
 
 DiskInventory::~DiskInventory() = default;
 
-void GetScsiDiskFromArray(const std::string& canonicalName, const DiskInventory& disks, Ref<ScsiDisk>& disk) {
+void GetScsiDiskFromArray(std::string_view canonicalName, const DiskInventory& disks, Ref<ScsiDisk>& disk) {
   const auto found = disks._named.find(canonicalName);
   if (found != disks._named.end()) {
     disk = Ref<ScsiDisk>(found->second);

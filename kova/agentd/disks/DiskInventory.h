@@ -25,7 +25,7 @@ class DiskInventory {
   ~DiskInventory();
 
  private:
-  friend void GetScsiDiskFromArray(const std::string& canonicalName, const DiskInventory& disks,
+  friend void GetScsiDiskFromArray(std::string_view canonicalName, const DiskInventory& disks,
                                    Tessa::Ref<Nox::Host::ScsiDisk>& disk);
 
   // `most`: names that are wanted at most. The walk ends when it has as many, like a search at its match.
@@ -43,7 +43,7 @@ class DiskInventory {
 // Stores a reference to the disk of that name in `disk`, or leaves it as it was. Answers as a walk from the
 // first disk to the match would: a disk without a canonical name (or a null) that stands before it throws
 // Tessa::NotInitializedException.
-void GetScsiDiskFromArray(const std::string& canonicalName, const DiskInventory& disks,
+void GetScsiDiskFromArray(std::string_view canonicalName, const DiskInventory& disks,
                           Tessa::Ref<Nox::Host::ScsiDisk>& disk);
 
 }  // namespace Kovasvc

@@ -6,6 +6,7 @@
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "kova/agentd/operations/OperationSteps.h"
+#include "kova/agentd/planning/pure/AddPlan.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 
@@ -25,17 +26,12 @@ using Tessa::System::LockGuard;
 
 namespace {
 
-// Only neighbours count: a disk that is named twice with another between them passes. The name told is
-// names[k], k being the count of names without repeats; it need not be a repeated one.
 void DemandNoRepeat(Logger& logger, const std::vector<std::string>& names) {
-  std::size_t withoutRepeats = 0;
-  for (std::size_t i = 0; i < names.size(); ++i) {
-    withoutRepeats += i == 0 || names[i] != names[i - 1] ? 1 : 0;
-  }
-  if (withoutRepeats == names.size()) {
+  const auto repeated = Planning::FindRepeatedNeighbour({names.begin(), names.end()});
+  if (!repeated) {
     return;
   }
-  const std::string& told = names[withoutRepeats];
+  const std::string& told = names[*repeated];
   LogInternal(logger, LogLevel::Warning,
               "Error checking disk uniqueness, duplicate disks found in mappings: %1", told);
   throw DuplicateDisks::Exception(MakeRef<DuplicateDisks>(told));

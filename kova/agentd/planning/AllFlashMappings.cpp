@@ -9,7 +9,7 @@
 #include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
-#include "kova/agentd/planning/pure/AllFlashPlan.h"
+#include "kova/agentd/planning/pure/GroupPlan.h"
 #include "nox/Kova.h"
 #include "orbis/Types.h"
 

@@ -1,6 +1,5 @@
 // Plans disk groups from a set of disks: new ones round flash disks, or more disks for the groups there are.
 
-#include <algorithm>
 #include <string_view>
 #include <utility>
 
@@ -10,7 +9,7 @@
 #include "kova/agentd/disks/NameList.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "kova/agentd/planning/KernelGroups.h"
-#include "kova/agentd/planning/pure/HybridPlan.h"
+#include "kova/agentd/planning/pure/GroupPlan.h"
 #include "kova/agentd/util/KovaUtil.h"
 #include "nox/Kova.h"
 
@@ -45,72 +44,59 @@ class Unlocked {
   bool _wasLocked;
 };
 
-// Flash disks that take capacity disks, and how many each already has.
-struct Tally {
-  std::vector<Ref<ScsiDisk>> ssds;
-  std::vector<std::size_t> counts;
-};
-
-// The kernel's groups that may be extended and whose cache disk is in the inventory.
-Tally ExtendableGroups(const std::vector<HostCtl::Kova::DiskMapping>& groups, bool allFlash,
-                       const Ref<DataArray<ScsiDisk>>& disks) {
-  std::vector<Planning::ExistingGroup> existing;
-  std::vector<std::string_view> ssdNames;
-  existing.reserve(groups.size());
-  ssdNames.reserve(groups.size());
-  for (const HostCtl::Kova::DiskMapping& group : groups) {
-    existing.push_back({.allFlash = group.allFlash, .heldBack = group.thirdFlag});
-    ssdNames.push_back(group.ssd.deviceName);
+std::vector<Planning::Candidate> CandidatesOf(const DataArray<ScsiDisk>& disks) {
+  std::vector<Planning::Candidate> candidates;
+  candidates.reserve(disks.Size());
+  for (const ScsiDisk* disk : disks) {
+    candidates.push_back({.isCache = IsSsd(disk), .disk = disk});
   }
-  NameList wanted(std::move(ssdNames));
-  const DiskInventory inventory(disks, wanted);
-  Tally tally;
-  for (const std::size_t position : Planning::ExtendableGroups(existing, allFlash)) {
-    const HostCtl::Kova::DiskMapping& group = groups[position];
-    Ref<ScsiDisk> ssd;
-    GetScsiDiskFromArray(group.ssd.deviceName, inventory, ssd);
-    if (ssd) {
-      tally.ssds.push_back(ssd);
-      tally.counts.push_back(group.capacityDisks.size());
-    }
-  }
-  return tally;
+  return candidates;
 }
 
-// A cache disk and the positions of the capacity disks that it was dealt, in order.
-struct PlannedGroup {
-  Ref<ScsiDisk> ssd;
-  std::vector<std::size_t> disks;
-};
-
-// A cache disk that entered the tally twice heads one group, not two.
-std::vector<PlannedGroup> GroupsOf(const Planning::Deal& deal, const Tally& tally) {
-  std::vector<PlannedGroup> groups;
-  for (const Planning::Deal::Share& share : deal.shares) {
-    const Ref<ScsiDisk>& ssd = tally.ssds[share.entry];
-    const auto known = std::find_if(groups.begin(), groups.end(),
-                                    [&](const PlannedGroup& group) { return group.ssd == ssd; });
-    if (known == groups.end()) {
-      groups.push_back({ssd, share.disks});
-    } else {
-      known->disks.insert(known->disks.end(), share.disks.begin(), share.disks.end());
-      std::sort(known->disks.begin(), known->disks.end());
-    }
+// The names stay the kernel's groups'.
+std::vector<Planning::HostGroup> HostGroupsOf(const std::vector<HostCtl::Kova::DiskMapping>& kernelGroups) {
+  std::vector<Planning::HostGroup> groups;
+  groups.reserve(kernelGroups.size());
+  for (const HostCtl::Kova::DiskMapping& group : kernelGroups) {
+    groups.push_back({.allFlash = group.allFlash,
+                      .heldBack = group.thirdFlag,
+                      .capacityDisks = group.capacityDisks.size(),
+                      .cacheDisk = group.ssd.deviceName,
+                      .cacheListed = false});
   }
   return groups;
 }
 
-Ref<DataArray<DiskMapping>> ToMappings(const std::vector<PlannedGroup>& groups,
+// The inventory's cache disks of the groups that may be extended, each in its group's place; null for others.
+// The groups are told which of them are listed.
+std::vector<Ref<ScsiDisk>> FindCacheDisks(const Ref<DataArray<ScsiDisk>>& disks, bool allFlash,
+                                          std::vector<Planning::HostGroup>& groups) {
+  std::vector<std::string_view> names;
+  names.reserve(groups.size());
+  for (const Planning::HostGroup& group : groups) {
+    names.push_back(group.cacheDisk);
+  }
+  NameList wanted(std::move(names));
+  const DiskInventory inventory(disks, wanted);
+  std::vector<Ref<ScsiDisk>> cacheDisks(groups.size());
+  for (const std::size_t position : Planning::ExtendableGroups(groups, allFlash)) {
+    GetScsiDiskFromArray(groups[position].cacheDisk, inventory, cacheDisks[position]);
+    groups[position].cacheListed = cacheDisks[position] != nullptr;
+  }
+  return cacheDisks;
+}
+
+Ref<DataArray<DiskMapping>> ToMappings(const std::vector<Planning::GroupPlan::Group>& groups,
                                        const DataArray<ScsiDisk>& candidates,
-                                       const std::vector<std::size_t>& capacity) {
+                                       const std::vector<Ref<ScsiDisk>>& cacheDisks) {
   const auto mappings = MakeRef<DataArray<DiskMapping>>();
-  for (const PlannedGroup& group : groups) {
+  for (const Planning::GroupPlan::Group& group : groups) {
     const auto disks = MakeRef<DataArray<ScsiDisk>>();
-    for (const std::size_t disk : group.disks) {
-      disks->Append(candidates[capacity[disk]]);
+    for (const std::size_t disk : group.capacity) {
+      disks->Append(candidates[disk]);
     }
     const auto mapping = MakeRef<DiskMapping>();
-    mapping->SetSsd(group.ssd);
+    mapping->SetSsd(group.isNew ? Ref<ScsiDisk>(candidates[group.cache]) : cacheDisks[group.cache]);
     mapping->SetNonSsd(disks);
     mappings->Append(mapping);
   }
@@ -122,29 +108,20 @@ Ref<DataArray<DiskMapping>> ToMappings(const std::vector<PlannedGroup>& groups,
 void KovaManagerImpl::ComputeDiskMappings(DataArray<ScsiDisk>* candidates, bool allFlash,
                                           Ref<DataArray<DiskMapping>>& mappings, bool& limitReached) {
   const std::vector<HostCtl::Kova::DiskMapping> kernelGroups = KernelGroupsOrNone(*_logger, *_provider);
-  const auto noCandidates = MakeRef<DataArray<ScsiDisk>>();
-  const DataArray<ScsiDisk>& disks = candidates != nullptr ? *candidates : *noCandidates;
-  std::vector<bool> candidateIsSsd;
-  candidateIsSsd.reserve(disks.Size());
-  for (const ScsiDisk* disk : disks) {
-    candidateIsSsd.push_back(IsSsd(disk));
-  }
-  const Planning::Roles roles = Planning::AssignRoles(candidateIsSsd, kernelGroups.size());
-
-  Tally tally;
-  for (const std::size_t ssd : roles.ssds) {
-    tally.ssds.emplace_back(disks[ssd]);
-    tally.counts.push_back(0);
-  }
-  if (tally.ssds.empty() && !kernelGroups.empty()) {
+  const auto noDisks = MakeRef<DataArray<ScsiDisk>>();
+  const DataArray<ScsiDisk>& disks = candidates != nullptr ? *candidates : *noDisks;
+  const std::vector<Planning::Candidate> plannedFrom = CandidatesOf(disks);
+  std::vector<Planning::HostGroup> hostGroups = HostGroupsOf(kernelGroups);
+  std::vector<Ref<ScsiDisk>> cacheDisks;
+  if (Planning::ExtendsHostGroups(plannedFrom, hostGroups)) {
     const Unlocked unlocked(*this);
     if (const Ref<DataArray<ScsiDisk>> inventory = Util::InventoryOrNone(*_logger)) {
-      tally = ExtendableGroups(kernelGroups, allFlash, inventory);
+      cacheDisks = FindCacheDisks(inventory, allFlash, hostGroups);
     }
   }
-  const Planning::Deal deal = Planning::DealCapacityDisks(tally.counts, roles.capacity.size());
-  mappings = ToMappings(GroupsOf(deal, tally), disks, roles.capacity);
-  limitReached = Planning::IsLimitReached(roles, deal);
+  const Planning::GroupPlan plan = Planning::PlanGroups(plannedFrom, hostGroups, allFlash);
+  mappings = ToMappings(plan.groups, disks, cacheDisks);
+  limitReached = plan.limitReached;
 }
 
 }  // namespace Kovasvc

@@ -1,147 +1,139 @@
 #include "kova/agentd/planning/pure/AddPlan.h"
 
-#include "kova/agentd/planning/pure/AllFlashPlan.h"
+#include <algorithm>
+#include <unordered_set>
+#include <utility>
 
 namespace Kovasvc::Planning {
 namespace {
 
-using Positions = std::vector<std::size_t>;
+using Disks = std::vector<OfferedDisk>;
+using Groups = std::vector<HostGroup>;
+using Names = std::unordered_set<std::string_view>;
+using Way = AddPlan::Way;
 
-// Where capacity disks can go: a new group round a disk, or a group of the host.
-struct Entry {
-  bool isNew;
-  std::size_t cache;
-};
-
-struct Entries {
-  std::vector<Entry> heads;
-  Positions counts;  // capacity disks that each has already
-};
-
-Entries NewGroups(const Positions& candidates, const Roles& roles) {
-  Entries entries;
-  for (const std::size_t ssd : roles.ssds) {
-    entries.heads.push_back({true, candidates[ssd]});
-    entries.counts.push_back(0);
+// Plans one kind of groups from these disks, of which `candidates` tells the same, and adds it to the whole.
+// Whether a limit left nothing to plan.
+bool PlanKind(const std::vector<std::size_t>& positions, const std::vector<Candidate>& candidates,
+              bool allFlash, const Groups& groups, AddPlan& plan) {
+  const GroupPlan kind = PlanGroups(candidates, groups, allFlash);
+  for (std::size_t i = 0; i < positions.size(); ++i) {
+    plan.leftOver[positions[i]] = kind.leftOver[i];
   }
-  return entries;
-}
-
-Entries HostGroups(const std::vector<HostGroup>& groups, bool allFlash) {
-  std::vector<ExistingGroup> existing;
-  existing.reserve(groups.size());
-  for (const HostGroup& group : groups) {
-    existing.push_back(group.group);
-  }
-  Entries entries;
-  for (const std::size_t position : ExtendableGroups(existing, allFlash)) {
-    if (groups[position].cacheListed) {
-      entries.heads.push_back({false, position});
-      entries.counts.push_back(groups[position].capacityDisks);
-    }
-  }
-  return entries;
-}
-
-// Plans one kind of groups from the candidates, positions of disks; `isCache` tells them apart.
-void PlanKind(const Positions& candidates, const std::vector<bool>& isCache, bool allFlash,
-              const std::vector<HostGroup>& groups, AddPlan& plan) {
-  const Roles roles = AssignRoles(isCache, groups.size());
-  const Entries entries = roles.ssds.empty() ? HostGroups(groups, allFlash) : NewGroups(candidates, roles);
-  const Deal deal = DealCapacityDisks(entries.counts, roles.capacity.size());
-
-  for (const std::size_t dropped : roles.dropped) {
-    plan.leftOver[candidates[dropped]] = LeftOver::TooManyGroups;
-  }
-  for (const std::size_t ssd : roles.ssds) {
-    plan.leftOver[candidates[ssd]] = LeftOver::NoCapacityDisk;
-  }
-  LeftOver notDealt = LeftOver::NoCacheDisk;
-  if (deal.groupsFull) {
-    notDealt = LeftOver::GroupsFull;
-  } else if (!roles.dropped.empty()) {
-    notDealt = LeftOver::TooManyGroups;
-  }
-  for (const std::size_t disk : roles.capacity) {
-    plan.leftOver[candidates[disk]] = notDealt;
-  }
-  for (const Deal::Share& share : deal.shares) {
-    const Entry& head = entries.heads[share.entry];
-    AddPlan::Group group{.isNew = head.isNew, .cache = head.cache, .allFlash = allFlash, .capacity = {}};
-    for (const std::size_t dealt : share.disks) {
-      group.capacity.push_back(candidates[roles.capacity[dealt]]);
-      plan.leftOver[group.capacity.back()] = std::nullopt;
-    }
-    if (head.isNew) {
-      plan.leftOver[head.cache] = std::nullopt;
+  for (const GroupPlan::Group& planned : kind.groups) {
+    AddPlan::Group group{.way = planned.isNew ? Way::Made : Way::Extended,
+                         .cache = planned.isNew ? positions[planned.cache] : planned.cache,
+                         .allFlash = allFlash,
+                         .capacity = {}};
+    for (const std::size_t disk : planned.capacity) {
+      group.capacity.push_back(positions[disk]);
     }
     plan.groups.push_back(std::move(group));
   }
+  return kind.limitReached;
 }
 
-// Plans all-flash groups and says which disks they take from hybrid planning.
-std::vector<bool> PlanAllFlash(const std::vector<OfferedDisk>& disks, const std::vector<HostGroup>& groups,
-                               AddPlan& plan) {
-  Positions flash;
-  std::vector<bool> isCache;
-  for (std::size_t disk = 0; disk < disks.size(); ++disk) {
-    if (disks[disk].eligible && IsFlash(disks[disk].isSsd, disks[disk].capacityFlash)) {
-      flash.push_back(disk);
-      isCache.push_back(!disks[disk].capacityFlash);
+// Plans all-flash groups and says which disks they take from hybrid planning: every flash disk that is meant
+// for capacity, also when a limit leaves it out of the plan, and the cache disks of planned groups.
+Names PlanAllFlash(const Disks& disks, const Groups& groups, AddPlan& plan) {
+  std::vector<std::size_t> flash;
+  std::vector<Candidate> candidates;
+  Names taken;
+  for (std::size_t position = 0; position < disks.size(); ++position) {
+    const OfferedDisk& disk = disks[position];
+    if (disk.eligible && IsFlash(disk.isSsd, disk.capacityFlash)) {
+      flash.push_back(position);
+      candidates.push_back({.isCache = !disk.capacityFlash});
+    }
+    if (disk.eligible && disk.capacityFlash) {
+      taken.insert(disk.name);
     }
   }
-  std::vector<bool> taken(disks.size(), false);
-  if (flash.empty()) {
-    return taken;
-  }
-  PlanKind(flash, isCache, true, groups, plan);
-  for (const std::size_t position : TakenForCapacity(isCache)) {
-    taken[flash[position]] = true;
-  }
+  plan.allFlashLimit = PlanKind(flash, candidates, true, groups, plan);
   for (const AddPlan::Group& group : plan.groups) {
-    if (group.isNew) {
-      taken[group.cache] = true;
-    }
+    taken.insert(group.way == Way::Made ? disks[group.cache].name : groups[group.cache].cacheDisk);
   }
   return taken;
 }
 
-}  // namespace
-
-const char* Describe(LeftOver reason) {
-  switch (reason) {
-    case LeftOver::NotEligible:
-      return "not eligible";
-    case LeftOver::NoCacheDisk:
-      return "no flash disk is free to be its cache, and no group of its kind can grow";
-    case LeftOver::NoCapacityDisk:
-      return "no capacity disk is left for it to be the cache of";
-    case LeftOver::GroupsFull:
-      return "every group has 7 capacity disks";
-    case LeftOver::TooManyGroups:
-      return "a host has at most 5 groups";
-  }
-  return "";
-}
-
-AddPlan PlanAddition(const std::vector<OfferedDisk>& disks, const std::vector<HostGroup>& groups) {
-  AddPlan plan;
-  plan.leftOver.assign(disks.size(), LeftOver::NotEligible);
-  const std::vector<bool> taken = PlanAllFlash(disks, groups, plan);
-  std::vector<AddPlan::Group> allFlash = std::move(plan.groups);
-  plan.groups.clear();
-
-  Positions candidates;
-  std::vector<bool> isCache;
+void PlanHybrid(const Disks& disks, const Names& taken, const Groups& groups, AddPlan& plan) {
+  std::vector<std::size_t> rest;
+  std::vector<Candidate> candidates;
   for (std::size_t disk = 0; disk < disks.size(); ++disk) {
-    if (disks[disk].eligible && !taken[disk]) {
-      candidates.push_back(disk);
-      isCache.push_back(disks[disk].isSsd);
+    if (disks[disk].eligible && !taken.contains(disks[disk].name)) {
+      rest.push_back(disk);
+      candidates.push_back({.isCache = disks[disk].isSsd});
     }
   }
-  PlanKind(candidates, isCache, false, groups, plan);
+  plan.hybridLimit = PlanKind(rest, candidates, false, groups, plan);
+}
+
+// Adds the groups that are not mounted and whose cache disks are among the disks.
+void PlanMounts(const Disks& disks, const Groups& groups, AddPlan& plan) {
+  const auto heads = [](const OfferedDisk& disk, const HostGroup& group) {
+    return disk.isSsd && disk.offline && disk.name == group.cacheDisk;
+  };
+  for (std::size_t position = 0; position < groups.size(); ++position) {
+    const HostGroup& group = groups[position];
+    if (std::none_of(disks.begin(), disks.end(),
+                     [&](const OfferedDisk& disk) { return heads(disk, group); })) {
+      continue;
+    }
+    AddPlan::Group mounted{
+        .way = Way::Mounted, .cache = position, .allFlash = group.allFlash, .capacity = {}};
+    for (std::size_t disk = 0; disk < disks.size(); ++disk) {
+      if (disks[disk].group != position) {
+        continue;
+      }
+      plan.leftOver[disk] = std::nullopt;
+      if (!heads(disks[disk], group)) {
+        mounted.capacity.push_back(disk);
+      }
+    }
+    plan.groups.push_back(std::move(mounted));
+  }
+}
+
+// `names`: of a request for named disks; null of one for all.
+AddPlan Plan(const Disks& disks, const Groups& groups, const std::vector<std::string_view>* names) {
+  AddPlan plan;
+  plan.leftOver.assign(disks.size(), LeftOver::NotEligible);
+  const Names taken = PlanAllFlash(disks, groups, plan);
+  const std::vector<AddPlan::Group> allFlash = std::exchange(plan.groups, {});
+  PlanHybrid(disks, taken, groups, plan);
+  if (names != nullptr) {
+    PlanMounts(disks, groups, plan);
+  }
   plan.groups.insert(plan.groups.end(), allFlash.begin(), allFlash.end());
+  if (names == nullptr) {
+    return plan;
+  }
+  std::vector<std::string_view> remaining = *names;
+  std::erase_if(remaining, [&](std::string_view name) { return taken.contains(name); });
+  if (const auto repeated = FindRepeatedNeighbour(remaining)) {
+    plan.repeated = remaining[*repeated];
+    plan.groups.clear();
+  }
   return plan;
+}
+
+}  // namespace
+
+AddPlan PlanAddition(const Disks& disks, const Groups& groups) {
+  return Plan(disks, groups, nullptr);
+}
+
+AddPlan PlanNamedAddition(const Disks& disks, const Groups& groups,
+                          const std::vector<std::string_view>& names) {
+  return Plan(disks, groups, &names);
+}
+
+std::optional<std::size_t> FindRepeatedNeighbour(const std::vector<std::string_view>& names) {
+  std::size_t withoutRepeats = 0;
+  for (std::size_t i = 0; i < names.size(); ++i) {
+    withoutRepeats += i == 0 || names[i] != names[i - 1] ? 1 : 0;
+  }
+  return withoutRepeats == names.size() ? std::nullopt : std::optional(withoutRepeats);
 }
 
 }  // namespace Kovasvc::Planning

@@ -244,5 +244,11 @@ TEST_F(ManagersDiskCache, StaysSoundWhileEightThreadsQueryAndInvalidate) {
   EXPECT_THAT(_logger->Lines(), IsEmpty());
 }
 
+#ifndef NDEBUG
+TEST(DiskCacheDeath, IsNotMadeWithoutALock) {
+  EXPECT_DEATH(DiskCache(nullptr), "_lock");
+}
+#endif
+
 }  // namespace
 }  // namespace Kovasvc

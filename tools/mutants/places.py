@@ -54,6 +54,17 @@ def place_of(file, name, text, kind, edits):
     return Place(file, name, kind, on_one_line(before), on_one_line(after), line, tuple(edits))
 
 
+def assertions(source):
+    """Where the assertions stand. They say what holds of the code beside them: to weaken one changes no outcome."""
+    return [(source.tokens[index].start, source.tokens[source.partners[index + 1]].end)
+            for index in range(len(source.tokens) - 1)
+            if source.at(index) == "assert" and source.at(index + 1) == "("]
+
+
+def touches(edits, spans):
+    return any(start < span_end and span_start < end for start, end, _ in edits for span_start, span_end in spans)
+
+
 def changes_of(source, is_header):
     """(name, kind, edits) of everything that is changed in the file."""
     for function in source.functions:
@@ -71,7 +82,11 @@ def changes_of(source, is_header):
 def places_of(file, text):
     """Every place of one file, in order; of changes that come to the same one is taken."""
     found, seen = [], set()
-    for name, kind, edits in changes_of(Source(text), file.endswith(".h")):
+    source = Source(text)
+    asserted = assertions(source)
+    for name, kind, edits in changes_of(source, file.endswith(".h")):
+        if touches(edits, asserted):
+            continue
         result = re.sub(r"\s+", " ", changed(text, edits))
         if result not in seen:
             seen.add(result)

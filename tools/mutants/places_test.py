@@ -48,6 +48,14 @@ class Conditions(unittest.TestCase):
         self.assertEqual(inside("logic changed", "A&& a = b;"), [])
 
 
+class Assertions(unittest.TestCase):
+    def test_are_left_as_they_are_and_where_they_are(self):
+        code = "void F() { assert(a < 7 && b); c(); assert(d == 1); }"
+        self.assertEqual([place.kind for place in places_of("a.cpp", code)],
+                         ["returns at once", "statement dropped"])
+        self.assertEqual(results("statement dropped", code), ["void F() { assert(a < 7 && b);  assert(d == 1); }"])
+
+
 class Expressions(unittest.TestCase):
     def test_constants_get_their_neighbours(self):
         self.assertEqual(inside("constant changed", "f(7U);"), ["f(6U);", "f(8U);"])

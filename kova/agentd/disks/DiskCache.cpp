@@ -1,5 +1,6 @@
 #include "kova/agentd/disks/DiskCache.h"
 
+#include <cassert>
 #include <utility>
 
 #include "kova/agentd/include/HostCtlException.h"
@@ -10,7 +11,9 @@ namespace Kovasvc {
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
 
-DiskCache::DiskCache(Tessa::Ref<Tessa::System::Lock> lock) : _lock(std::move(lock)) {}
+DiskCache::DiskCache(Tessa::Ref<Tessa::System::Lock> lock) : _lock(std::move(lock)) {
+  assert(_lock);
+}
 DiskCache::~DiskCache() = default;
 
 void DiskCache::Locked::Refresh(Tessa::Service::Logger& logger, HostCtl::Kova::KovaInfo& provider) {

@@ -1,5 +1,6 @@
 #include "kova/agentd/disks/DiskInventory.h"
 
+#include <cassert>
 #include <utility>
 
 #include "kova/agentd/disks/NameList.h"
@@ -37,6 +38,7 @@ void DiskInventory::Index(std::size_t most, IsWanted isWanted) {
     const std::string& name = disk->GetCanonicalName();
     if (isWanted(name)) {
       _named.emplace(name, disk);  // of two with one name the first counts
+      assert(_named.size() <= most);
       if (_named.size() == most) {
         return;
       }

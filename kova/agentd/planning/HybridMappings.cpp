@@ -1,5 +1,6 @@
 // Plans disk groups from a set of disks: new ones round flash disks, or more disks for the groups there are.
 
+#include <cassert>
 #include <string_view>
 #include <utility>
 
@@ -95,6 +96,7 @@ Ref<DataArray<DiskMapping>> ToMappings(const std::vector<Planning::GroupPlan::Gr
     for (const std::size_t disk : group.capacity) {
       disks->Append(candidates[disk]);
     }
+    assert(group.isNew || (group.cache < cacheDisks.size() && cacheDisks[group.cache]));
     const auto mapping = MakeRef<DiskMapping>();
     mapping->SetSsd(group.isNew ? Ref<ScsiDisk>(candidates[group.cache]) : cacheDisks[group.cache]);
     mapping->SetNonSsd(disks);

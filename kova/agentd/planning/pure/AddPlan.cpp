@@ -1,6 +1,7 @@
 #include "kova/agentd/planning/pure/AddPlan.h"
 
 #include <algorithm>
+#include <cassert>
 #include <unordered_set>
 #include <utility>
 
@@ -96,6 +97,8 @@ void PlanMounts(const Disks& disks, const Groups& groups, AddPlan& plan) {
 
 // `names`: of a request for named disks; null of one for all.
 AddPlan Plan(const Disks& disks, const Groups& groups, const std::vector<std::string_view>* names) {
+  assert(std::all_of(disks.begin(), disks.end(),
+                     [&](const OfferedDisk& disk) { return !disk.group || *disk.group < groups.size(); }));
   AddPlan plan;
   plan.leftOver.assign(disks.size(), LeftOver::NotEligible);
   const Names taken = PlanAllFlash(disks, groups, plan);

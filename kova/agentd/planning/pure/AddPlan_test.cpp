@@ -226,6 +226,12 @@ TEST(FindRepeatedNeighbour, MindsOnlyNeighbours) {
   EXPECT_EQ(FindRepeatedNeighbour({}), std::nullopt);
 }
 
+#ifndef NDEBUG
+TEST(NamedAddPlanDeath, TakesNoDiskOfAGroupThatTheHostLacks) {
+  EXPECT_DEATH(PlanNamedAddition({Offline("g0", true, 1)}, {Headed("g0", AHybridGroup(1))}, {"g0"}), "group");
+}
+#endif
+
 // ---- limits
 
 TEST(AddPlan, StopsAtTheLimitOfOneKindOnlyWithoutAnyGroup) {

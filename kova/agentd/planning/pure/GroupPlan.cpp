@@ -1,6 +1,7 @@
 #include "kova/agentd/planning/pure/GroupPlan.h"
 
 #include <algorithm>
+#include <cassert>
 #include <utility>
 
 namespace Kovasvc::Planning {
@@ -76,9 +77,11 @@ std::vector<std::optional<LeftOver>> LeftOversOf(const Roles& roles, const Heads
   }
   for (const Deal::Share& share : deal.shares) {
     for (const std::size_t dealt : share.disks) {
+      assert(leftOver[roles.capacity[dealt]]);  // each is dealt once
       leftOver[roles.capacity[dealt]] = std::nullopt;
     }
     if (heads.areNew) {
+      assert(leftOver[heads.positions[share.entry]]);  // each has one share
       leftOver[heads.positions[share.entry]] = std::nullopt;
     }
   }
@@ -151,6 +154,7 @@ Roles AssignRoles(const std::vector<Candidate>& candidates, std::size_t existing
       roles.dropped.push_back(i);
     }
   }
+  assert(roles.heads.size() + roles.dropped.size() + roles.capacity.size() == candidates.size());
   return roles;
 }
 
@@ -170,6 +174,7 @@ Deal DealCapacityDisks(std::vector<std::size_t> counts, std::size_t disks) {
       shareOf[entry] = deal.shares.size();
       deal.shares.push_back({entry, {}});
     }
+    assert(deal.shares[shareOf[entry]].entry == entry);
     deal.shares[shareOf[entry]].disks.push_back(disk);
   }
   return deal;

@@ -62,8 +62,7 @@ std::vector<Planning::HostGroup> HostGroupsOf(const std::vector<HostCtl::Kova::D
     groups.push_back({.allFlash = group.allFlash,
                       .heldBack = group.thirdFlag,
                       .capacityDisks = group.capacityDisks.size(),
-                      .cacheDisk = group.ssd.deviceName,
-                      .cacheListed = false});
+                      .cacheDisk = group.ssd.deviceName});
   }
   return groups;
 }

@@ -29,9 +29,9 @@ struct OfferedDisk {
 struct AddPlan {
   enum class Way { Made, Extended, Mounted };
   struct Group {
-    Way way = Way::Made;
-    std::size_t cache = 0;  // of a group that is made a disk, otherwise a group of the host
-    bool allFlash = false;
+    Way way;
+    std::size_t cache;  // of a group that is made a disk, otherwise a group of the host
+    bool allFlash;
     std::vector<std::size_t> capacity;  // disks
   };
   // Whether nothing is made because of a limit. An addition of named disks says so, by its all-flash limit if

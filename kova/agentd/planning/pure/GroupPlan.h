@@ -48,8 +48,8 @@ std::string Describe(LeftOver reason);
 
 struct GroupPlan {
   struct Group {
-    bool isNew = true;
-    std::size_t cache = 0;              // of a new group a candidate, otherwise a group of the host
+    bool isNew;
+    std::size_t cache;                  // of a new group a candidate, otherwise a group of the host
     std::vector<std::size_t> capacity;  // candidates, in order
   };
   std::vector<Group> groups;                      // in the order of their first capacity disks

@@ -85,6 +85,11 @@ TEST(ExtendableGroups, AreHybridAndNotHeldBackUnlessTheyAreCalledOtherwise) {
   EXPECT_THAT(ExtendableGroups({HostGroup()}, true), IsEmpty());
 }
 
+TEST(HostGroup, IsEmptyAndNotListedUnlessItIsCalledOtherwise) {
+  EXPECT_EQ(HostGroup().capacityDisks, 0u);
+  EXPECT_FALSE(HostGroup().cacheListed);
+}
+
 TEST(DealCapacityDisks, GoesRoundTheEntriesInOrder) {
   const Deal deal = DealCapacityDisks({0, 0}, 5);
   ASSERT_EQ(deal.shares.size(), 2u);

@@ -4,18 +4,18 @@
 // tell, it goes on with no disks at all, finds nothing against any disk, and has the group made. Asking the
 // kernel beforehand narrows that down (Gate.h), but a kernel may answer one call and fail the next.
 //
-// Safe from any thread if the other provider is. It owns that provider.
+// Safe from any thread if the other provider is.
 #pragma once
 
 #include <atomic>
 #include <string>
 #include <vector>
 
-#include "otxctl/fault/StrictProvider.h"
+#include "otxctl/provider/StrictProvider.h"
 
 namespace Host {
 
-class CautiousProvider final : public OtxCtl::Fault::StrictProvider {
+class CautiousProvider final : public OtxCtl::Provider::StrictProvider {
  public:
   using StrictProvider::StrictProvider;
 

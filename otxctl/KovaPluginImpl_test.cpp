@@ -11,6 +11,7 @@
 #include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "otxctl/ProviderFactory.h"
+#include "otxctl/provider/ForwardingProvider.h"
 
 namespace OtxCtl::Kova {
 namespace {
@@ -22,27 +23,10 @@ using testing::Property;
 using testing::ThrowsMessage;
 
 // A provider that says which factory made it.
-class NamedProvider : public KovaInfo {
+class NamedProvider : public Provider::ForwardingProvider {
  public:
   explicit NamedProvider(std::string name) : _name(std::move(name)) {}
-  void QueryDisks(const std::vector<std::string>&, std::vector<HostCtl::Kova::DiskResult>&, bool) override {}
-  void GetDiskMappings(std::vector<HostCtl::Kova::DiskMapping>&, bool) override {}
-  void FormatDiskMapping(const std::string&, const std::vector<std::string>&,
-                         const HostCtl::Kova::FormatContext&) override {}
-  void RestampDiskMapping(const std::string&, const std::vector<std::string>&) override {}
-  void MountDiskMapping(const std::string&, bool) override {}
-  void RestampDiskMappingByUuid(const std::string&) override {}
-  void RemoveDisk(const std::string&, const std::string&, const HostCtl::Kova::RemovalOptions&) override {}
-  void RemoveDiskMapping(const std::string&, const std::string&,
-                         const HostCtl::Kova::RemovalOptions&) override {}
-  void UnmountDiskMapping(const std::string&) override {}
-  void RemoveDiskByUuid(const std::string&, const std::string&) override {}
-  bool IsAutoModeEnabled() override { return false; }
-  std::vector<HostCtl::Kova::KovaOtxNicConfig*> GetKovaOtxNicConfigs() override { return {}; }
-  void GetClusterInfoDetailed(HostCtl::Kova::KovaClusterInfoDetailed&) override {}
   std::string GetFaultDomainName() override { return _name; }
-  void ClaimUnmountedDiskgroups() override {}
-  void RefreshKovaInfo() override {}
 
  private:
   std::string _name;

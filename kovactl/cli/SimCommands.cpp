@@ -4,8 +4,8 @@
 
 #include "kovactl/cli/CommandLine.h"
 #include "kovactl/sim/SimCommand.h"
-#include "otxctl/fault/NamedException.h"
-#include "otxctl/fault/OperationNames.h"
+#include "otxctl/provider/NamedException.h"
+#include "otxctl/provider/OperationNames.h"
 
 namespace Kovactl {
 namespace {
@@ -79,14 +79,14 @@ void AddSet(CLI::App& sim, CommandLine& line) {
 void AddFault(CLI::App& sim, CommandLine& line) {
   const auto fault = std::make_shared<Json>();
   auto* const command = sim.add_subcommand("fault", "Let calls of the kernel provider fail or wait");
-  const auto& names = OtxCtl::Fault::kOperationNames;
+  const auto& names = OtxCtl::Provider::kOperationNames;
   AddValue<std::string>(*command, fault, "OPERATION", "/operation", "Operation of the provider")
       ->required()
       ->check(CLI::IsMember(std::vector<std::string>(names.begin(), names.end())));
   AddValue<std::string>(*command, fault, "--exception", "/exception",
                         "Class of the exception, such as HostCtlException or KovaExceptionHasPartition")
       ->check([](const std::string& name) {
-        return OtxCtl::Fault::IsExceptionName(name) ? "" : "no exception class is called " + name;
+        return OtxCtl::Provider::IsExceptionName(name) ? "" : "no exception class is called " + name;
       });
   AddValue<int>(*command, fault, "--call", "/call", "Which call, counted from 1; 0: every call");
   AddValue<std::string>(*command, fault, "--message", "/message", "What the exception says");

@@ -2,7 +2,7 @@
 // what providers may throw.
 #include "otxctl/contract/ProviderContract.h"
 #include "otxctl/fault/RecordingProvider.h"
-#include "otxctl/fault/StrictProvider.h"
+#include "otxctl/provider/StrictProvider.h"
 #include "otxctl/sim/SimProvider.h"
 
 namespace OtxCtl::Contract {
@@ -40,7 +40,7 @@ class StrictHost : public ContractHost {
   explicit StrictHost(const Sim::HostDescription& host) : _host(host) {}
 
   std::unique_ptr<HostCtl::Kova::KovaInfo> NewProvider() override {
-    return std::make_unique<Fault::StrictProvider>(_host.NewProvider());
+    return std::make_unique<Provider::StrictProvider>(_host.NewProvider());
   }
 
  private:

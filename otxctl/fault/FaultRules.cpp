@@ -2,7 +2,7 @@
 
 #include <thread>
 
-#include "otxctl/fault/NamedException.h"
+#include "otxctl/provider/NamedException.h"
 
 namespace OtxCtl::Fault {
 
@@ -39,7 +39,7 @@ void Suffer(const FaultEffect& effect, const Waiter& wait) {
     wait(effect.delay);
   }
   if (effect.thrown) {
-    ThrowNamed(effect.thrown->exception, effect.thrown->message, effect.thrown->disk);
+    Provider::ThrowNamed(effect.thrown->exception, effect.thrown->message, effect.thrown->disk);
   }
 }
 

@@ -16,9 +16,9 @@
 namespace OtxCtl::Fault {
 
 struct FaultRule {
-  std::string operation;     // a name of OperationNames.h
+  std::string operation;     // a name of provider/OperationNames.h
   std::int32_t call = 0;     // which call of that operation, from 1; 0: every call
-  std::string exception;     // a name of NamedException.h; empty: the call goes on after the wait
+  std::string exception;     // a name of provider/NamedException.h; empty: the call goes on after the wait
   std::string message;       // what the exception says
   std::string disk;          // the disk it carries, where its class has one
   std::int32_t delayMs = 0;  // how long the call waits first

@@ -6,12 +6,12 @@
 #include <thread>
 
 #include "kova/agentd/include/HostCtlException.h"
-#include "otxctl/fault/OperationNames.h"
+#include "otxctl/provider/OperationNames.h"
+#include "otxctl/provider/testing/Operations.h"
 
 namespace OtxCtl::Fault {
 namespace {
 
-using HostCtl::Kova::KovaInfo;
 using HostCtl::Lib::KovaExceptionHasPartition;
 using nlohmann::json;
 using testing::_;
@@ -20,26 +20,16 @@ using testing::Field;
 using testing::Return;
 using testing::Throw;
 
-class MockProvider : public KovaInfo {
+// What is not mocked answers nothing.
+class MockProvider : public Provider::ForwardingProvider {
  public:
   MOCK_METHOD(void, QueryDisks,
               (const std::vector<std::string>&, std::vector<HostCtl::Kova::DiskResult>&, bool), (override));
-  MOCK_METHOD(void, GetDiskMappings, (std::vector<HostCtl::Kova::DiskMapping>&, bool), (override));
   MOCK_METHOD(void, FormatDiskMapping,
               (const std::string&, const std::vector<std::string>&, const HostCtl::Kova::FormatContext&),
               (override));
-  MOCK_METHOD(void, RestampDiskMapping, (const std::string&, const std::vector<std::string>&), (override));
   MOCK_METHOD(void, MountDiskMapping, (const std::string&, bool), (override));
-  MOCK_METHOD(void, RestampDiskMappingByUuid, (const std::string&), (override));
-  MOCK_METHOD(void, RemoveDisk,
-              (const std::string&, const std::string&, const HostCtl::Kova::RemovalOptions&), (override));
-  MOCK_METHOD(void, RemoveDiskMapping,
-              (const std::string&, const std::string&, const HostCtl::Kova::RemovalOptions&), (override));
-  MOCK_METHOD(void, UnmountDiskMapping, (const std::string&), (override));
-  MOCK_METHOD(void, RemoveDiskByUuid, (const std::string&, const std::string&), (override));
   MOCK_METHOD(bool, IsAutoModeEnabled, (), (override));
-  MOCK_METHOD(std::vector<HostCtl::Kova::KovaOtxNicConfig*>, GetKovaOtxNicConfigs, (), (override));
-  MOCK_METHOD(void, GetClusterInfoDetailed, (HostCtl::Kova::KovaClusterInfoDetailed&), (override));
   MOCK_METHOD(std::string, GetFaultDomainName, (), (override));
   MOCK_METHOD(void, ClaimUnmountedDiskgroups, (), (override));
   MOCK_METHOD(void, RefreshKovaInfo, (), (override));
@@ -68,36 +58,16 @@ class RecordingProviderTest : public testing::Test {
   std::unique_ptr<RecordingProvider> _provider;
 };
 
-void CallEverything(KovaInfo& provider) {
-  std::vector<HostCtl::Kova::DiskResult> records;
-  provider.QueryDisks({"naa.1", "naa.2"}, records, true);
-  std::vector<HostCtl::Kova::DiskMapping> groups;
-  provider.GetDiskMappings(groups, true);
-  provider.FormatDiskMapping("naa.1", {"naa.2"}, {"t1", 1, 0});
-  provider.RestampDiskMapping("naa.1", {"naa.2"});
-  provider.MountDiskMapping("naa.1", false);
-  provider.RestampDiskMappingByUuid("uuid");
-  provider.RemoveDisk("naa.2", "pass", {"text", 1, 2});
-  provider.RemoveDiskMapping("naa.1", "", {"", 0, -1});
-  provider.UnmountDiskMapping("naa.1");
-  provider.RemoveDiskByUuid("uuid", "pass");
-  provider.IsAutoModeEnabled();
-  provider.GetKovaOtxNicConfigs();
-  HostCtl::Kova::KovaClusterInfoDetailed cluster;
-  provider.GetClusterInfoDetailed(cluster);
-  provider.GetFaultDomainName();
-  provider.ClaimUnmountedDiskgroups();
-  provider.RefreshKovaInfo();
-}
-
 TEST_F(RecordingProviderTest, WritesTheInputsOfEveryOperationAsAList) {
-  CallEverything(*_provider);
+  for (const Provider::Operation& operation : Provider::AllOperations()) {
+    operation.call(*_provider);
+  }
   const std::vector<json> arguments = {
       json::parse(R"([["naa.1", "naa.2"], true])"),
       json::parse(R"([true])"),
       json::parse(R"(["naa.1", ["naa.2"], ["t1", 1, 0]])"),
       json::parse(R"(["naa.1", ["naa.2"]])"),
-      json::parse(R"(["naa.1", false])"),
+      json::parse(R"(["naa.1", true])"),
       json::parse(R"(["uuid"])"),
       json::parse(R"(["naa.2", "pass", ["text", 1, 2]])"),
       json::parse(R"(["naa.1", "", ["", 0, -1]])"),
@@ -111,9 +81,9 @@ TEST_F(RecordingProviderTest, WritesTheInputsOfEveryOperationAsAList) {
       json::array(),
   };
   const std::vector<RecordedCall> calls = _recorder->Calls();
-  ASSERT_EQ(calls.size(), kOperationNames.size());
+  ASSERT_EQ(calls.size(), Provider::kOperationNames.size());
   for (std::size_t index = 0; index < calls.size(); ++index) {
-    EXPECT_EQ(calls[index].operation, kOperationNames[index]);
+    EXPECT_EQ(calls[index].operation, Provider::kOperationNames[index]);
     EXPECT_EQ(calls[index].arguments, arguments[index]) << calls[index].operation;
     EXPECT_EQ(calls[index].outcome, "ok") << calls[index].operation;
   }

@@ -7,8 +7,8 @@
 #include <limits>
 
 #include "otxctl/fault/FaultRules.h"
-#include "otxctl/fault/NamedException.h"
-#include "otxctl/fault/OperationNames.h"
+#include "otxctl/provider/NamedException.h"
+#include "otxctl/provider/OperationNames.h"
 #include "otxctl/sim/HostDescription.h"
 
 namespace OtxCtl::Sim::Fields {
@@ -122,9 +122,9 @@ template <typename Table>
 void Describe(Table& fields, const Fault::FaultRule*) {
   using Fault::FaultRule;
   fields.Required("operation", &FaultRule::operation,
-                  Known(&Fault::IsOperationName, "provider operation", false));
+                  Known(&Provider::IsOperationName, "provider operation", false));
   fields.Optional("call", &FaultRule::call, Between(0, kLargest32));
-  fields.Optional("exception", &FaultRule::exception, Known(&Fault::IsExceptionName, "exception", true));
+  fields.Optional("exception", &FaultRule::exception, Known(&Provider::IsExceptionName, "exception", true));
   fields.Optional("message", &FaultRule::message);
   fields.Optional("disk", &FaultRule::disk);
   fields.Optional("delayMs", &FaultRule::delayMs, Between(0, kLongestDelayMs));

@@ -9,8 +9,7 @@
 
 #include "kova/agentd/include/HostCtlException.h"
 #include "otxctl/TaskScope.h"
-#include "otxctl/fault/NamedException.h"
-#include "otxctl/fault/OperationNames.h"
+#include "otxctl/provider/testing/Operations.h"
 #include "otxctl/sim/HostBuilder.h"
 #include "otxctl/sim/SimProvider.h"
 
@@ -153,39 +152,13 @@ TEST(SimHostFaults, ARefusedCallCountsToo) {
   EXPECT_THROW(host.RemoveDisk("naa.9", "", {}), std::runtime_error);
 }
 
-// One call of each operation, by its position in the table of names.
-void CallOperation(KovaInfo& provider, std::size_t operation) {
-  std::vector<HostCtl::Kova::DiskResult> records;
-  std::vector<HostCtl::Kova::DiskMapping> groups;
-  HostCtl::Kova::KovaClusterInfoDetailed cluster;
-  const std::vector<std::function<void()>> calls = {
-      [&] { provider.QueryDisks({}, records, false); },
-      [&] { provider.GetDiskMappings(groups, false); },
-      [&] { provider.FormatDiskMapping("naa.1", {"naa.2"}, {}); },
-      [&] { provider.RestampDiskMapping("naa.1", {}); },
-      [&] { provider.MountDiskMapping("naa.1", false); },
-      [&] { provider.RestampDiskMappingByUuid("u"); },
-      [&] { provider.RemoveDisk("naa.1", "", {}); },
-      [&] { provider.RemoveDiskMapping("naa.1", "", {}); },
-      [&] { provider.UnmountDiskMapping("naa.1"); },
-      [&] { provider.RemoveDiskByUuid("u", ""); },
-      [&] { provider.IsAutoModeEnabled(); },
-      [&] { provider.GetKovaOtxNicConfigs(); },
-      [&] { provider.GetClusterInfoDetailed(cluster); },
-      [&] { provider.GetFaultDomainName(); },
-      [&] { provider.ClaimUnmountedDiskgroups(); },
-      [&] { provider.RefreshKovaInfo(); },
-  };
-  calls.at(operation)();
-}
-
 TEST(SimHostFaults, CanBeGivenToEveryOperation) {
-  for (std::size_t operation = 0; operation < Fault::kOperationNames.size(); ++operation) {
-    const std::string name(Fault::kOperationNames[operation]);
+  for (const Provider::Operation& operation : Provider::AllOperations()) {
+    const std::string name(operation.name);
     const auto host = std::make_shared<SimHost>(
         WithFaults({{name, 1, "KovaExceptionRescanError", "injected", "naa.x", 0}}).Build());
     SimProvider provider(host);
-    EXPECT_THAT([&] { CallOperation(provider, operation); },
+    EXPECT_THAT([&] { operation.call(provider); },
                 ThrowsMessage<HostCtl::Lib::KovaExceptionRescanError>("injected"))
         << name;
     EXPECT_EQ(host->Snapshot().groups.size(), 0U) << name;

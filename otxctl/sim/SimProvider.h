@@ -2,41 +2,16 @@
 #pragma once
 
 #include <memory>
-#include <string>
-#include <vector>
+#include <utility>
 
-#include "kova/agentd/include/KovaInfo.h"
+#include "otxctl/provider/ForwardingProvider.h"
 #include "otxctl/sim/SimHost.h"
 
 namespace OtxCtl::Sim {
 
-class SimProvider final : public HostCtl::Kova::KovaInfo {
+class SimProvider final : public Provider::ForwardingProvider {
  public:
-  explicit SimProvider(std::shared_ptr<SimHost> host);
-
-  void QueryDisks(const std::vector<std::string>& names, std::vector<HostCtl::Kova::DiskResult>& results,
-                  bool flag) override;
-  void GetDiskMappings(std::vector<HostCtl::Kova::DiskMapping>& mappings, bool withUnmounted) override;
-  void FormatDiskMapping(const std::string& ssd, const std::vector<std::string>& capacityDisks,
-                         const HostCtl::Kova::FormatContext& context) override;
-  void RestampDiskMapping(const std::string& ssd, const std::vector<std::string>& capacityDisks) override;
-  void MountDiskMapping(const std::string& ssd, bool flag) override;
-  void RestampDiskMappingByUuid(const std::string& kovaUuid) override;
-  void RemoveDisk(const std::string& disk, const std::string& passThrough,
-                  const HostCtl::Kova::RemovalOptions& options) override;
-  void RemoveDiskMapping(const std::string& ssd, const std::string& passThrough,
-                         const HostCtl::Kova::RemovalOptions& options) override;
-  void UnmountDiskMapping(const std::string& ssd) override;
-  void RemoveDiskByUuid(const std::string& kovaUuid, const std::string& passThrough) override;
-  bool IsAutoModeEnabled() override;
-  std::vector<HostCtl::Kova::KovaOtxNicConfig*> GetKovaOtxNicConfigs() override;
-  void GetClusterInfoDetailed(HostCtl::Kova::KovaClusterInfoDetailed& info) override;
-  std::string GetFaultDomainName() override;
-  void ClaimUnmountedDiskgroups() override;
-  void RefreshKovaInfo() override;
-
- private:
-  const std::shared_ptr<SimHost> _host;
+  explicit SimProvider(std::shared_ptr<SimHost> host) : ForwardingProvider(std::move(host)) {}
 };
 
 }  // namespace OtxCtl::Sim

@@ -4,17 +4,59 @@
 #include <iterator>
 #include <utility>
 
+#include "otxctl/provider/ForwardingProvider.h"
+
 namespace TestSupport {
 
 using HostCtl::Kova::DiskMapping;
 using HostCtl::Kova::DiskResult;
 using HostCtl::Kova::FormatContext;
 using HostCtl::Kova::RemovalOptions;
+using OtxCtl::Provider::ForwardingProvider;
+using OtxCtl::Provider::ProviderCall;
 
 namespace {
 
+// What the test put into the kernel.
+class FakeAnswers final : public ForwardingProvider {
+ public:
+  explicit FakeAnswers(const FakeKernel& kernel) : _kernel(kernel) {}
+
+  void QueryDisks(const std::vector<std::string>& names, std::vector<DiskResult>& results, bool) override {
+    std::copy_if(_kernel.records.begin(), _kernel.records.end(), std::back_inserter(results),
+                 [&names](const DiskResult& record) {
+                   return names.empty() || std::find(names.begin(), names.end(), record.name) != names.end();
+                 });
+  }
+  void GetDiskMappings(std::vector<DiskMapping>& mappings, bool withUnmounted) override {
+    mappings.insert(mappings.end(), _kernel.groups.begin(), _kernel.groups.end());
+    if (withUnmounted) {
+      mappings.insert(mappings.end(), _kernel.unmountedGroups.begin(), _kernel.unmountedGroups.end());
+    }
+  }
+  bool IsAutoModeEnabled() override { return _kernel.autoMode; }
+  std::vector<HostCtl::Kova::KovaOtxNicConfig*> GetKovaOtxNicConfigs() override {
+    return _kernel.makeNics ? _kernel.makeNics() : std::vector<HostCtl::Kova::KovaOtxNicConfig*>();
+  }
+  void GetClusterInfoDetailed(HostCtl::Kova::KovaClusterInfoDetailed& info) override {
+    info = _kernel.cluster;
+  }
+  std::string GetFaultDomainName() override { return _kernel.faultDomain; }
+
+ private:
+  const FakeKernel& _kernel;
+};
+
+std::string Text(bool flag) {
+  return flag ? "true" : "false";
+}
+
+std::string Text(const std::string& text) {
+  return text;
+}
+
 // An empty name is printed as "", so that it is no empty list.
-std::string List(const std::vector<std::string>& names) {
+std::string Text(const std::vector<std::string>& names) {
   std::string text;
   for (const std::string& name : names) {
     text += (text.empty() ? "" : ", ") + (name.empty() ? "\"\"" : name);
@@ -22,95 +64,45 @@ std::string List(const std::vector<std::string>& names) {
   return "[" + text + "]";
 }
 
-std::string Flag(bool flag) {
-  return flag ? "true" : "false";
-}
-
 std::string Triple(const std::string& text, int first, int second) {
   return "{" + text + ", " + std::to_string(first) + ", " + std::to_string(second) + "}";
 }
 
+std::string Text(const FormatContext& context) {
+  return Triple(context.requestTag, context.mappingCount, context.mappingIndex);
+}
+
+std::string Text(const RemovalOptions& options) {
+  return Triple(options.text, options.first, options.second);
+}
+
+std::string ArgumentsOf(const ProviderCall& call) {
+  std::string text;
+  const char* separator = "";
+  for (const OtxCtl::Provider::Input& input : call.inputs) {
+    text += separator + std::visit([](const auto& given) { return Text(given); }, input);
+    separator = ", ";
+  }
+  return text;
+}
+
 }  // namespace
 
-class FakeProvider final : public HostCtl::Kova::KovaInfo {
+class FakeProvider final : public ForwardingProvider {
  public:
-  explicit FakeProvider(FakeKernel& kernel) : _kernel(kernel) {}
+  explicit FakeProvider(FakeKernel& kernel)
+      : ForwardingProvider(std::make_shared<FakeAnswers>(kernel)), _kernel(kernel) {}
   ~FakeProvider() override { _kernel._timeline.Note("delete provider"); }
 
-  void QueryDisks(const std::vector<std::string>& names, std::vector<DiskResult>& results,
-                  bool flag) override {
-    Do("QueryDisks", List(names) + ", " + Flag(flag), [&] {
-      std::copy_if(_kernel.records.begin(), _kernel.records.end(), std::back_inserter(results),
-                   [&names](const DiskResult& record) {
-                     return names.empty() ||
-                            std::find(names.begin(), names.end(), record.name) != names.end();
-                   });
-    });
-  }
-  void GetDiskMappings(std::vector<DiskMapping>& mappings, bool withUnmounted) override {
-    Do("GetDiskMappings", Flag(withUnmounted), [&] {
-      mappings.insert(mappings.end(), _kernel.groups.begin(), _kernel.groups.end());
-      if (withUnmounted) {
-        mappings.insert(mappings.end(), _kernel.unmountedGroups.begin(), _kernel.unmountedGroups.end());
-      }
-    });
-  }
-  void FormatDiskMapping(const std::string& ssd, const std::vector<std::string>& capacityDisks,
-                         const FormatContext& context) override {
-    Do("FormatDiskMapping", ssd + ", " + List(capacityDisks) + ", " +
-                                Triple(context.requestTag, context.mappingCount, context.mappingIndex));
-  }
-  void RestampDiskMapping(const std::string& ssd, const std::vector<std::string>& capacityDisks) override {
-    Do("RestampDiskMapping", ssd + ", " + List(capacityDisks));
-  }
-  void MountDiskMapping(const std::string& ssd, bool flag) override {
-    Do("MountDiskMapping", ssd + ", " + Flag(flag));
-  }
-  void RestampDiskMappingByUuid(const std::string& kovaUuid) override {
-    Do("RestampDiskMappingByUuid", kovaUuid);
-  }
-  void RemoveDisk(const std::string& disk, const std::string& passThrough,
-                  const RemovalOptions& options) override {
-    Do("RemoveDisk", disk + ", " + passThrough + ", " + Triple(options.text, options.first, options.second));
-  }
-  void RemoveDiskMapping(const std::string& ssd, const std::string& passThrough,
-                         const RemovalOptions& options) override {
-    Do("RemoveDiskMapping",
-       ssd + ", " + passThrough + ", " + Triple(options.text, options.first, options.second));
-  }
-  void UnmountDiskMapping(const std::string& ssd) override { Do("UnmountDiskMapping", ssd); }
-  void RemoveDiskByUuid(const std::string& kovaUuid, const std::string& passThrough) override {
-    Do("RemoveDiskByUuid", kovaUuid + ", " + passThrough);
-  }
-  bool IsAutoModeEnabled() override {
-    Do("IsAutoModeEnabled", "");
-    return _kernel.autoMode;
-  }
-  std::vector<HostCtl::Kova::KovaOtxNicConfig*> GetKovaOtxNicConfigs() override {
-    Do("GetKovaOtxNicConfigs", "");
-    return _kernel.makeNics ? _kernel.makeNics() : std::vector<HostCtl::Kova::KovaOtxNicConfig*>();
-  }
-  void GetClusterInfoDetailed(HostCtl::Kova::KovaClusterInfoDetailed& info) override {
-    Do("GetClusterInfoDetailed", "", [&] { info = _kernel.cluster; });
-  }
-  std::string GetFaultDomainName() override {
-    Do("GetFaultDomainName", "");
-    return _kernel.faultDomain;
-  }
-  void ClaimUnmountedDiskgroups() override { Do("ClaimUnmountedDiskgroups", ""); }
-  void RefreshKovaInfo() override { Do("RefreshKovaInfo", ""); }
-
- private:
-  template <class Effect>
-  void Do(const std::string& operation, const std::string& arguments, Effect effect) {
-    _kernel.Begin(operation, arguments);
-    effect();
+ protected:
+  void AroundCall(const ProviderCall& call, const Forward& forward) override {
+    const std::string operation(call.operation);
+    _kernel.Begin(operation, ArgumentsOf(call));
+    forward();
     _kernel.End(operation);
   }
-  void Do(const std::string& operation, const std::string& arguments) {
-    Do(operation, arguments, [] {});
-  }
 
+ private:
   FakeKernel& _kernel;
 };
 

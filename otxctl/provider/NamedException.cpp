@@ -1,4 +1,4 @@
-#include "otxctl/fault/NamedException.h"
+#include "otxctl/provider/NamedException.h"
 
 #include <algorithm>
 #include <array>
@@ -6,7 +6,7 @@
 
 #include "kova/agentd/include/HostCtlException.h"
 
-namespace OtxCtl::Fault {
+namespace OtxCtl::Provider {
 namespace {
 
 using namespace HostCtl::Lib;
@@ -73,4 +73,4 @@ std::string_view ExceptionName(const std::exception& exception) noexcept {
   return found == kClasses.end() ? "std::exception" : found->name;
 }
 
-}  // namespace OtxCtl::Fault
+}  // namespace OtxCtl::Provider

@@ -7,7 +7,7 @@
 #include <string>
 #include <string_view>
 
-namespace OtxCtl::Fault {
+namespace OtxCtl::Provider {
 
 bool IsExceptionName(std::string_view name) noexcept;
 
@@ -19,4 +19,4 @@ bool IsExceptionName(std::string_view name) noexcept;
 // in the end "std::exception".
 std::string_view ExceptionName(const std::exception& exception) noexcept;
 
-}  // namespace OtxCtl::Fault
+}  // namespace OtxCtl::Provider

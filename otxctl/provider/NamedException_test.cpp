@@ -1,13 +1,13 @@
-#include "otxctl/fault/NamedException.h"
+#include "otxctl/provider/NamedException.h"
 
 #include <gtest/gtest.h>
 
 #include <stdexcept>
 
 #include "kova/agentd/include/HostCtlException.h"
-#include "otxctl/fault/OperationNames.h"
+#include "otxctl/provider/OperationNames.h"
 
-namespace OtxCtl::Fault {
+namespace OtxCtl::Provider {
 namespace {
 
 using namespace HostCtl::Lib;
@@ -78,4 +78,4 @@ TEST(OperationNames, AreTheSixteenOfTheProvider) {
 }
 
 }  // namespace
-}  // namespace OtxCtl::Fault
+}  // namespace OtxCtl::Provider

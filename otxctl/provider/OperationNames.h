@@ -1,10 +1,11 @@
 // The names of the provider's operations, as call records and fault rules write them.
 #pragma once
 
+#include <algorithm>
 #include <array>
 #include <string_view>
 
-namespace OtxCtl::Fault {
+namespace OtxCtl::Provider {
 
 // In the order of HostCtl::Kova::KovaInfo.
 inline constexpr std::array<std::string_view, 16> kOperationNames = {
@@ -26,6 +27,8 @@ inline constexpr std::array<std::string_view, 16> kOperationNames = {
     "RefreshKovaInfo",
 };
 
-bool IsOperationName(std::string_view name) noexcept;
+constexpr bool IsOperationName(std::string_view name) noexcept {
+  return std::find(kOperationNames.begin(), kOperationNames.end(), name) != kOperationNames.end();
+}
 
-}  // namespace OtxCtl::Fault
+}  // namespace OtxCtl::Provider

@@ -20,6 +20,7 @@
 #include "host/HostRuntime.h"
 #include "host/KovaService.h"
 #include "host/LogSink.h"
+#include "machines/Machines.h"
 #include "tessa/Panic.h"
 
 namespace {
@@ -28,6 +29,7 @@ constexpr std::chrono::seconds lastQueryTime(10);  // for a query at work that n
 constexpr int unfinishedStatus = 1;                // stopped while requests were still handled
 
 struct Options {
+  Machines::MachineOptions machine;
   Host::RuntimeOptions runtime;
   Agentd::ListenOptions listen;
   std::string readyFile;
@@ -37,9 +39,9 @@ struct Options {
 
 void AddOptions(CLI::App& cli, Options& options) {
   cli.set_version_flag("--version", "agentd " + Host::VersionLine(), "Print version, build and API, and end");
-  cli.add_option("--host", options.runtime.hostFile,
+  cli.add_option("--host", options.machine.host,
                  "Host description to serve; without one, an example host is served");
-  cli.add_flag("--save", options.runtime.save, "Write every change of the host back to its description");
+  cli.add_flag("--save", options.machine.save, "Write every change of the host back to its description");
   cli.add_option("--ready-file", options.readyFile,
                  "File to write the addresses to, a line each, once they are answered on");
   cli.add_option("--log-level", options.logLevel, "none, error, warning, info, verbose, trivia")
@@ -92,8 +94,9 @@ void Serve(Options& options) {
   if (!options.traceFile.empty()) {
     options.runtime.recorder = Agentd::TraceTo(options.traceFile);
   }
+  options.runtime.makeMachine = Machines::MachineOf(options.machine);
   Host::HostRuntime& runtime = Host::HostRuntime::Start(options.runtime);
-  const Host::KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+  const Host::KovaService service(runtime.Hooks(), runtime.GetSimulation());
   Agentd::TaskQueue tasks;
   Agentd::Router router(service, tasks);
   Agentd::HttpServer server(

@@ -20,6 +20,7 @@
 #include "bench/Hosts.h"
 #include "host/HostRuntime.h"
 #include "host/LogSink.h"
+#include "machines/SimulatedMachine.h"
 #include "otxctl/fault/CallRecorder.h"
 
 namespace {
@@ -49,10 +50,11 @@ class SocketFolder {
   std::filesystem::path _path;
 };
 
-Host::HostRuntime& StartRuntime(std::shared_ptr<OtxCtl::Fault::CallRecorder> recorder) {
+Host::HostRuntime& StartRuntime(const std::shared_ptr<OtxCtl::Sim::SimHost>& host,
+                                std::shared_ptr<OtxCtl::Fault::CallRecorder> recorder) {
   Tessa::Service::SetDefaultLogger(Host::MakeConsoleLogger(Tessa::Service::LogLevel::Warning));
   Host::RuntimeOptions options;
-  options.hostText = WriteHostDescription(Bench::HostWithDisks(1));
+  options.makeMachine = [host] { return std::make_unique<Machines::SimulatedMachine>(host); };
   options.recorder = std::move(recorder);
   return Host::HostRuntime::Start(options);
 }
@@ -69,7 +71,7 @@ class World {
  public:
   World()
       : _recorder(std::make_shared<OtxCtl::Fault::CallRecorder>()),
-        _runtime(StartRuntime(_recorder)),
+        _runtime(StartRuntime(_host, _recorder)),
         _agent({Agentd::UnixAddress(_folder.PathOf("agent.sock")), AnyPort()}, _runtime),
         _bareUnix(Bench::ToAddress(Agentd::UnixAddress(_folder.PathOf("bare.sock"))), _runtime.Hooks()),
         _bareTcp(Bench::ToAddress(AnyPort()), _runtime.Hooks()) {}
@@ -82,8 +84,7 @@ class World {
 
   // Another host, of so many disks, none of them in use.
   void ReplaceHost(int disks) {
-    _runtime.SimulatedHost().Change(
-        [disks](OtxCtl::Sim::HostDescription& host) { host = Bench::HostWithDisks(disks); });
+    _host->Change([disks](OtxCtl::Sim::HostDescription& host) { host = Bench::HostWithDisks(disks); });
     std::string dropped;
     _runtime.Hooks().getStorageInfo(dropped);  // the plug-in's cache of the disks is older than the host
     _recorder->TakeEnded();
@@ -93,6 +94,8 @@ class World {
   static Agentd::HttpAddress AnyPort() { return Agentd::ParseAddress("tcp:127.0.0.1:0"); }
 
   SocketFolder _folder;
+  const std::shared_ptr<OtxCtl::Sim::SimHost> _host =
+      std::make_shared<OtxCtl::Sim::SimHost>(Bench::HostWithDisks(1));
   std::shared_ptr<OtxCtl::Fault::CallRecorder> _recorder;
   Host::HostRuntime& _runtime;
   Bench::AgentServer _agent;

@@ -2,7 +2,7 @@
 
 #include <cstdio>
 
-#include "host/Inventory.h"
+#include "machines/SimulatedInventory.h"
 #include "nox/Host.h"
 
 namespace Bench {
@@ -32,7 +32,7 @@ OtxCtl::Sim::HostDescription HostWithDisks(int count) {
 
 Tessa::Ref<Orbis::DataArray<Nox::Host::ScsiDisk>> DisksOf(const OtxCtl::Sim::HostDescription& host) {
   const auto disks = Tessa::MakeRef<Orbis::DataArray<Nox::Host::ScsiDisk>>();
-  const auto info = Host::DescribeInventory(host);
+  const auto info = Machines::DescribeInventory(host);
   for (Nox::Host::ScsiLun* unit : *info->GetScsiLun()) {
     disks->Append(dynamic_cast<Nox::Host::ScsiDisk*>(unit));
   }

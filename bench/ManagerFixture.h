@@ -10,6 +10,7 @@
 #include "host/Inventory.h"
 #include "host/LogSink.h"
 #include "kova/agentd/KovaManagerImpl.h"
+#include "machines/SimulatedInventory.h"
 #include "nox/Host.h"
 #include "otxctl/ProviderFactory.h"
 #include "otxctl/sim/SimProvider.h"
@@ -23,7 +24,7 @@ class ManagerFixture {
   explicit ManagerFixture(const OtxCtl::Sim::HostDescription& description)
       : _host(std::make_shared<OtxCtl::Sim::SimHost>(description)) {
     const auto inventory = Tessa::MakeRef<Host::Inventory>();
-    inventory->Replace(Host::DescribeInventory(description));
+    inventory->Replace(Machines::DescribeInventory(description));
     _app.SetObject("storageSystem", inventory);
     Tessa::Service::SetApp(&_app);
     OtxCtl::Kova::SetProviderFactory(

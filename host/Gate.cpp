@@ -2,11 +2,10 @@
 
 #include "host/KnownDisks.h"
 #include "host/Refusal.h"
+#include "host/Simulation.h"
 #include "host/Text.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
-#include "otxctl/sim/HostDescription.h"
-#include "otxctl/sim/HostDescriptionError.h"
 
 namespace Host::Gate {
 
@@ -145,10 +144,10 @@ Ref<DiskMapping> AdmitGroup(const DiskMapping* mapping, const KnownDisks& known)
   return AdmitMapping("mapping", mapping, known, Unknown::LetIn);
 }
 
-void CheckHostChange(std::string_view change) {
+void CheckHostChange(const Simulation& simulation, std::string_view change) {
   try {
-    OtxCtl::Sim::CheckChange(change);
-  } catch (const OtxCtl::Sim::HostDescriptionError& refused) {
+    simulation.CheckChange(change);
+  } catch (const ChangeRefused& refused) {
     RefuseChange(refused.what());
   }
 }

@@ -21,7 +21,8 @@ class KovaInfo;
 
 namespace Host {
 class KnownDisks;
-}
+class Simulation;
+}  // namespace Host
 
 namespace Host::Gate {
 
@@ -79,7 +80,7 @@ void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::K
 void DemandOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel);
 
 // The text of a change of a simulated host, whatever that host is like now.
-void CheckHostChange(std::string_view change);
+void CheckHostChange(const Simulation& simulation, std::string_view change);
 
 // A change of a simulated host that the host would not accept; `error` begins with the path.
 [[noreturn]] void RefuseChange(const std::string& error);

@@ -5,9 +5,10 @@
 
 #include <functional>
 
-#include "host/Inventory.h"
 #include "host/KnownDisks.h"
 #include "host/testing/Requests.h"
+#include "machines/SimulatedInventory.h"
+#include "machines/SimulatedMachine.h"
 #include "otxctl/sim/HostBuilder.h"
 #include "otxctl/sim/SimHost.h"
 
@@ -105,7 +106,7 @@ TEST(GateForRemovals, RefusesAnUnfitNameOrText) {
 class GateWithHost : public testing::Test {
  protected:
   void Serve(const HostBuilder& host) { _host = std::make_unique<SimHost>(host.Build()); }
-  KnownDisks Known() const { return KnownDisks(DescribeInventory(_host->Snapshot())); }
+  KnownDisks Known() const { return KnownDisks(Machines::DescribeInventory(_host->Snapshot())); }
 
   std::string VerdictOnDisks(const Ref<DiskList>& disks) const {
     return VerdictOn([&] { AdmitDisks(*disks, Known()); });
@@ -309,8 +310,9 @@ TEST_F(GateWithHost, RefusesWhatItCannotFindOut) {
 }
 
 TEST(GateForChanges, RefusesATextThatIsNoChangeWhateverTheHost) {
-  EXPECT_EQ(VerdictOn([] { CheckHostChange(R"({"disk": {"name": "nobody"}})"); }), "let in");
-  EXPECT_EQ(VerdictOn([] { CheckHostChange("[]"); }), "document | document: must be an object");
+  const Machines::SimulatedMachine machine(Machines::MachineOptions{});
+  EXPECT_EQ(VerdictOn([&] { CheckHostChange(machine, R"({"disk": {"name": "nobody"}})"); }), "let in");
+  EXPECT_EQ(VerdictOn([&] { CheckHostChange(machine, "[]"); }), "document | document: must be an object");
 }
 
 TEST(GateForChanges, NamesThePathThatTheErrorBeginsWith) {

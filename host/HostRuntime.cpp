@@ -4,26 +4,20 @@
 
 #include "host/CautiousProvider.h"
 #include "host/HostError.h"
+#include "kova/agentd/include/KovaInfo.h"
 #include "nox/Host.h"
 #include "otxctl/ProviderFactory.h"
 #include "otxctl/fault/CallRecorder.h"
 #include "otxctl/fault/RecordingProvider.h"
-#include "otxctl/sim/DefaultHost.h"
-#include "otxctl/sim/SimProvider.h"
-#include "tessa/Logger.h"
 
 namespace Host {
-
-using OtxCtl::Sim::HostDescription;
-using OtxCtl::Sim::SimHost;
 
 namespace {
 
 constexpr const char* storageSystemName = "storageSystem";
 
-std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(const std::shared_ptr<SimHost>& host,
-                                                      const RuntimeOptions& options) {
-  std::unique_ptr<HostCtl::Kova::KovaInfo> provider = std::make_unique<OtxCtl::Sim::SimProvider>(host);
+std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(Machine& machine, const RuntimeOptions& options) {
+  std::unique_ptr<HostCtl::Kova::KovaInfo> provider = machine.MakeProvider();
   if (options.recorder != nullptr) {
     provider = std::make_unique<OtxCtl::Fault::RecordingProvider>(std::move(provider), options.recorder);
   }
@@ -31,13 +25,6 @@ std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider(const std::shared_ptr<SimH
     provider = std::make_unique<CautiousProvider>(std::move(provider));
   }
   return provider;
-}
-
-HostDescription DescribedHost(const RuntimeOptions& options) {
-  if (options.hostText) {
-    return OtxCtl::Sim::ParseHostDescription(*options.hostText);
-  }
-  return options.hostFile.empty() ? OtxCtl::Sim::DefaultHost() : OtxCtl::Sim::LoadHostFile(options.hostFile);
 }
 
 }  // namespace
@@ -49,7 +36,7 @@ HostRuntime& HostRuntime::Start(const RuntimeOptions& options) {
 
 HostRuntime::HostRuntime(const RuntimeOptions& options) : _inventory(Tessa::MakeRef<Inventory>()) {
   _hooks = OpenPlugin(options.pluginFile.empty() ? FindPlugin() : options.pluginFile);
-  LoadHost(options);
+  _machine = options.makeMachine();
   Install(options);
   if (_hooks.init() != 1) {
     Uninstall();
@@ -59,46 +46,25 @@ HostRuntime::HostRuntime(const RuntimeOptions& options) : _inventory(Tessa::Make
 
 void HostRuntime::Install(const RuntimeOptions& options) {
   PublishInventory();
-  _host->SetListener([this] { PublishInventory(); });
+  _machine->SetListener([this] { PublishInventory(); });
   Tessa::Service::SetApp(&_app);
   Tessa::Authorize::AuthorizeManager::SetInstance(Tessa::MakeRef<LocalAuthorization>());
-  OtxCtl::Kova::SetProviderFactory([host = _host, options] { return MakeProvider(host, options); });
+  OtxCtl::Kova::SetProviderFactory([machine = _machine, options] { return MakeProvider(*machine, options); });
 }
 
 void HostRuntime::Uninstall() noexcept {
   OtxCtl::Kova::SetProviderFactory({});
   Tessa::Authorize::AuthorizeManager::SetInstance(nullptr);
   Tessa::Service::SetApp(nullptr);
-  _host->SetListener({});
-  _host->SetSaver({});
-}
-
-void HostRuntime::LoadHost(const RuntimeOptions& options) {
-  if (options.save && (options.hostFile.empty() || options.hostText)) {
-    throw HostError("--save needs a host of your own: name its file with --host");
-  }
-  if (options.save) {
-    _writer.emplace(options.hostFile,
-                    options.syncFolder);  // before reading: nobody else may write from here on
-  }
-  _host = std::make_shared<SimHost>(DescribedHost(options));
-  if (_writer) {
-    _host->SetSaver([this](const HostDescription& changed) { Save(changed); });
-  }
-}
-
-void HostRuntime::Save(const HostDescription& changed) const {
-  if (const std::optional<std::string> warning = _writer->Save(changed)) {
-    Tessa::Service::LogInternal(Tessa::Service::GetDefaultLogger(), Tessa::Service::LogLevel::Warning, "%1",
-                                *warning);
-  }
+  _machine->SetListener({});
 }
 
 void HostRuntime::PublishInventory() {
-  const HostDescription host = _host->Snapshot();
-  _inventory->Replace(DescribeInventory(host));
-  const bool present = host.storageSystem == OtxCtl::Sim::StorageSystem::Present;
-  _app.SetObject(storageSystemName, present ? _inventory : nullptr);
+  const auto info = _machine->GetInventory();
+  if (info) {
+    _inventory->Replace(info);
+  }
+  _app.SetObject(storageSystemName, info ? _inventory : nullptr);
 }
 
 }  // namespace Host

@@ -5,12 +5,8 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <unistd.h>
 
-#include <cerrno>
 #include <cstdio>
-#include <filesystem>
-#include <fstream>
 #include <functional>
 #include <nlohmann/json.hpp>
 
@@ -19,10 +15,12 @@
 #include "host/LogSink.h"
 #include "host/testing/OwnProcess.h"
 #include "host/testing/Requests.h"
+#include "machines/SimulatedMachine.h"
 #include "nox/Kova.h"
 #include "nox/StorageSystem.h"
 #include "orbis/Soap.h"
 #include "otxctl/fault/CallRecorder.h"
+#include "otxctl/provider/ForwardingProvider.h"
 #include "otxctl/sim/HostBuilder.h"
 #include "tessa/Panic.h"
 
@@ -34,6 +32,7 @@ using Nox::Kova::Host::DiskResult;
 using OtxCtl::Sim::AHost;
 using OtxCtl::Sim::HostBuilder;
 using OtxCtl::Sim::HostDescription;
+using OtxCtl::Sim::SimHost;
 using Tessa::Ref;
 using testing::ElementsAre;
 using testing::HasSubstr;
@@ -57,30 +56,18 @@ void InOwnProcess(const std::function<void()>& body, int status = 0,
       status, onStandardError);
 }
 
-// A host in a file that goes with the test.
 class HostRuntimeTest : public testing::Test {
  protected:
-  ~HostRuntimeTest() override {
-    for (const char* ending : {"", ".lock"}) {
-      std::remove((_file + ending).c_str());
-    }
-  }
-
-  RuntimeOptions On(const HostBuilder& host) const {
-    std::ofstream(_file) << WriteHostDescription(host.Build());
+  // Options for a simulated machine, whose host is then at hand.
+  RuntimeOptions On(const HostBuilder& host) {
+    _host = std::make_shared<SimHost>(host.Build());
     RuntimeOptions options;
-    options.hostFile = _file;
+    options.makeMachine = [host = _host] { return std::make_unique<Machines::SimulatedMachine>(host); };
     options.pluginFile = KOVA_PLUGIN;
     return options;
   }
 
-  static RuntimeOptions OnExampleHost() {
-    RuntimeOptions options;
-    options.pluginFile = KOVA_PLUGIN;
-    return options;
-  }
-
-  const std::string _file = testing::TempDir() + "host-runtime-" + std::to_string(getpid()) + ".json";
+  std::shared_ptr<SimHost> _host;
 };
 
 // "NAME STATE" of each disk of an answer.
@@ -110,15 +97,7 @@ std::string WhyNotStarted(const RuntimeOptions& options) {
   }
 }
 
-TEST_F(HostRuntimeTest, ServesTheExampleHostWhenNoneIsNamed) {
-  InOwnProcess([] {
-    const auto disks = Disks(HostRuntime::Start(OnExampleHost()));
-    EXPECT_EQ(disks.size(), 12u);
-    EXPECT_EQ(disks.front(), "naa.5000c50000000100 eligible");
-  });
-}
-
-TEST_F(HostRuntimeTest, ServesTheHostOfAFile) {
+TEST_F(HostRuntimeTest, ServesTheMachineThatItIsGiven) {
   const auto options = On(AHost().WithSsd("naa.1").WithDisk(
       "naa.2", false, [](OtxCtl::Sim::HostDisk& disk) { disk.partitions = 1; }));
   InOwnProcess([&options] {
@@ -126,35 +105,66 @@ TEST_F(HostRuntimeTest, ServesTheHostOfAFile) {
   });
 }
 
-TEST_F(HostRuntimeTest, ServesTheHostOfAText) {
-  auto options = OnExampleHost();
-  options.hostText = WriteHostDescription(AHost().WithSsd("naa.1").Build());
-  InOwnProcess(
-      [&options] { EXPECT_THAT(Disks(HostRuntime::Start(options)), ElementsAre("naa.1 eligible")); });
-  options.hostText = R"({"disks": [{"name": "naa.1", "ssd": 1, "bytes": 1}]})";
+TEST_F(HostRuntimeTest, IsTheSameWhoeverStartsItLater) {
+  const auto options = On(AHost().WithSsd("naa.1"));
   InOwnProcess([&options] {
-    EXPECT_THAT(WhyNotStarted<OtxCtl::Sim::HostDescriptionError>(options), HasSubstr("disks[0].ssd"));
+    HostRuntime& first = HostRuntime::Start(options);
+    EXPECT_EQ(&HostRuntime::Start(RuntimeOptions()), &first);
   });
 }
 
-TEST_F(HostRuntimeTest, DoesNotSaveTheHostOfAText) {
-  auto options = On(AHost().WithSsd("naa.1"));
-  options.hostText = WriteHostDescription(AHost().WithSsd("naa.2").Build());
-  options.save = true;
-  InOwnProcess([&options] { EXPECT_THAT(WhyNotStarted<HostError>(options), HasSubstr("--save")); });
+// What a machine must have, and no more.
+class PlainMachine final : public Machine {
+ public:
+  std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider() override {
+    return std::make_unique<OtxCtl::Provider::ForwardingProvider>();
+  }
+  Ref<Nox::Host::StorageDeviceInfo> GetInventory() override {
+    auto info = Tessa::MakeRef<Nox::Host::StorageDeviceInfo>();
+    info->SetScsiLun(Tessa::MakeRef<Orbis::DataArray<Nox::Host::ScsiLun>>());
+    return info;
+  }
+  void SetListener(Listener) override {}
+};
+
+TEST_F(HostRuntimeTest, ServesAMachineThatIsNotSimulated) {
+  RuntimeOptions options;
+  options.makeMachine = [] { return std::make_unique<PlainMachine>(); };
+  options.pluginFile = KOVA_PLUGIN;
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    EXPECT_EQ(runtime.GetSimulation(), nullptr);
+    EXPECT_THAT(Disks(runtime), ElementsAre());
+    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
+    EXPECT_NO_THROW(service.CheckHostChange("no change"));
+    EXPECT_THROW(service.DescribeHost(), HostError);
+  });
 }
 
-TEST_F(HostRuntimeTest, IsTheSameWhoeverStartsItLater) {
-  InOwnProcess([] {
-    HostRuntime& first = HostRuntime::Start(OnExampleHost());
-    EXPECT_EQ(&HostRuntime::Start(RuntimeOptions()), &first);
+TEST_F(HostRuntimeTest, MakesNoMachineWithoutAPlugin) {
+  RuntimeOptions options;
+  options.pluginFile = "/no/such/plugin.so";
+  options.makeMachine = []() -> std::unique_ptr<Machine> { throw std::logic_error("made too early"); };
+  InOwnProcess(
+      [&options] { EXPECT_THAT(WhyNotStarted<HostError>(options), HasSubstr("/no/such/plugin.so")); });
+}
+
+TEST_F(HostRuntimeTest, LetsTheMachinesOwnRefusalThroughAndMayBeStartedAgain) {
+  auto options = On(AHost().WithSsd("naa.1"));
+  InOwnProcess([&options] {
+    const auto make = std::exchange(options.makeMachine, []() -> std::unique_ptr<Machine> {
+      throw std::domain_error("no such machine");
+    });
+    EXPECT_EQ(WhyNotStarted<std::domain_error>(options), "no such machine");
+    options.makeMachine = make;
+    EXPECT_THAT(Disks(HostRuntime::Start(options)), ElementsAre("naa.1 eligible"));
   });
 }
 
 TEST_F(HostRuntimeTest, RegistersTheInventoryAndKeepsItInLineWithTheHost) {
   const auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
-  InOwnProcess([&options] {
-    HostRuntime& runtime = HostRuntime::Start(options);
+  InOwnProcess([&options, this] {
+    HostRuntime::Start(options);
     const auto count = [] {
       Ref<Nox::Host::StorageSystem> storageSystem;
       Tessa::Service::TryLookupObject("storageSystem", storageSystem);
@@ -163,7 +173,7 @@ TEST_F(HostRuntimeTest, RegistersTheInventoryAndKeepsItInLineWithTheHost) {
       return info->GetScsiLun()->Size();
     };
     EXPECT_EQ(count(), 2u);
-    runtime.SimulatedHost().Change([](HostDescription& host) { host.disks[1].absent = true; });
+    _host->Change([](HostDescription& host) { host.disks[1].absent = true; });
     EXPECT_EQ(count(), 1u);
   });
 }
@@ -171,14 +181,14 @@ TEST_F(HostRuntimeTest, RegistersTheInventoryAndKeepsItInLineWithTheHost) {
 TEST_F(HostRuntimeTest, WithoutAStorageSystemAQueryIsASystemError) {
   const auto options = On(AHost().WithSsd("naa.1").Edit(
       [](HostDescription& host) { host.storageSystem = OtxCtl::Sim::StorageSystem::Missing; }));
-  InOwnProcess([&options] {
+  InOwnProcess([&options, this] {
     HostRuntime& runtime = HostRuntime::Start(options);
     const Answer answer = KovaService(runtime.Hooks()).Query(Op::QueryDisksForKova());
     EXPECT_FALSE(answer.result);
     EXPECT_NE(dynamic_cast<const Orbis::Fault::SystemError*>(answer.fault.Get()), nullptr);
 
     // The object comes, and with it the answer.
-    runtime.SimulatedHost().Change(nlohmann::json{{"storageSystem", "present"}}, nullptr);
+    _host->Change(nlohmann::json{{"storageSystem", "present"}}, nullptr);
     EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible"));
   });
 }
@@ -229,84 +239,23 @@ TEST_F(HostRuntimeTest, RecordsTheCallsOfTheProvider) {
 
 // The gate's own question is the first call, the plug-in's the second.
 TEST_F(HostRuntimeTest, MakesNoGroupOfADiskThatTheKernelCouldNotTellAbout) {
-  auto host =
-      AHost().WithSsd("naa.1").WithDisk("naa.2", false, [](auto& disk) { disk.local = false; }).Build();
-  host.faults = {
-      {.operation = "QueryDisks", .call = 2, .exception = "HostCtlException", .message = {}, .disk = {}}};
-  RuntimeOptions options;
-  options.hostText = WriteHostDescription(host);
-  options.pluginFile = KOVA_PLUGIN;
-  InOwnProcess([&options] {
+  const auto options = On(AHost()
+                              .WithSsd("naa.1")
+                              .WithDisk("naa.2", false, [](auto& disk) { disk.local = false; })
+                              .Edit([](HostDescription& host) {
+                                host.faults = {{.operation = "QueryDisks",
+                                                .call = 2,
+                                                .exception = "HostCtlException",
+                                                .message = {},
+                                                .disk = {}}};
+                              }));
+  InOwnProcess([&options, this] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
     const Answer answer =
         service.Change(Op::InitializeDisks(Testing::Mappings({Testing::MappingOf("naa.1", {"naa.2"})})));
     EXPECT_TRUE(answer.fault);
-    EXPECT_TRUE(runtime.SimulatedHost().Snapshot().groups.empty());
-  });
-}
-
-TEST_F(HostRuntimeTest, SavesEveryChangeIfAskedTo) {
-  auto options = On(AHost().WithSsd("naa.1"));
-  options.save = true;
-  InOwnProcess([&options] {
-    HostRuntime::Start(options).SimulatedHost().Change([](HostDescription& host) { host.name = "changed"; });
-    EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile).name, "changed");
-  });
-}
-
-// File and memory are one, whatever the folder does once the file is in its place.
-TEST_F(HostRuntimeTest, WarnsOfAChangeThatMayNotLastAndKeepsIt) {
-  auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
-  options.save = true;
-  options.syncFolder = [](int) {
-    errno = EIO;
-    return -1;
-  };
-  InOwnProcess(
-      [&options] {
-        HostRuntime& runtime = HostRuntime::Start(options);
-        const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
-        EXPECT_FALSE(service.Change(Op::AddAllEligibleDisks()).fault);
-        EXPECT_EQ(runtime.SimulatedHost().Snapshot().groups.size(), 1u);
-        EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile), runtime.SimulatedHost().Snapshot());
-        FlushLogs();
-      },
-      0, "may not last a power cut: Input/output error");
-}
-
-TEST_F(HostRuntimeTest, LeavesTheFileAloneUnlessAskedTo) {
-  const auto options = On(AHost().WithSsd("naa.1"));
-  InOwnProcess([&options] {
-    HostRuntime::Start(options).SimulatedHost().Change([](HostDescription& host) { host.name = "changed"; });
-    EXPECT_EQ(OtxCtl::Sim::LoadHostFile(options.hostFile).name, "");
-    EXPECT_FALSE(std::filesystem::exists(options.hostFile + ".lock"));
-  });
-}
-
-TEST_F(HostRuntimeTest, RefusesToSaveAHostThatAnotherProgramSaves) {
-  auto options = On(AHost().WithSsd("naa.1"));
-  options.save = true;
-  const OtxCtl::Sim::HostFileWriter other(options.hostFile);
-  InOwnProcess([&options] {
-    EXPECT_THAT(WhyNotStarted<OtxCtl::Sim::HostFileError>(options), HasSubstr(options.hostFile));
-  });
-}
-
-TEST_F(HostRuntimeTest, RefusesToSaveTheExampleHost) {
-  auto options = OnExampleHost();
-  options.save = true;
-  InOwnProcess([&options] { EXPECT_THAT(WhyNotStarted<HostError>(options), HasSubstr("--save")); });
-}
-
-TEST_F(HostRuntimeTest, NamesAHostFileThatIsMissingOrBroken) {
-  auto options = On(AHost().WithSsd("naa.1"));
-  std::ofstream(_file) << R"({"disks": [{"name": "naa.1", "ssd": 1, "bytes": 1}]})";
-  InOwnProcess([&options] {
-    EXPECT_THAT(WhyNotStarted<OtxCtl::Sim::HostFileError>(options),
-                testing::AllOf(HasSubstr(options.hostFile), HasSubstr("disks[0].ssd")));
-    options.hostFile = "/no/such/host.json";
-    EXPECT_THAT(WhyNotStarted<OtxCtl::Sim::HostFileError>(options), HasSubstr("/no/such/host.json"));
+    EXPECT_TRUE(_host->Snapshot().groups.empty());
   });
 }
 
@@ -330,10 +279,10 @@ std::string ToldBy(const Answer& answer) {
 
 TEST_F(HostRuntimeTest, AddsUnmountsClaimsAndRemovesOnTheSimulatedHost) {
   const auto options = On(AHost().WithSsd("naa.1").WithHdds({"naa.2", "naa.3"}));
-  InOwnProcess([&options] {
+  InOwnProcess([&options, this] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
-    const auto groups = [&runtime] { return runtime.SimulatedHost().Snapshot().groups; };
+    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
+    const auto groups = [this] { return _host->Snapshot().groups; };
     EXPECT_EQ(ToldBy(service.Change(Op::AddDisks(Testing::DisksNamed({"naa.1", "naa.2", "naa.3"})))), "done");
     ASSERT_EQ(groups().size(), 1u);
     EXPECT_EQ(ToldBy(service.Change(Op::RemoveDisk("naa.3"))), "done");
@@ -355,14 +304,14 @@ TEST_F(HostRuntimeTest, RefusesTheCacheDiskOfABrokenGroupThatWouldEndThePlugin) 
                               .WithHdds({"naa.2", "naa.3", "naa.4"})
                               .WithUnmountedGroup("naa.1", {"naa.2", "naa.3"})
                               .Without("naa.3"));
-  InOwnProcess([&options] {
+  InOwnProcess([&options, this] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
     EXPECT_THAT(ToldBy(service.Change(Op::AddDisks(Testing::DisksNamed({"naa.1", "naa.4"})))),
                 HasSubstr("'kova:uuid-of-naa.3'"));
     EXPECT_EQ(ToldBy(service.ChangeHost(R"({"disk": {"name": "naa.3", "absent": false}})")), "done");
     EXPECT_EQ(ToldBy(service.Change(Op::AddDisks(Testing::DisksNamed({"naa.1"})))), "done");
-    EXPECT_TRUE(runtime.SimulatedHost().Snapshot().groups[0].mounted);
+    EXPECT_TRUE(_host->Snapshot().groups[0].mounted);
   });
 }
 
@@ -385,7 +334,7 @@ TEST_F(HostRuntimeTest, AChangeOfTheHostIsSeenByTheNextRequest) {
   const auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
   InOwnProcess([&options] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const KovaService service(runtime.Hooks(), &runtime.SimulatedHost());
+    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
     EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible", "naa.2 eligible"));
     EXPECT_EQ(ToldBy(service.ChangeHost(R"({"disk": {"name": "naa.2", "partitions": 1}})")), "done");
     EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible", "naa.2 ineligible"));

@@ -7,10 +7,6 @@
 #include "nox/StorageSystem.h"
 #include "tessa/Ref.h"
 
-namespace OtxCtl::Sim {
-struct HostDescription;
-}
-
 namespace Host {
 
 // The managed object "storageSystem". Holds one inventory, which is replaced as a whole; objects that were
@@ -26,8 +22,5 @@ class Inventory final : public Nox::Host::StorageSystem {
   mutable std::mutex _mutex;
   Tessa::Ref<Nox::Host::StorageDeviceInfo> _info;
 };
-
-// What the agent lists on a simulated host: the disks that have not left it, then the other logical units.
-Tessa::Ref<Nox::Host::StorageDeviceInfo> DescribeInventory(const OtxCtl::Sim::HostDescription& host);
 
 }  // namespace Host

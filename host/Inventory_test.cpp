@@ -3,136 +3,37 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <string>
 #include <thread>
+#include <vector>
 
 #include "nox/Host.h"
-#include "otxctl/sim/HostBuilder.h"
 
 namespace Host {
 namespace {
 
-using Nox::Host::ScsiDisk;
 using Nox::Host::ScsiLun;
 using Nox::Host::StorageDeviceInfo;
-using OtxCtl::Sim::AHost;
-using OtxCtl::Sim::HostDescription;
-using OtxCtl::Sim::HostDisk;
 using Tessa::MakeRef;
 using Tessa::Ref;
 using testing::ElementsAre;
 
-// Canonical names in order; "null" for a null entry.
+Ref<StorageDeviceInfo> ADisk(const std::string& name) {
+  const auto disk = MakeRef<Nox::Host::ScsiDisk>();
+  disk->SetCanonicalName(name);
+  const auto units = MakeRef<Orbis::DataArray<ScsiLun>>();
+  units->Append(disk);
+  const auto info = MakeRef<StorageDeviceInfo>();
+  info->SetScsiLun(units);
+  return info;
+}
+
 std::vector<std::string> NamesOf(const StorageDeviceInfo& info) {
   std::vector<std::string> names;
   for (const ScsiLun* unit : *info.GetScsiLun()) {
-    names.push_back(unit == nullptr ? "null" : unit->GetCanonicalName());
+    names.push_back(unit->GetCanonicalName());
   }
   return names;
-}
-
-// The one disk of a host, as the inventory shows it.
-Ref<ScsiDisk> Listed(const std::function<void(HostDisk&)>& edit) {
-  const auto info = DescribeInventory(AHost().WithDisk("naa.1", true, edit).Build());
-  return Ref<ScsiDisk>(dynamic_cast<ScsiDisk*>((*info->GetScsiLun())[0]));
-}
-
-TEST(Inventory, ShowsWhatADiskMustHave) {
-  const auto disk = Listed([](HostDisk& described) {
-    described.bytes = 4096 * 10 + 4095;
-    described.blockSize = 4096;
-  });
-  ASSERT_TRUE(disk);
-  EXPECT_EQ(disk->GetDeviceName(), "naa.1");
-  EXPECT_EQ(disk->GetDeviceType(), "disk");
-  EXPECT_EQ(disk->GetUuid(), "naa.1");
-  EXPECT_EQ(disk->GetCanonicalName(), "naa.1");
-  EXPECT_EQ(disk->GetLunType(), "disk");
-  EXPECT_THAT(disk->GetOperationalState()->Items(), ElementsAre("ok"));
-  EXPECT_EQ(disk->GetCapacity()->GetBlockSize(), 4096);
-  EXPECT_EQ(disk->GetCapacity()->GetBlock(), 10) << "a block that is not whole does not count";
-  EXPECT_TRUE(disk->GetSsd());
-  EXPECT_TRUE(disk->GetLocal());
-}
-
-TEST(Inventory, LeavesUnsetWhatADiskDoesNotSay) {
-  const auto disk = Listed({});
-  EXPECT_FALSE(disk->HasDisplayName());
-  EXPECT_FALSE(disk->HasVendor());
-  EXPECT_FALSE(disk->HasModel());
-  EXPECT_FALSE(disk->HasSerialNumber());
-  EXPECT_FALSE(disk->HasTransport());
-  EXPECT_FALSE(disk->GetDurableName());
-  EXPECT_TRUE(!disk->GetAlternateName() || disk->GetAlternateName()->IsEmpty());
-  EXPECT_FALSE(disk->GetStandardInquiry());
-  EXPECT_FALSE(disk->GetKovaDiskInfo());
-}
-
-TEST(Inventory, ShowsEverythingThatADiskSays) {
-  const auto disk = Listed([](HostDisk& described) {
-    described.ssd = false;
-    described.local = false;
-    described.transport = "sas";
-    described.vendor = "LAB";
-    described.model = "HDD-4T";
-    described.serial = "S1";
-    described.displayName = "Disk 1";
-    described.durableName = OtxCtl::Sim::DurableName{"t10", "one"};
-    described.alternateName = {{"naa", "two"}, {"eui", "three"}};
-    described.standardInquiry = std::vector<std::uint8_t>{0, 255};
-  });
-  EXPECT_FALSE(disk->GetSsd());
-  EXPECT_FALSE(disk->GetLocal());
-  EXPECT_EQ(disk->GetTransport(), "sas");
-  EXPECT_EQ(disk->GetVendor(), "LAB");
-  EXPECT_EQ(disk->GetModel(), "HDD-4T");
-  EXPECT_EQ(disk->GetSerialNumber(), "S1");
-  EXPECT_EQ(disk->GetDisplayName(), "Disk 1");
-  EXPECT_EQ(disk->GetDurableName()->GetAuthority(), "t10");
-  EXPECT_EQ(disk->GetDurableName()->GetIdentifier(), "one");
-  ASSERT_EQ(disk->GetAlternateName()->Size(), 2u);
-  EXPECT_EQ((*disk->GetAlternateName())[0]->GetAuthority(), "naa");
-  EXPECT_EQ((*disk->GetAlternateName())[1]->GetIdentifier(), "three");
-  EXPECT_THAT(disk->GetStandardInquiry()->GetValue(), ElementsAre(0, 255));
-}
-
-TEST(Inventory, KeepsAnEmptyTransportApartFromNone) {
-  const auto disk = Listed([](HostDisk& described) { described.transport = ""; });
-  ASSERT_TRUE(disk->HasTransport());
-  EXPECT_EQ(disk->GetTransport(), "");
-}
-
-TEST(Inventory, LeavesOutDisksThatHaveLeftOrThatTheAgentDoesNotList) {
-  const auto info =
-      DescribeInventory(AHost()
-                            .WithSsd("naa.1")
-                            .WithDisk("naa.2", false, [](HostDisk& disk) { disk.absent = true; })
-                            .WithDisk("naa.3", false, [](HostDisk& disk) { disk.inInventory = false; })
-                            .WithDisk("naa.4", false, [](HostDisk& disk) { disk.inKernel = false; })
-                            .Build());
-  EXPECT_THAT(NamesOf(*info), ElementsAre("naa.1", "naa.4"));
-}
-
-TEST(Inventory, ListsOtherUnitsBehindTheDisksNamedByKindAndPlace) {
-  const auto info = DescribeInventory(AHost()
-                                          .WithHdds({"naa.2", "naa.1"})
-                                          .Edit([](HostDescription& host) {
-                                            host.otherLuns = {"tape", std::nullopt, "tape", "enclosure"};
-                                          })
-                                          .Build());
-  EXPECT_THAT(NamesOf(*info), ElementsAre("naa.2", "naa.1", "tape0", "null", "tape2", "enclosure3"));
-  const ScsiLun& tape = *(*info->GetScsiLun())[2];
-  EXPECT_EQ(dynamic_cast<const ScsiDisk*>(&tape), nullptr);
-  EXPECT_EQ(tape.GetDeviceName(), "tape0");
-  EXPECT_EQ(tape.GetUuid(), "tape0");
-  EXPECT_EQ(tape.GetDeviceType(), "tape");
-  EXPECT_EQ(tape.GetLunType(), "tape");
-  EXPECT_THAT(tape.GetOperationalState()->Items(), ElementsAre("ok"));
-}
-
-TEST(Inventory, OfAnEmptyHostIsAnEmptyList) {
-  const auto info = DescribeInventory(HostDescription());
-  ASSERT_TRUE(info->GetScsiLun());
-  EXPECT_TRUE(info->GetScsiLun()->IsEmpty());
 }
 
 TEST(Inventory, GivesNothingBeforeItIsFilledAndThenWhatItHoldsNow) {
@@ -141,10 +42,10 @@ TEST(Inventory, GivesNothingBeforeItIsFilledAndThenWhatItHoldsNow) {
   inventory.GetStorageDeviceInfo(seen);
   EXPECT_FALSE(seen);
 
-  inventory.Replace(DescribeInventory(AHost().WithSsd("naa.1").Build()));
+  inventory.Replace(ADisk("naa.1"));
   inventory.GetStorageDeviceInfo(seen);
   const Ref<StorageDeviceInfo> before = seen;
-  inventory.Replace(DescribeInventory(AHost().WithSsd("naa.2").Build()));
+  inventory.Replace(ADisk("naa.2"));
   inventory.GetStorageDeviceInfo(seen);
   EXPECT_THAT(NamesOf(*seen), ElementsAre("naa.2"));
   EXPECT_THAT(NamesOf(*before), ElementsAre("naa.1")) << "what was handed out stays as it was";
@@ -152,10 +53,10 @@ TEST(Inventory, GivesNothingBeforeItIsFilledAndThenWhatItHoldsNow) {
 
 TEST(Inventory, IsReadWhileItIsReplaced) {
   Inventory inventory;
-  inventory.Replace(DescribeInventory(AHost().WithSsd("naa.0").Build()));
+  inventory.Replace(ADisk("naa.0"));
   std::thread writer([&inventory] {
     for (int i = 1; i <= 500; ++i) {
-      inventory.Replace(DescribeInventory(AHost().WithSsd("naa." + std::to_string(i)).Build()));
+      inventory.Replace(ADisk("naa." + std::to_string(i)));
     }
   });
   for (int i = 0; i < 500; ++i) {

@@ -6,6 +6,7 @@
 #include "host/AgentApp.h"
 #include "host/Inventory.h"
 #include "host/testing/Requests.h"
+#include "machines/SimulatedInventory.h"
 #include "otxctl/sim/HostBuilder.h"
 
 namespace Host {
@@ -20,7 +21,7 @@ using Tessa::Ref;
 const std::string uuid = "01234567-89ab-cdef-0123-456789abcdef";
 
 TEST(KnownDisks, AreFoundByTheirCanonicalName) {
-  const KnownDisks known(DescribeInventory(AHost().WithSsd("naa.1").WithHdd("naa.2").Build()));
+  const KnownDisks known(Machines::DescribeInventory(AHost().WithSsd("naa.1").WithHdd("naa.2").Build()));
   EXPECT_TRUE(known.Find("naa.1")->GetSsd());
   EXPECT_FALSE(known.Find("naa.2")->GetSsd());
   EXPECT_FALSE(known.Find("naa.3"));
@@ -82,7 +83,7 @@ TEST(KnownDisks, NowAreThoseOfTheRegisteredStorageSystem) {
   const auto inventory = MakeRef<Inventory>();
   app.SetObject("storageSystem", inventory);
   EXPECT_FALSE(KnownDisks::Now().Find("naa.1")) << "which has no inventory yet";
-  inventory->Replace(DescribeInventory(AHost().WithSsd("naa.1").Build()));
+  inventory->Replace(Machines::DescribeInventory(AHost().WithSsd("naa.1").Build()));
   const KnownDisks known = KnownDisks::Now();
   inventory->Replace(nullptr);
   EXPECT_TRUE(known.Find("naa.1")) << "a snapshot stays as it was";

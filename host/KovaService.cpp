@@ -11,6 +11,7 @@
 #include "host/KnownDisks.h"
 #include "host/Refusal.h"
 #include "host/RequestTexts.h"
+#include "host/Simulation.h"
 #include "host/Text.h"
 #include "host/UnmountedGroups.h"
 #include "host/UnusableDisks.h"
@@ -23,13 +24,11 @@
 #include "nox/Tasks.h"
 #include "orbis/TypeDescriptor.h"
 #include "otxctl/TaskScope.h"
-#include "otxctl/sim/SimHost.h"
 
 namespace Host {
 
 namespace Op = Nox::Operation;
 using Nox::Kova::Host::DiskMapping;
-using OtxCtl::Sim::HostDescription;
 using StorageInfo = Nox::Kova::Host::ConfigInfo::StorageInfo;
 using Tessa::MakeRef;
 using Tessa::Ref;
@@ -265,27 +264,33 @@ Answer KovaService::Change(const Op::Change& request) const {
   return AnswerTo(request, _hooks);
 }
 
-OtxCtl::Sim::SimHost& KovaService::SimulatedHost() const {
-  if (_simulated == nullptr) {
+Simulation& KovaService::Simulated() const {
+  if (_simulation == nullptr) {
     throw HostError("this is no simulated host: there is no description of it");
   }
-  return *_simulated;
+  return *_simulation;
 }
 
 std::string KovaService::DescribeHost() const {
-  return WriteHostDescription(SimulatedHost().Snapshot());
+  return Simulated().Describe();
+}
+
+void KovaService::CheckHostChange(std::string_view change) const {
+  if (_simulation != nullptr) {
+    Gate::CheckHostChange(*_simulation, change);
+  }
 }
 
 Answer KovaService::ChangeHost(const std::string& change) const {
-  OtxCtl::Sim::SimHost& host = SimulatedHost();
+  Simulation& simulation = Simulated();
   return Guarded([&] {
     try {
-      host.Change([&change](HostDescription& described) { ApplyChange(described, change); });
-    } catch (const OtxCtl::Sim::HostDescriptionError& refused) {
+      simulation.Change(change);
+    } catch (const ChangeRefused& refused) {
       Gate::RefuseChange(refused.what());
     }
     // The plug-in's cache of the disks must not be older than the host. This is done out here and not by the
-    // host's listener, which may run inside a hook that holds the plug-in's locks.
+    // machine's listener, which may run inside a hook that holds the plug-in's locks.
     std::string dropped;
     _hooks.getStorageInfo(dropped);
     return Answer();

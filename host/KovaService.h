@@ -9,35 +9,35 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 #include "host/ManagementApi.h"
 #include "host/PluginLoader.h"
 
-namespace OtxCtl::Sim {
-class SimHost;
-}
-
 namespace Host {
 
 class KnownDisks;
+class Simulation;
 
 class KovaService final : public ManagementApi {
  public:
-  // The hooks must be those of an initialised plug-in. `simulated` is the host behind its provider, if that
-  // is a simulated one, and outlives the service; DescribeHost and ChangeHost throw HostError without it.
-  explicit KovaService(const PluginHooks& hooks, OtxCtl::Sim::SimHost* simulated = nullptr)
-      : _hooks(hooks), _simulated(simulated) {}
+  // The hooks must be those of an initialised plug-in. `simulation` is that of the machine behind its
+  // provider, if it has one, and outlives the service; DescribeHost and ChangeHost throw HostError without
+  // it.
+  explicit KovaService(const PluginHooks& hooks, Simulation* simulation = nullptr)
+      : _hooks(hooks), _simulation(simulation) {}
 
   Answer Query(const Nox::Operation::Query& request) const override;
   Answer Change(const Nox::Operation::Change& request) const override;
   std::string DescribeHost() const override;
+  void CheckHostChange(std::string_view change) const override;
   Answer ChangeHost(const std::string& change) const override;
 
  private:
-  OtxCtl::Sim::SimHost& SimulatedHost() const;
+  Simulation& Simulated() const;
 
   PluginHooks _hooks;
-  OtxCtl::Sim::SimHost* _simulated;
+  Simulation* _simulation;
 };
 
 }  // namespace Host

@@ -11,6 +11,8 @@
 #include "host/Inventory.h"
 #include "host/KovaService.h"
 #include "host/testing/Requests.h"
+#include "machines/SimulatedInventory.h"
+#include "machines/SimulatedMachine.h"
 #include "orbis/Soap.h"
 #include "otxctl/ProviderFactory.h"
 #include "otxctl/TaskScope.h"
@@ -118,7 +120,7 @@ class KovaServiceChanges : public testing::Test {
     heard.clear();
     saidFault.clear();
     saidResult.clear();
-    _inventory->Replace(DescribeInventory(_host->Snapshot()));
+    _inventory->Replace(Machines::DescribeInventory(_host->Snapshot()));
     _app.SetObject("storageSystem", _inventory);
     Tessa::Service::SetApp(&_app);
     OtxCtl::Kova::SetProviderFactory(
@@ -133,7 +135,8 @@ class KovaServiceChanges : public testing::Test {
       AHost().WithSsd("naa.1").WithHdds({"naa.2", "naa.3"}).WithUnmountedGroup("naa.1", {"naa.3"}).Build());
   Ref<Inventory> _inventory = MakeRef<Inventory>();
   AgentApp _app;
-  const KovaService _service{Listeners(), _host.get()};
+  Machines::SimulatedMachine _machine{_host};
+  const KovaService _service{Listeners(), _machine.GetSimulation()};
 };
 
 TEST_F(KovaServiceChanges, HandsDisksDownAsTheInventoryKnowsThem) {
@@ -151,7 +154,7 @@ TEST_F(KovaServiceChanges, HandsGroupsDownAsTheInventoryKnowsThem) {
 
 TEST_F(KovaServiceChanges, HandsNoGroupDownThatGrowsBeyondWhatThePluginReads) {
   _host->Change([](HostDescription& host) { host.disks[1].alternateName.resize(27); });
-  _inventory->Replace(DescribeInventory(_host->Snapshot()));
+  _inventory->Replace(Machines::DescribeInventory(_host->Snapshot()));
   static std::size_t bytes;
   PluginHooks hooks = Listeners();
   hooks.unmountDiskMapping = [](const Kovasvc::Texts& texts, const std::string&, std::string&, std::string&) {
@@ -211,7 +214,7 @@ TEST_F(KovaServiceChanges, AnswersWithNothingWhenThePluginSaysNothing) {
 
 TEST_F(KovaServiceChanges, CallsNoHookForWhatTheGateRefuses) {
   _host->Change([](HostDescription& host) { host.disks[2].absent = true; });
-  _inventory->Replace(DescribeInventory(_host->Snapshot()));
+  _inventory->Replace(Machines::DescribeInventory(_host->Snapshot()));
   for (const auto& [answer, told] : std::vector<std::pair<Answer, const char*>>{
            {_service.Change(Op::AddDisks(DisksNamed({"naa.9"}))), "disks[0] | "},
            {_service.Change(Op::AddDisks(DisksNamed({"naa.2", "naa.1"}))), "disks[1] | "},
@@ -244,7 +247,7 @@ TEST_F(KovaServiceChanges, MakesNoGroupWhileTheKernelCannotBeAsked) {
 
 TEST_F(KovaServiceChanges, RemovesAGroupByAnAbsentDiskOnlyIfThatIsItsCacheDisk) {
   _host->Change([](HostDescription& host) { host.disks[0].absent = host.disks[2].absent = true; });
-  _inventory->Replace(DescribeInventory(_host->Snapshot()));
+  _inventory->Replace(Machines::DescribeInventory(_host->Snapshot()));
   for (const char* name : {"kova:uuid-of-naa.3", "kova:01234567-89ab-cdef-0123-456789abcdef", "kova:"}) {
     const Answer answer = _service.Change(Op::RemoveDiskMapping(MappingOf(name, {})));
     EXPECT_THAT(Told(answer.fault.Get()), StartsWith("mapping.ssd | ")) << name;
@@ -320,7 +323,7 @@ TEST_F(KovaServiceChanges, GroupsAreThoseOfStorageInfoAndTheUnmountedOnes) {
     info.SetAutoClaim(true);
     Orbis::SerializeObjectToSoap(info, nullptr, result);
   };
-  const KovaService service(hooks, _host.get());
+  const KovaService service(hooks);
   Answer answer = service.Query(Op::GetDiskGroups());
   const auto* info = dynamic_cast<const Nox::Kova::Host::ConfigInfo::StorageInfo*>(answer.result.Get());
   ASSERT_NE(info, nullptr);

@@ -11,6 +11,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 #include "host/Answer.h"
 #include "nox/Fwd.h"
@@ -34,6 +35,9 @@ class ManagementApi {
 
   // Simulated hosts only. The host's description, as a file would hold it.
   virtual std::string DescribeHost() const = 0;
+  // Throws Orbis::MethodFault::Exception for a text that is no change, whatever the host is like now, where
+  // that can be told without asking an agent.
+  virtual void CheckHostChange(std::string_view change) const { static_cast<void>(change); }
   // Changes it: {"set": {key: value, ..}, "disk": {"name": .., key: value, ..}}, either may be missing. No
   // result; an InvalidArgument fault when the changed host would not be accepted as a file.
   virtual Answer ChangeHost(const std::string& change) const = 0;

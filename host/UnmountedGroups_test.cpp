@@ -3,8 +3,8 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "host/Inventory.h"
 #include "host/KnownDisks.h"
+#include "machines/SimulatedInventory.h"
 #include "nox/Host.h"
 #include "otxctl/sim/HostBuilder.h"
 #include "otxctl/sim/SimHost.h"
@@ -57,7 +57,7 @@ std::vector<std::string> Listed(const StorageInfo& info) {
 StorageInfo InfoAbout(const HostBuilder& builder) {
   SimHost host(builder.Build());
   StorageInfo info;
-  AppendUnlisted(GroupsOf(host), KnownDisks(DescribeInventory(host.Snapshot())), info);
+  AppendUnlisted(GroupsOf(host), KnownDisks(Machines::DescribeInventory(host.Snapshot())), info);
   return info;
 }
 
@@ -73,7 +73,7 @@ TEST(GroupsOfTheKernel, AreAllOfThemAndSayWhetherTheyAreMounted) {
 TEST(UnmountedGroups, StandBehindTheMountedOnes) {
   SimHost host(
       FourDisks().WithGroup("naa.1", {"naa.2"}).WithUnmountedGroup("naa.3", {"naa.4", "naa.5"}).Build());
-  const KnownDisks known(DescribeInventory(host.Snapshot()));
+  const KnownDisks known(Machines::DescribeInventory(host.Snapshot()));
   const std::vector<KernelGroup> groups = GroupsOf(host);
   StorageInfo info;
   AppendUnlisted({groups.front()}, known, info);
@@ -87,7 +87,7 @@ TEST(UnmountedGroups, ThatAreMountedBetweenTheTwoQuestionsAreListed) {
   SimHost host(FourDisks().WithUnmountedGroup("naa.3", {"naa.4"}).Build());
   StorageInfo info;  // which listed nothing
   host.ClaimUnmountedDiskgroups();
-  AppendUnlisted(GroupsOf(host), KnownDisks(DescribeInventory(host.Snapshot())), info);
+  AppendUnlisted(GroupsOf(host), KnownDisks(Machines::DescribeInventory(host.Snapshot())), info);
   EXPECT_THAT(Listed(info), ElementsAre("+naa.3: naa.4"));
 }
 
@@ -95,7 +95,7 @@ TEST(UnmountedGroups, ThatGrewBetweenTheTwoQuestionsAreListedAsTheyWere) {
   const KernelGroup before = GroupOf({"naa.1", ""}, "naa.2");
   KernelGroup after = before;
   after.disks.capacityDisks.push_back({"naa.4", ""});
-  const KnownDisks known(DescribeInventory(FourDisks().Build()));
+  const KnownDisks known(Machines::DescribeInventory(FourDisks().Build()));
   StorageInfo info;
   AppendUnlisted({before}, known, info);
   AppendUnlisted({after}, known, info);
@@ -104,7 +104,7 @@ TEST(UnmountedGroups, ThatGrewBetweenTheTwoQuestionsAreListedAsTheyWere) {
 
 TEST(UnmountedGroups, WhoseCacheDisksHaveLeftDoNotHideEachOther) {
   const auto groupOf = [](const char* uuid, const char* disk) { return GroupOf({"", uuid}, disk); };
-  const KnownDisks known(DescribeInventory(FourDisks().Build()));
+  const KnownDisks known(Machines::DescribeInventory(FourDisks().Build()));
   StorageInfo info;
   const KernelGroup mounted = groupOf("", "naa.4");
   AppendUnlisted({mounted}, known, info);

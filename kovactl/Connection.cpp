@@ -23,11 +23,13 @@ namespace {
 Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
   Tessa::Service::SetDefaultLogger(Host::MakeConsoleLogger(LevelOf(options.logLevel)));
   Tessa::SetPanicHandler(&EndOverPanic);
-  return Host::HostRuntime::Start(options.runtime);
+  Host::RuntimeOptions runtime = options.runtime;
+  runtime.makeMachine = Machines::MachineOf(options.machine);
+  return Host::HostRuntime::Start(runtime);
 }
 
 std::unique_ptr<Host::ManagementApi> ServiceOf(Host::HostRuntime& runtime) {
-  return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.SimulatedHost());
+  return std::make_unique<Host::KovaService>(runtime.Hooks(), runtime.GetSimulation());
 }
 
 // What an agent of that address is asked with.
@@ -64,7 +66,7 @@ std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options) {
 }
 
 std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options) {
-  if (options.runtime.save) {
+  if (options.machine.save) {
     throw BadInput("--save goes with --host; an agent saves its host itself");
   }
   try {
@@ -75,16 +77,15 @@ std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options
 }
 
 std::unique_ptr<Host::ManagementApi> ConnectToCopy(const GlobalOptions& options) {
-  if (options.runtime.save) {
+  if (options.machine.save) {
     throw BadInput("a plan changes nothing, so there is nothing to --save");
   }
   GlobalOptions copy = options;
   if (!options.HostsThePlugIn()) {
-    copy.runtime.hostText = Connect(options)->DescribeHost();
+    copy.machine.description = Connect(options)->DescribeHost();
   }
-  Host::HostRuntime& runtime = StartRuntime(copy);
-  runtime.SimulatedHost().SetWaiter([](std::chrono::milliseconds) {});
-  return ServiceOf(runtime);
+  copy.machine.waitForFaults = false;
+  return ServiceOf(StartRuntime(copy));
 }
 
 Tessa::Service::LogLevel LevelOf(const std::string& name) {

@@ -7,6 +7,7 @@
 #include "agentd/http/HttpClient.h"
 #include "host/HostRuntime.h"
 #include "host/ManagementApi.h"
+#include "machines/Machines.h"
 #include "tessa/Logger.h"
 
 namespace Agentd {
@@ -18,13 +19,14 @@ namespace Kovactl {
 // What all commands share.
 struct GlobalOptions {
   std::string agent = "unix:/run/kova/agentd.sock";
-  Agentd::TlsClientFiles tls;       // as they were given; for an agent that is asked by TLS
-  Agentd::TlsClientFiles usualTls;  // in place of what was not given
-  Host::RuntimeOptions runtime;     // with a host file, the command hosts the plug-in itself
-  std::string output = "table";     // table, json or soap
+  Agentd::TlsClientFiles tls;        // as they were given; for an agent that is asked by TLS
+  Agentd::TlsClientFiles usualTls;   // in place of what was not given
+  Machines::MachineOptions machine;  // with a host file, the command hosts the plug-in itself
+  Host::RuntimeOptions runtime;
+  std::string output = "table";  // table, json or soap
   std::string logLevel = "warning";
 
-  bool HostsThePlugIn() const noexcept { return !runtime.hostFile.empty(); }
+  bool HostsThePlugIn() const noexcept { return !machine.host.empty(); }
 };
 
 // Throws BadInput, and what starting the runtime throws. An agent is not called yet. Once per process.

@@ -10,6 +10,8 @@
 #include "agentd/testing/FakeApi.h"
 #include "agentd/testing/RunningServer.h"
 #include "host/Answer.h"
+#include "host/Gate.h"
+#include "machines/SimulatedMachine.h"
 #include "nox/Faults.h"
 #include "orbis/ParseException.h"
 #include "orbis/Types.h"
@@ -132,6 +134,8 @@ TEST_F(RefusedRoutes, NameAnEmptyKeySoThatItCanBeSeen) {
 }
 
 TEST_F(RefusedRoutes, LeaveNoTask) {
+  const Machines::SimulatedMachine machine(Machines::MachineOptions{});
+  _api.checkChange = [&machine](std::string_view change) { Host::Gate::CheckHostChange(machine, change); };
   for (const char* body : {"", "{", "[]", "1", R"({"disks": 1})", R"({"set": 1})", R"({"disk": {}})",
                            R"({"disk": {"name": 1}})", R"({"set": {}, "set": {}})", R"({"": {}})"}) {
     for (const char* target : {"/api/v1/host", "/api/v1/AddDisks", "/api/v1/RemoveDiskMapping"}) {

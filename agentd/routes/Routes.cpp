@@ -156,7 +156,7 @@ void GetHost(const Call& call) {
 
 // A task like any other: nothing changes the host while a request is at work on it.
 void PostHost(const Call& call) {
-  Host::Gate::CheckHostChange(call.request.body);
+  call.services.api.CheckHostChange(call.request.body);
   call.services.tasks.Submit(
       "ChangeHost", "",
       [&api = call.services.api, change = call.request.body] { return api.ChangeHost(change); },

@@ -10,6 +10,8 @@
 #include "agentd/tasks/TaskQueue.h"
 #include "agentd/testing/FakeApi.h"
 #include "agentd/testing/RunningServer.h"
+#include "host/Gate.h"
+#include "machines/SimulatedMachine.h"
 #include "nox/Faults.h"
 #include "nox/Kova.h"
 #include "orbis/Soap.h"
@@ -245,6 +247,8 @@ TEST_F(TaskRoutes, TooLargeAGroupOrTooLongANameIsRefusedBeforeItWaits) {
 }
 
 TEST_F(TaskRoutes, AChangeOfTheHostThatIsNoneIsNoTask) {
+  const Machines::SimulatedMachine machine(Machines::MachineOptions{});
+  _api.checkChange = [&machine](std::string_view change) { Host::Gate::CheckHostChange(machine, change); };
   for (const char* body : {"", "{", "[]", R"({"set": 1})", R"({"disk": {}})", R"({"colour": {}})"}) {
     EXPECT_EQ(Post("host", body).status, 400u) << body;
   }

@@ -16,6 +16,7 @@ class TaskApi final : public Host::ManagementApi {
   Host::Answer Query(const Nox::Operation::Query& request) const override;
   Host::Answer Change(const Nox::Operation::Change& request) const override { return _host.Change(request); }
   std::string DescribeHost() const override { return _host.DescribeHost(); }
+  void CheckHostChange(std::string_view change) const override { _host.CheckHostChange(change); }
   Host::Answer ChangeHost(const std::string& change) const override { return _host.ChangeHost(change); }
 
  private:

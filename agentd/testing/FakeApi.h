@@ -22,6 +22,8 @@ class FakeApi final : public Host::ManagementApi {
   std::function<void()> onChange;  // called first by every operation that changes disks; may wait or throw
   std::function<void()> onQuery;   // the same by every other
   std::string description;         // empty: the host is not simulated
+  std::function<void(std::string_view change)>
+      checkChange;  // throws for a text that is no change of the host
 
   // The operations so far: "RemoveDisk naa.1 p o 1 2".
   std::vector<std::string> Asked() const {
@@ -43,6 +45,11 @@ class FakeApi final : public Host::ManagementApi {
       throw Host::HostError("this is no simulated host");
     }
     return description;
+  }
+  void CheckHostChange(std::string_view change) const override {
+    if (checkChange) {
+      checkChange(change);
+    }
   }
   Host::Answer ChangeHost(const std::string& change) const override {
     return Changed("ChangeHost " + change);

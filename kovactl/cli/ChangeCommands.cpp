@@ -79,7 +79,7 @@ Consent ConsentOf(bool given) {
 }  // namespace
 
 ChangeOptions OptionsOf(const GlobalOptions& global) {
-  return {.output = global.output, .forgotten = global.HostsThePlugIn() && !global.runtime.save};
+  return {.output = global.output, .forgotten = global.HostsThePlugIn() && !global.machine.save};
 }
 
 void AddChanges(CLI::App& parent,

@@ -23,7 +23,8 @@ void AddReplayCommand(CLI::App& app, CommandLine& line) {
         command->get_option("--log-level")->count() == 0 && app.get_option("--log-level")->count() != 0;
     line.action = [&line, arguments, useCommon] {
       const std::string& level = useCommon ? line.global.logLevel : arguments->level;
-      return RunReplay(line.global.runtime, arguments->file, LevelOf(level), std::cin, std::cout);
+      return RunReplay(line.global.machine, line.global.runtime, arguments->file, LevelOf(level), std::cin,
+                       std::cout);
     };
   });
 }

@@ -6,10 +6,11 @@
 #include <optional>
 
 #include "host/HostError.h"
-#include "host/Inventory.h"
 #include "kova/agentd/planning/pure/AddPlan.h"
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
+#include "machines/SimulatedInventory.h"
+#include "nox/Host.h"
 #include "nox/Kova.h"
 #include "nox/Operations.h"
 #include "otxctl/sim/SimRules.h"
@@ -26,7 +27,7 @@ using NameSet = std::set<std::string>;
 // The names of the disks that the host's agent lists.
 NameSet Listed(const HostDescription& host) {
   NameSet names;
-  const auto inventory = Host::DescribeInventory(host);
+  const auto inventory = Machines::DescribeInventory(host);
   for (const Nox::Host::ScsiLun* unit : *inventory->GetScsiLun()) {
     if (const auto* disk = dynamic_cast<const Nox::Host::ScsiDisk*>(unit)) {
       names.insert(NameOf(*disk));

@@ -14,6 +14,7 @@
 
 #include "host/Answer.h"
 #include "host/LogSink.h"
+#include "host/Simulation.h"
 #include "kovactl/replay/CapturingLogger.h"
 #include "kovactl/replay/ReplayRequest.h"
 #include "kovactl/replay/ReplayTexts.h"
@@ -22,7 +23,6 @@
 #include "orbis/ParseException.h"
 #include "orbis/json/JsonText.h"
 #include "otxctl/fault/CallRecorder.h"
-#include "otxctl/sim/HostDescriptionError.h"
 #include "tessa/Panic.h"
 
 namespace Kovactl {
@@ -72,6 +72,18 @@ void AppendLog(const std::vector<CapturedLine>& lines, std::string& out) {
   }
 }
 
+// As a simulated machine takes it.
+std::string ChangeOf(const ReplayRequest& request) {
+  nlohmann::json change = nlohmann::json::object();
+  if (!request.hostSet.is_null()) {
+    change["set"] = request.hostSet;
+  }
+  if (!request.hostDisk.is_null()) {
+    change["disk"] = request.hostDisk;
+  }
+  return change.dump();
+}
+
 class Replay {
  public:
   Replay(Host::RuntimeOptions options, LogLevel level, std::ostream& out)
@@ -95,7 +107,7 @@ class Replay {
     _faultText.clear();
     _resultText.clear();
     if (request.operation == "host") {
-      _runtime->SimulatedHost().Change(request.hostSet, request.hostDisk);
+      ChangeHost(request);
       TakeNoise();
       Answer({});
       return;
@@ -106,6 +118,14 @@ class Replay {
   }
 
  private:
+  void ChangeHost(const ReplayRequest& request) {
+    Host::Simulation* const simulation = _runtime->GetSimulation();
+    if (simulation == nullptr) {
+      throw Host::ChangeRefused("host: this is no simulated host");
+    }
+    simulation->Change(ChangeOf(request));
+  }
+
   // How the hook ended; empty: as it should.
   std::string Call(ReplayRequest& request) {
     try {
@@ -197,9 +217,9 @@ std::vector<std::pair<int, ReplayRequest>> ReadRequests(const std::string& file,
 
 }  // namespace
 
-ExitStatus RunReplay(Host::RuntimeOptions runtime, const std::string& file, LogLevel level, std::istream& in,
-                     std::ostream& out) {
-  if (runtime.hostFile.empty()) {
+ExitStatus RunReplay(const Machines::MachineOptions& machine, Host::RuntimeOptions runtime,
+                     const std::string& file, LogLevel level, std::istream& in, std::ostream& out) {
+  if (machine.host.empty()) {
     throw BadInput("replay needs a host to run on: name its description with --host");
   }
   std::ifstream opened;
@@ -210,11 +230,12 @@ ExitStatus RunReplay(Host::RuntimeOptions runtime, const std::string& file, LogL
     }
   }
   auto requests = ReadRequests(file, file == "-" ? in : opened);
+  runtime.makeMachine = Machines::MachineOf(machine);
   Replay replay(std::move(runtime), level, out);
   for (auto& [number, request] : requests) {
     try {
       replay.Run(std::move(request));
-    } catch (const OtxCtl::Sim::HostDescriptionError& refused) {
+    } catch (const Host::ChangeRefused& refused) {
       throw BadInput(file + ", line " + std::to_string(number) + ": " + refused.what());
     }
   }

@@ -49,9 +49,9 @@ class ReplayRunner : public testing::Test {
     }));
   }
 
-  Host::RuntimeOptions Runtime() const {
+  Machines::MachineOptions Machine() const { return {.host = _hostFile}; }
+  static Host::RuntimeOptions Runtime() {
     Host::RuntimeOptions options;
-    options.hostFile = _hostFile;
     options.pluginFile = KOVA_PLUGIN;
     return options;
   }
@@ -60,7 +60,7 @@ class ReplayRunner : public testing::Test {
   std::vector<json> Run(const std::string& lines, LogLevel level = LogLevel::Trivia) const {
     std::istringstream in(lines);
     std::ostringstream out;
-    EXPECT_EQ(RunReplay(Runtime(), "-", level, in, out), ExitStatus::Done);
+    EXPECT_EQ(RunReplay(Machine(), Runtime(), "-", level, in, out), ExitStatus::Done);
     std::vector<json> answers;
     std::istringstream answered(out.str());
     for (std::string line; std::getline(answered, line);) {
@@ -73,7 +73,7 @@ class ReplayRunner : public testing::Test {
     std::istringstream in(lines);
     std::ostringstream out;
     try {
-      RunReplay(Runtime(), "-", LogLevel::Trivia, in, out);
+      RunReplay(Machine(), Runtime(), "-", LogLevel::Trivia, in, out);
       return "it ran";
     } catch (const BadInput& refused) {
       if (answered != nullptr) {
@@ -235,7 +235,7 @@ TEST_F(ReplayRunner, APanicIsTheLastAnswerAndEndsTheProcess) {
       [&] {
         std::ofstream out(answerFile);
         std::istringstream none;
-        RunReplay(Runtime(), _requestFile, LogLevel::Trivia, none, out);
+        RunReplay(Machine(), Runtime(), _requestFile, LogLevel::Trivia, none, out);
       },
       panicStatus, "panicked: boom");
   std::ifstream answered(answerFile);
@@ -254,7 +254,7 @@ TEST_F(ReplayRunner, ReadsAFile) {
   InOwnProcess([this] {
     std::istringstream none;
     std::ostringstream out;
-    EXPECT_EQ(RunReplay(Runtime(), _requestFile, LogLevel::Trivia, none, out), ExitStatus::Done);
+    EXPECT_EQ(RunReplay(Machine(), Runtime(), _requestFile, LogLevel::Trivia, none, out), ExitStatus::Done);
     EXPECT_THAT(out.str(), testing::StartsWith(R"({"operation":"QueryDisksForKova")"));
   });
 }
@@ -289,7 +289,7 @@ TEST_F(ReplayRunner, NamesAFileThatCannotBeRead) {
       std::istringstream none;
       std::ostringstream out;
       try {
-        RunReplay(Runtime(), file, LogLevel::Trivia, none, out);
+        RunReplay(Machine(), Runtime(), file, LogLevel::Trivia, none, out);
         ADD_FAILURE() << "it ran";
       } catch (const BadInput& refused) {
         EXPECT_THAT(refused.what(), HasSubstr(file));
@@ -302,7 +302,7 @@ TEST_F(ReplayRunner, NeedsAHost) {
   InOwnProcess([] {
     std::istringstream none;
     std::ostringstream out;
-    EXPECT_THROW(RunReplay({}, "-", LogLevel::Trivia, none, out), BadInput);
+    EXPECT_THROW(RunReplay({}, {}, "-", LogLevel::Trivia, none, out), BadInput);
   });
 }
 

@@ -5,6 +5,7 @@
 
 #include "host/AgentApp.h"
 #include "host/Inventory.h"
+#include "machines/SimulatedInventory.h"
 #include "nox/Host.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
@@ -27,7 +28,7 @@ class ReplayTexts : public testing::Test {
  protected:
   ReplayTexts() : _before(Tessa::Service::SetApp(&_app)) {
     const auto inventory = MakeRef<Host::Inventory>();
-    inventory->Replace(Host::DescribeInventory(AHost().WithSsd("naa.1").WithHdd("naa.2").Build()));
+    inventory->Replace(Machines::DescribeInventory(AHost().WithSsd("naa.1").WithHdd("naa.2").Build()));
     _app.SetObject("storageSystem", inventory);
   }
   ~ReplayTexts() override { Tessa::Service::SetApp(_before); }

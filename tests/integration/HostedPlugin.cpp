@@ -6,6 +6,7 @@
 #include "kova/agentd/KovaLibManager.h"
 #include "kova/agentd/KovaManagerImpl.h"
 #include "kova/agentd/util/KovaUtil.h"
+#include "machines/SimulatedInventory.h"
 #include "nox/Faults.h"
 #include "nox/Host.h"
 #include "orbis/Soap.h"
@@ -187,7 +188,7 @@ HostedPlugin::~HostedPlugin() {
 void HostedPlugin::PublishInventory() {
   const std::lock_guard guard(_publishing);
   const HostDescription host = _host->Snapshot();
-  _inventory->Replace(Host::DescribeInventory(host));
+  _inventory->Replace(Machines::DescribeInventory(host));
   const bool present = host.storageSystem == OtxCtl::Sim::StorageSystem::Present;
   _app.SetObject("storageSystem", present ? Ref<Tessa::Object>(_inventory) : nullptr);
 }

@@ -9,6 +9,7 @@
 #include "kova/agentd/disks/DiskQuery.h"
 #include "kova/agentd/marshal/DiskResultMarshal.h"
 #include "kova/agentd/util/KovaUtil.h"
+#include "machines/SimulatedInventory.h"
 #include "nox/Kova.h"
 #include "orbis/Soap.h"
 #include "otxctl/ProviderFactory.h"
@@ -133,7 +134,7 @@ std::string DescribePlan(Kovasvc::KovaManagerImpl& manager, SimHost& host, Tessa
 std::string OutcomeOf(const HostDescription& description) {
   const auto host = std::make_shared<SimHost>(description);
   const auto inventory = MakeRef<Host::Inventory>();
-  inventory->Replace(Host::DescribeInventory(description));
+  inventory->Replace(Machines::DescribeInventory(description));
   Host::AgentApp app;
   app.SetObject("storageSystem", inventory);
   Tessa::Service::SetApp(&app);

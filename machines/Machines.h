@@ -1,0 +1,29 @@
+// The machines that programs can serve, by what their users ask for.
+//
+// The one place that knows which kinds there are: today, simulated ones. A further kind is a folder or a file
+// beside this one, and its line in MakeMachine.
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "host/Machine.h"
+
+namespace Machines {
+
+// As --host and --save give it.
+struct MachineOptions {
+  std::string host = {};  // file of a host description; empty: the embedded example host
+  // The description itself, instead of a file; it is never saved.
+  std::optional<std::string> description = std::nullopt;
+  bool save = false;          // write every change of the host back to its file
+  bool waitForFaults = true;  // whether delays that the host has on demand are waited for
+};
+
+// Throws Host::HostError, OtxCtl::Sim::HostFileError or OtxCtl::Sim::HostDescriptionError.
+std::unique_ptr<Host::Machine> MakeMachine(const MachineOptions& options);
+
+// The same for a runtime, which makes its machine itself.
+Host::MachineFactory MachineOf(const MachineOptions& options);
+
+}  // namespace Machines

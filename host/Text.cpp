@@ -1,6 +1,6 @@
 #include "host/Text.h"
 
-#include "otxctl/sim/CleanText.h"
+#include "otxctl/provider/CleanText.h"
 
 namespace Host {
 namespace {
@@ -10,7 +10,7 @@ constexpr std::size_t longestCharacter = 4;
 // How many bytes of the front are one clean character; 0 when none are.
 std::size_t CleanPrefix(std::string_view text) {
   for (std::size_t length = 1; length <= longestCharacter && length <= text.size(); ++length) {
-    if (OtxCtl::Sim::IsCleanText(text.substr(0, length))) {
+    if (OtxCtl::Provider::IsCleanText(text.substr(0, length))) {
       return length;
     }
   }
@@ -39,7 +39,7 @@ std::string Printable(std::string_view text) {
 }
 
 bool IsClean(std::string_view text) {
-  return OtxCtl::Sim::IsCleanText(text);
+  return OtxCtl::Provider::IsCleanText(text);
 }
 
 }  // namespace Host

@@ -5,7 +5,6 @@
 #include <cstdio>
 #include <stdexcept>
 
-#include "agentd/client/AgentClient.h"
 #include "host/KovaService.h"
 #include "host/LogSink.h"
 #include "kovactl/ExitStatus.h"

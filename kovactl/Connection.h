@@ -4,15 +4,11 @@
 #include <memory>
 #include <string>
 
-#include "agentd/http/HttpClient.h"
+#include "agentd/client/AgentClient.h"
 #include "host/HostRuntime.h"
 #include "host/ManagementApi.h"
 #include "machines/Machines.h"
 #include "tessa/Logger.h"
-
-namespace Agentd {
-class AgentClient;
-}
 
 namespace Kovactl {
 

@@ -3,7 +3,6 @@
 #include <iostream>
 
 #include "agentd/client/AgentClient.h"
-#include "agentd/http/HttpClient.h"
 #include "host/Build.h"
 #include "host/Text.h"
 #include "kovactl/Print.h"

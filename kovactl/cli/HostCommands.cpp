@@ -1,6 +1,6 @@
 // Commands that make and check host descriptions.
 
-#include "kovactl/HostCommands.h"
+#include "kovactl/sim/HostCommands.h"
 
 #include <iostream>
 

@@ -5,8 +5,8 @@
 #include <unordered_map>
 #include <vector>
 
+#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/Base64.h"
-#include "otxctl/sim/CleanText.h"
 #include "otxctl/sim/HostDescription.h"
 #include "otxctl/sim/HostDescriptionFields.h"
 #include "otxctl/sim/JsonText.h"
@@ -78,11 +78,11 @@ void Read(const json& value, const Place& place, const Rule& rule, std::string& 
   if (read.size() > kLongestText) {
     Refuse(place, "must not be longer than " + std::to_string(kLongestText) + " bytes");
   }
-  if (!IsCleanText(read)) {
+  if (!Provider::IsCleanText(read)) {
     Refuse(place, "must be UTF-8 without control characters");
   }
   if (rule.isKnown != nullptr && !read.empty() && !rule.isKnown(read)) {
-    Refuse(place, Quoted(read) + " is no " + rule.kind);
+    Refuse(place, Provider::Quoted(read) + " is no " + rule.kind);
   }
   text = read;
 }
@@ -153,7 +153,7 @@ class FieldReader {
     }
     for (const auto& [key, value] : _source.items()) {
       if (std::find(_keys.begin(), _keys.end(), key) == _keys.end()) {
-        const std::string clean = Shortened(CleanText(key));
+        const std::string clean = Provider::Shortened(Provider::CleanText(key));
         Refuse(Place{&_place, clean.empty() ? std::string_view("\"\"") : clean}, "is no known key");
       }
     }
@@ -211,7 +211,7 @@ class ReferenceCheck {
     if (!isNew) {
       const Place disk{&_disks, {}, index};
       Refuse(Place{&disk, "name"},
-             Quoted(name) + " is the name of disks[" + std::to_string(other->second) + "] already");
+             Provider::Quoted(name) + " is the name of disks[" + std::to_string(other->second) + "] already");
     }
   }
 
@@ -227,11 +227,11 @@ class ReferenceCheck {
 
   void AddMember(const Place& place, const std::string& name) {
     if (_diskIndex.count(name) == 0) {
-      Refuse(place, "the host has no disk " + Quoted(name));
+      Refuse(place, "the host has no disk " + Provider::Quoted(name));
     }
     const auto [other, isNew] = _members.emplace(name, std::string());
     if (!isNew) {
-      Refuse(place, Quoted(name) + " is in use already by " + other->second);
+      Refuse(place, Provider::Quoted(name) + " is in use already by " + other->second);
     }
     other->second = place.Text();
   }

@@ -3,8 +3,8 @@
 #include <nlohmann/json.hpp>
 #include <type_traits>
 
+#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/Base64.h"
-#include "otxctl/sim/CleanText.h"
 #include "otxctl/sim/HostDescription.h"
 #include "otxctl/sim/HostDescriptionFields.h"
 #include "otxctl/sim/JsonText.h"
@@ -111,7 +111,7 @@ json& FindDisk(json& document, const json& change) {
     }
   }
   throw HostDescriptionError("disk.name: the host has no disk " +
-                             Quoted(CleanText(name.get_ref<const std::string&>())));
+                             Provider::Quoted(Provider::CleanText(name.get_ref<const std::string&>())));
 }
 
 }  // namespace
@@ -146,7 +146,7 @@ json ReadChange(std::string_view change) {
   const std::array<const char*, 2> keys = {"set", "disk"};
   for (const auto& [key, value] : document.items()) {
     if (std::find(keys.begin(), keys.end(), key) == keys.end()) {
-      const std::string clean = Shortened(CleanText(key));
+      const std::string clean = Provider::Shortened(Provider::CleanText(key));
       throw HostDescriptionError((clean.empty() ? "''" : clean) +
                                  ": is no known key; a change has set and disk");
     }

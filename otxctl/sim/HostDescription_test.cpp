@@ -5,7 +5,7 @@
 
 #include <random>
 
-#include "otxctl/sim/CleanText.h"
+#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostBuilder.h"
 #include "tests/support/Seed.h"
 
@@ -18,7 +18,7 @@ std::string ErrorOf(std::string_view text) {
   try {
     ParseHostDescription(text);
   } catch (const HostDescriptionError& error) {
-    EXPECT_TRUE(IsCleanText(error.what())) << error.what();
+    EXPECT_TRUE(Provider::IsCleanText(error.what())) << error.what();
     return error.what();
   }
   return "accepted";

@@ -6,7 +6,7 @@
 #include <nlohmann/json.hpp>
 #include <string>
 
-#include "otxctl/sim/CleanText.h"
+#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostDescriptionError.h"
 
 namespace OtxCtl::Sim {
@@ -19,7 +19,7 @@ std::string ErrorOf(std::string_view text, const JsonLimits& limits = {}) {
   try {
     ParseJsonText(text, limits);
   } catch (const HostDescriptionError& error) {
-    EXPECT_TRUE(IsCleanText(error.what()));
+    EXPECT_TRUE(Provider::IsCleanText(error.what()));
     return error.what();
   }
   return "accepted";

@@ -4,7 +4,7 @@
 #include <limits>
 #include <nlohmann/json.hpp>
 
-#include "otxctl/sim/CleanText.h"
+#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostDescriptionError.h"
 #include "otxctl/sim/JsonText.h"
 
@@ -37,7 +37,7 @@ class DeviceReader {
     if (!value->is_string()) {
       Refuse(_path + "." + key, "must be a text");
     }
-    return CleanText(value->get_ref<const std::string&>());
+    return Provider::CleanText(value->get_ref<const std::string&>());
   }
 
   std::string RequiredText(const char* key) const {

@@ -5,7 +5,7 @@
 
 #include <nlohmann/json.hpp>
 
-#include "otxctl/sim/CleanText.h"
+#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostFile.h"
 #include "otxctl/sim/SimRules.h"
 
@@ -45,7 +45,7 @@ std::string ErrorOf(std::string_view text) {
   try {
     ImportLsblk(text);
   } catch (const HostDescriptionError& error) {
-    EXPECT_TRUE(IsCleanText(error.what()));
+    EXPECT_TRUE(Provider::IsCleanText(error.what()));
     return error.what();
   }
   return "accepted";

@@ -6,7 +6,7 @@
 #include <utility>
 
 #include "kova/agentd/include/HostCtlException.h"
-#include "otxctl/sim/CleanText.h"
+#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/KovaUuid.h"
 
 namespace OtxCtl::Sim {
@@ -48,7 +48,8 @@ constexpr std::array<ReasonRule, 6> kReasons = {{
 template <typename Exception>
 [[noreturn]] void Refuse(const std::string& disk, const std::string& why) {
   // The name comes from a request and may hold anything; the message must not.
-  throw Exception(std::string(kSpeaker) + "disk " + Quoted(CleanText(disk)) + " " + why, disk);
+  throw Exception(std::string(kSpeaker) + "disk " + Provider::Quoted(Provider::CleanText(disk)) + " " + why,
+                  disk);
 }
 
 DiskName NameOf(const HostDisk& disk) {

@@ -48,6 +48,28 @@ class IncludeRules(unittest.TestCase):
         self.assertEqual(reasons("host/testing/Process.h", "#include <gtest/gtest.h>"), [])
         self.assertEqual(len(reasons("host/Gate.h", "#include <gtest/gtest.h>")), 1)
 
+    def test_a_folder_with_a_row_is_none_of_the_folder_around_it(self):
+        self.assertEqual(len(reasons("host/Gate.cpp", '#include "otxctl/sim/SimHost.h"')), 1)
+        self.assertEqual(len(reasons("agentd/http/HttpServer.cpp", '#include "agentd/routes/Routes.h"')), 1)
+        self.assertEqual(len(reasons("orbis/Engine.cpp", '#include "orbis/soap/SoapWriter.h"')), 1)
+        self.assertEqual(reasons("kovactl/change/Change.cpp", '#include "kovactl/Words.h"'), [])
+
+    def test_only_machines_know_the_simulator(self):
+        for path in ["host/HostRuntime.cpp", "agentd/main.cpp", "kovactl/Connection.cpp", "kovactl/replay/ReplayRunner.cpp",
+                     "kova/agentd/KovaManagerImpl.cpp"]:
+            self.assertEqual(len(reasons(path, '#include "otxctl/sim/SimHost.h"')), 1, path)
+            self.assertEqual(len(reasons(path, '#include "machines/SimulatedMachine.h"')), 1, path)
+        self.assertEqual(reasons("machines/SimulatedMachine.cpp", '#include "otxctl/sim/SimHost.h"'), [])
+        self.assertEqual(reasons("agentd/main.cpp", '#include "machines/Machines.h"'), [])
+
+    def test_a_single_header_may_be_named_alone(self):
+        self.assertEqual(reasons("otxctl/sim/SimHost.h", '#include "otxctl/fault/FaultRules.h"'), [])
+        self.assertEqual(len(reasons("otxctl/sim/SimHost.cpp", '#include "otxctl/fault/CallRecorder.h"')), 1)
+
+    def test_the_command_line_knows_an_agent_by_its_client(self):
+        self.assertEqual(reasons("kovactl/Connection.cpp", '#include "agentd/client/AgentClient.h"'), [])
+        self.assertEqual(len(reasons("kovactl/Connection.h", '#include "agentd/http/HttpClient.h"')), 1)
+
     def test_the_line_is_named(self):
         self.assertEqual([n for n, _ in faults_of("tessa/Ref.h", '#pragma once\n#include "nox/Fwd.h"\n')], [2])
 

@@ -1,9 +1,9 @@
-#include "otxctl/sim/CleanText.h"
+#include "otxctl/provider/CleanText.h"
 
 #include <array>
 #include <cstdint>
 
-namespace OtxCtl::Sim {
+namespace OtxCtl::Provider {
 namespace {
 
 constexpr std::size_t kLongestQuote = 120;
@@ -121,4 +121,4 @@ std::string Quoted(std::string_view text) {
   return "\"" + Shortened(text) + "\"";
 }
 
-}  // namespace OtxCtl::Sim
+}  // namespace OtxCtl::Provider

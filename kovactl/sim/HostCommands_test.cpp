@@ -1,4 +1,4 @@
-#include "kovactl/HostCommands.h"
+#include "kovactl/sim/HostCommands.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

@@ -1,4 +1,4 @@
-#include "kovactl/HostCommands.h"
+#include "kovactl/sim/HostCommands.h"
 
 #include <array>
 #include <istream>

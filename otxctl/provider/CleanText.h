@@ -6,7 +6,7 @@
 #include <string>
 #include <string_view>
 
-namespace OtxCtl::Sim {
+namespace OtxCtl::Provider {
 
 // Control characters are U+0000 to U+001F and U+007F to U+009F.
 bool IsCleanText(std::string_view text) noexcept;
@@ -21,4 +21,4 @@ std::string Shortened(std::string_view text);
 // The same in quotes.
 std::string Quoted(std::string_view text);
 
-}  // namespace OtxCtl::Sim
+}  // namespace OtxCtl::Provider

@@ -1,3 +1,5 @@
+#include <cstdint>
+
 #include "otxctl/contract/ProviderContract.h"
 
 namespace OtxCtl::Contract {
@@ -76,9 +78,7 @@ TEST_P(ProviderContract, OneHardDiskMakesAGroupHybrid) {
 
 TEST_P(ProviderContract, AGroupTakesSevenCapacityDisksAndNoMore) {
   Start(AHost().WithSsd("naa.1").WithSsd("naa.2").WithHdds(Numbered(8)));
-  const HostState before = State();
-  EXPECT_THROW(Format("naa.1", Numbered(8)), HostCtlException);
-  EXPECT_EQ(State(), before);
+  Refused<HostCtlException>([&] { Format("naa.1", Numbered(8)); });
   Format("naa.2", Numbered(7));
   EXPECT_EQ(Groups().at(0).capacityDisks.size(), 7U);
 }
@@ -86,11 +86,34 @@ TEST_P(ProviderContract, AGroupTakesSevenCapacityDisksAndNoMore) {
 TEST_P(ProviderContract, TheLimitCountsTheDisksThatAGroupHasAlready) {
   Start(AHost().WithSsd("naa.1").WithHdds(Numbered(9)));
   Format("naa.1", {"naa.hdd0", "naa.hdd1", "naa.hdd2", "naa.hdd3", "naa.hdd4"});
-  const HostState before = State();
-  EXPECT_THROW(Format("naa.1", {"naa.hdd5", "naa.hdd6", "naa.hdd7"}), HostCtlException);
-  EXPECT_EQ(State(), before);
+  Refused<HostCtlException>([&] { Format("naa.1", {"naa.hdd5", "naa.hdd6", "naa.hdd7"}); });
   Format("naa.1", {"naa.hdd5", "naa.hdd6"});
   EXPECT_EQ(Groups().at(0).capacityDisks.size(), 7U);
+}
+
+TEST_P(ProviderContract, AGroupNeedsACapacityDisk) {
+  Start(AHost().WithSsd("naa.1").WithSsd("naa.2").WithHdd("naa.3"));
+  Format("naa.2", {"naa.3"});
+  Refused<HostCtlException>([&] { Format("naa.1", {}); });
+  Refused<HostCtlException>([&] { Format("naa.2", {}); });
+}
+
+TEST_P(ProviderContract, ADiskThatWillNotDoIsNamedBeforeTheNumberOfDisks) {
+  Start(AHost().WithSsd("naa.1").WithHdds(Numbered(8)));
+  Names tooMany = Numbered(8);
+  tooMany.emplace_back("naa.nowhere");
+  EXPECT_EQ(Refused<KovaStorageException>([&] { Format("naa.1", tooMany); }).GetDiskName(), "naa.nowhere");
+}
+
+TEST_P(ProviderContract, WhatARequestBringsAlongChangesNothingOfTheGroup) {
+  for (const HostCtl::Kova::FormatContext& context : {HostCtl::Kova::FormatContext{"", 0, 0},
+                                                      {std::string(4096, 'x'), INT32_MAX, INT32_MIN},
+                                                      {"\xFF", 1, 7}}) {
+    Start(AHost().WithSsd("naa.1").WithHdd("naa.2"));
+    Provider().FormatDiskMapping("naa.1", {"naa.2"}, context);
+    ASSERT_EQ(Groups(false).size(), 1U);
+    EXPECT_THAT(NamesOf(Groups()[0]), ElementsAre("naa.1", "naa.2"));
+  }
 }
 
 // The host of the refusals: one group, a partitioned disk, and three free disks.
@@ -193,7 +216,7 @@ TEST_P(ProviderContract, EveryProviderOfAHostSeesTheSameDisks) {
     const auto other = AnotherProvider();
     other->FormatDiskMapping("naa.1", {"naa.2"}, {"", 1, 0});
   }
-  EXPECT_EQ(Groups().size(), 1U);
+  EXPECT_EQ(Groups().size(), 1U) << "also when the provider that made it is gone";
 }
 
 }  // namespace

@@ -75,6 +75,22 @@ TEST_P(ProviderContract, MountingBringsARestampedGroupBackAsItWas) {
   EXPECT_EQ(RecordOf("naa.3").state, DiskState::InUse);
 }
 
+TEST_P(ProviderContract, MountingAMountedGroupIsNoError) {
+  Start(TwoCacheDisksAndTwoOthers());
+  Format("naa.1", {"naa.3"});
+  const HostState before = State();
+  EXPECT_NO_THROW(Provider().MountDiskMapping("naa.1", true));
+  EXPECT_EQ(State(), before);
+}
+
+TEST_P(ProviderContract, RestampingAMountedGroupChangesNothingThatShows) {
+  Start(TwoCacheDisksAndTwoOthers());
+  Format("naa.1", {"naa.3"});
+  const HostState before = State();
+  Provider().RestampDiskMapping("naa.1", {"naa.3"});
+  EXPECT_EQ(State(), before);
+}
+
 TEST_P(ProviderContract, AGroupIsNamedByItsCacheDiskAlone) {
   Start(TwoCacheDisksAndTwoOthers());
   Format("naa.1", {"naa.3"});
@@ -99,7 +115,8 @@ TEST_P(ProviderContract, RestampsAGroupByTheIdentityOfItsAbsentCacheDisk) {
   EXPECT_NO_THROW(Provider().RestampDiskMappingByUuid("uuid-of-naa.1"));
   EXPECT_EQ(State(), before);
   for (const std::string uuid : {"uuid-of-naa.3", "uuid-of-nobody", ""}) {
-    Refused<KovaStorageException>([&] { Provider().RestampDiskMappingByUuid(uuid); });
+    const auto refusal = Refused<KovaStorageException>([&] { Provider().RestampDiskMappingByUuid(uuid); });
+    EXPECT_EQ(refusal.GetDiskName(), uuid);
   }
 }
 
@@ -111,6 +128,9 @@ TEST_P(ProviderContract, ClaimingMountsEveryGroup) {
   Provider().UnmountDiskMapping("naa.2");
   Provider().ClaimUnmountedDiskgroups();
   EXPECT_EQ(Groups(false).size(), 2U);
+  const HostState claimed = State();
+  EXPECT_NO_THROW(Provider().ClaimUnmountedDiskgroups());
+  EXPECT_EQ(State(), claimed) << "mounted groups stay as they are";
 }
 
 TEST_P(ProviderContract, ClaimingOnAHostWithNothingToClaimIsNoError) {

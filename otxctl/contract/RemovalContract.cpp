@@ -1,3 +1,5 @@
+#include <cstdint>
+
 #include "otxctl/contract/ProviderContract.h"
 
 namespace OtxCtl::Contract {
@@ -82,6 +84,26 @@ TEST_P(ProviderContract, OnlyDisksOfGroupsCanBeRemoved) {
   }
 }
 
+TEST_P(ProviderContract, WhatARemovalBringsAlongChangesNothingOfIt) {
+  for (const RemovalOptions& options :
+       {RemovalOptions{}, {std::string(4096, 'x'), INT32_MAX, INT32_MIN}, {"\xFF", -1, 1}}) {
+    Start(ThreeDisks());
+    Format("naa.1", {"naa.2", "naa.3"});
+    Provider().RemoveDisk("naa.2", options.text, options);
+    EXPECT_THAT(NamesOf(Groups().at(0)), ElementsAre("naa.1", "naa.3"));
+    Provider().RemoveDiskMapping("naa.1", options.text, options);
+    EXPECT_THAT(Groups(), IsEmpty());
+  }
+}
+
+TEST_P(ProviderContract, AnAbsentDiskIsNotRemovedByItsOldName) {
+  if (!Can().absentDisks || !Can().groupsFromStart) {
+    GTEST_SKIP() << "disks of this host cannot leave";
+  }
+  Start(ThreeDisks().WithGroup("naa.1", {"naa.2", "naa.3"}).Without("naa.2"));
+  Refused<KovaStorageException>([&] { Provider().RemoveDisk("naa.2", "", kOptions); });
+}
+
 TEST_P(ProviderContract, OnlyTheCacheDiskOfAGroupNamesAMappingToRemove) {
   Start(ThreeDisks());
   Format("naa.1", {"naa.2"});
@@ -157,7 +179,9 @@ TEST_P(ProviderContract, TheLastCapacityDiskStaysEvenWhenItIsAbsent) {
     GTEST_SKIP() << "disks of this host cannot leave";
   }
   Start(ThreeDisks().WithGroup("naa.1", {"naa.2"}).Without("naa.2"));
-  Refused<KovaExceptionLastRemainingHDD>([&] { Provider().RemoveDiskByUuid("uuid-of-naa.2", ""); });
+  const auto refusal =
+      Refused<KovaExceptionLastRemainingHDD>([&] { Provider().RemoveDiskByUuid("uuid-of-naa.2", ""); });
+  EXPECT_EQ(refusal.GetDiskName(), "uuid-of-naa.2");
 }
 
 TEST_P(ProviderContract, OnlyAbsentDisksAreRemovedByIdentity) {
@@ -167,7 +191,8 @@ TEST_P(ProviderContract, OnlyAbsentDisksAreRemovedByIdentity) {
   Start(ThreeDisks().WithGroup("naa.1", {"naa.2", "naa.3"}).Without("naa.2"));
   for (const std::string uuid : {"uuid-of-naa.3", "uuid-of-naa.1", "uuid-of-nobody", ""}) {
     SCOPED_TRACE(uuid);
-    Refused<KovaStorageException>([&] { Provider().RemoveDiskByUuid(uuid, ""); });
+    const auto refusal = Refused<KovaStorageException>([&] { Provider().RemoveDiskByUuid(uuid, ""); });
+    EXPECT_EQ(refusal.GetDiskName(), uuid);
   }
 }
 

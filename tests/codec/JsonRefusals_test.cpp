@@ -261,10 +261,11 @@ TEST(MissingFields, TakeTheValuesOfANewObjectWhenThatIsWanted) {
 }
 
 TEST(MissingFields, AreTheOnlyThingThatIsForgiven) {
-  ExpectRefused(
-      {"unknown key", "{\"colour\": \"red\"}", "colour", 1, "unknown field"}, [](const std::string& text) {
-        return Orbis::ReadJson(text, untrusted, &Nox::Host::ScsiDisk::StaticType(), {.missing = Missing::Default});
-      });
+  ExpectRefused({"unknown key", "{\"colour\": \"red\"}", "colour", 1, "unknown field"},
+                [](const std::string& text) {
+                  return Orbis::ReadJson(text, untrusted, &Nox::Host::ScsiDisk::StaticType(),
+                                         {.missing = Missing::Default});
+                });
 }
 
 class CutJson : public ::testing::TestWithParam<std::string> {};

@@ -20,7 +20,7 @@ RULES = {
     "nox": ["tessa", "orbis"],
     "kova/agentd/include": [],
     "kova/agentd/planning/pure": [],
-    "kova/agentd": ["tessa", "orbis", "nox", "kova/agentd/include"],
+    "kova/agentd": ["tessa", "orbis", "nox", "kova/agentd/include", "kova/agentd/disks", "kova/agentd/util"],
     "kova/agentd/util": ["tessa", "orbis", "nox"],
     "kova/agentd/disks": ["tessa", "orbis", "nox", "kova/agentd/include"],
     "kova/agentd/marshal": ["tessa", "orbis", "nox", "kova/agentd/include", "kova/agentd/disks", "kova/agentd/util"],

@@ -1,5 +1,6 @@
 #include "host/Answer.h"
 
+#include <optional>
 #include <utility>
 
 #include "nox/Kova.h"
@@ -40,9 +41,43 @@ Ref<Orbis::MethodFault> ReadFault(const std::string& text) {
 
 using GroupResults = Orbis::DataArray<Nox::Kova::Host::DiskMapResult>;
 
+// The groups of a change's result, and how many of them failed; all 0 for a result of another kind.
+struct GroupCounts {
+  std::size_t all = 0;
+  std::size_t failed = 0;
+};
+
+GroupCounts CountGroups(const Result& result) {
+  GroupCounts counts;
+  if (const auto* const groups = dynamic_cast<const GroupResults*>(result.Get())) {
+    for (const Nox::Kova::Host::DiskMapResult* group : *groups) {
+      ++counts.all;
+      counts.failed += group->GetError() ? 1 : 0;
+    }
+  }
+  return counts;
+}
+
+// The same of a text that is as the plug-in's writer writes it, without reading it.
+std::optional<Orbis::ItemsOfSoap> ItemsOf(const Result& result) {
+  return result.GetText() == nullptr ? std::nullopt : Orbis::CountItemsOfSoap(*result.GetText(), "error");
+}
+
 bool HoldsNothing(const Result& result) {
+  if (const auto items = ItemsOf(result)) {
+    return items->all == 0;
+  }
   const auto* const list = dynamic_cast<const Orbis::DataArrayBase*>(result.Get());
   return !result || (list != nullptr && list->IsEmpty());
+}
+
+GroupCounts GroupsOf(const Result& result) {
+  const auto items = ItemsOf(result);
+  if (!items) {
+    return CountGroups(result);
+  }
+  const bool isGroups = items->list == &GroupResults::StaticType();
+  return isGroups ? GroupCounts{.all = items->all, .failed = items->withField} : GroupCounts{};
 }
 
 }  // namespace
@@ -70,15 +105,9 @@ Outcome OutcomeOf(const Answer& answer) {
   if (IsFaultAlone(answer)) {
     return Outcome::Failed;
   }
-  const auto* const groups = dynamic_cast<const GroupResults*>(answer.result.Get());
-  if (groups != nullptr && !groups->IsEmpty()) {
-    std::size_t failed = 0;
-    for (const Nox::Kova::Host::DiskMapResult* group : *groups) {
-      failed += group->GetError() ? 1 : 0;
-    }
-    if (failed != 0) {
-      return failed == groups->Size() ? Outcome::Failed : Outcome::Partly;
-    }
+  const GroupCounts groups = GroupsOf(answer.result);
+  if (groups.failed != 0) {
+    return groups.failed == groups.all ? Outcome::Failed : Outcome::Partly;
   }
   return answer.fault ? Outcome::Partly : Outcome::Done;
 }

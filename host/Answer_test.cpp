@@ -205,6 +205,24 @@ TEST(Outcome, IsDoneWithoutAFault) {
   }
 }
 
+TEST(Outcome, IsTheSameOfATextAsOfAnObject) {
+  for (const auto& failed :
+       std::vector<std::vector<bool>>{{}, {false}, {true}, {true, false}, {true, true}}) {
+    for (const auto& fault : {Ref<SystemError>(), MakeRef<SystemError>("no")}) {
+      const Answer object{.result = Groups(failed), .fault = fault};
+      const Answer text{.result = Result::OfText(Soap(*Groups(failed))), .fault = fault};
+      EXPECT_EQ(OutcomeOf(text), OutcomeOf(object)) << failed.size();
+      EXPECT_EQ(IsFaultAlone(text), IsFaultAlone(object)) << failed.size();
+    }
+  }
+}
+
+TEST(Outcome, OfATextThatThePluginDidNotWriteIsThatOfItsObject) {
+  std::string text = Soap(*Groups({true, false}));
+  text.insert(text.find("?>") + 2, "\n<!-- by hand -->\n");
+  EXPECT_EQ(OutcomeOf({.result = Result::OfText(text), .fault = nullptr}), Outcome::Partly);
+}
+
 TEST(Outcome, OfAQueryIsKnownWithoutALookIntoItsResult) {
   const Result unreadable = Result::OfText("<object");
   const auto fault = MakeRef<SystemError>("no");

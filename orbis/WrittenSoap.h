@@ -7,6 +7,8 @@
 // Threads: any.
 #pragma once
 
+#include <cstddef>
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -21,5 +23,15 @@ TESSA_API bool AppendJsonOfSoap(std::string_view text, std::string& out);
 // text must be that of a list of exactly that type.
 TESSA_API bool AppendMessageOfSoap(std::string_view name, std::string_view field, const TypeDescriptor& list,
                                    std::string_view text, std::string& out);
+
+struct ItemsOfSoap {
+  const TypeDescriptor* list;  // the type of the list
+  std::size_t all = 0;
+  std::size_t withField = 0;
+};
+
+// How many items the text's list holds, and how many of them have that field. Nothing when it is no list, or
+// no text as the writer writes it.
+TESSA_API std::optional<ItemsOfSoap> CountItemsOfSoap(std::string_view text, std::string_view field);
 
 }  // namespace Orbis

@@ -163,8 +163,10 @@ void TaskQueue::Run(Entry& entry) {
 
 std::pair<Host::Answer, Host::Outcome> TaskQueue::Carry(const Entry& entry) {
   try {
-    const Host::Answer answer = entry.work();
-    return {answer, OutcomeOf(Host::Answer(answer))};  // read in a copy: the task keeps the text alone
+    Host::Answer answer = entry.work();
+    const Host::Outcome outcome =
+        OutcomeOf(Host::Answer(answer));  // of a copy: the task keeps the text alone
+    return {std::move(answer), outcome};
   } catch (const std::exception& exception) {
     return {Host::FailedWith(exception.what()), Host::Outcome::Failed};
   } catch (...) {

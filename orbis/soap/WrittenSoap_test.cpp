@@ -126,5 +126,29 @@ TEST(WrittenSoap, LeavesToTheReaderWhatTheWriterDoesNotWrite) {
   }
 }
 
+TEST(CountItemsOfSoap, CountsItemsAndThoseThatHaveTheFieldThemselves) {
+  const auto counted = CountItemsOfSoap(Written(*TrickyPairs()), "value");
+  ASSERT_TRUE(counted);
+  EXPECT_EQ(counted->list, &PairsType());
+  EXPECT_EQ(counted->all, 2u);
+  EXPECT_EQ(counted->withField, 2u);
+  EXPECT_EQ(CountItemsOfSoap(Written(*TrickyPairs()), "item")->withField, 0u) << "those stand deeper";
+}
+
+TEST(CountItemsOfSoap, CountsNoneOfAnEmptyListAndTextsOfAListOfTexts) {
+  EXPECT_EQ(CountItemsOfSoap(Written(Pairs()), "value")->all, 0u);
+  EXPECT_EQ(CountItemsOfSoap(Written(TextList({"a", "", "<b>"})), "value")->all, 3u);
+}
+
+TEST(CountItemsOfSoap, CountsNothingOfWhatIsNoList) {
+  const std::string text = Written(*TrickyPairs());
+  for (const std::string& other :
+       {std::string(), std::string("rubbish"), Written(*APair("a", MakeRef<TextList>())), text + "\n",
+        text.substr(0, text.size() / 2), Replaced(text, "</object>", "</item></object>"),
+        Replaced(text, "KeyAnyValueList", "NoType")}) {
+    EXPECT_FALSE(CountItemsOfSoap(other, "value")) << other;
+  }
+}
+
 }  // namespace
 }  // namespace Orbis

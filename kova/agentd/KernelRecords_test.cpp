@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "kova/agentd/disks/DiskQuery.h"
+#include "kova/agentd/include/HostCtlException.h"
 #include "kova/agentd/include/KovaNetwork.h"
 #include "kova/agentd/include/KovaRecords.h"
 #include "kova/agentd/marshal/StatusTexts.h"
@@ -50,6 +51,37 @@ TEST(KernelRecords, HaveTheirFieldsInTheKernelsOrder) {
                          cluster.text1, cluster.text2, cluster.text3, cluster.text4, cluster.text5));
   const KovaIpAddress address;
   EXPECT_TRUE(BeginsWith(address, address.isIpv6, address.ipv4, address.ipv6));
+}
+
+// Whoever fills a record leaves out what does not concern him.
+TEST(KernelRecords, HoldNothingWhileNobodyFillsThem) {
+  const DiskMapping group;
+  EXPECT_EQ(group.formatVersion, 0);
+  EXPECT_FALSE(group.allFlash || group.thirdFlag);
+  const DiskResult disk;
+  EXPECT_FALSE(disk.isSsd || disk.isPdl || disk.thirdFlag || disk.capacityFlash);
+  EXPECT_EQ(disk.formatVersion, 0);
+  const FormatContext format;
+  EXPECT_EQ(format.mappingCount, 0);
+  EXPECT_EQ(format.mappingIndex, 0);
+  const RemovalOptions options;
+  EXPECT_EQ(options.first, 0);
+  EXPECT_EQ(options.second, 0);
+  EXPECT_FALSE(KovaClusterInfoDetailed().enabled);
+  EXPECT_FALSE(KovaIpAddress().isIpv6);
+}
+
+TEST(KernelExceptions, CarryADetailAndAnEventBesideTheMessage) {
+  const HostCtl::Lib::EvtMessage event{.id = "event", .arguments = {"argument"}};
+  const HostCtl::Lib::HostCtlException exception("message", "detail", event);
+  EXPECT_EQ(exception.GetDetail(), "detail");
+  EXPECT_EQ(exception.GetEvent().id, "event");
+  EXPECT_EQ(exception.GetEvent().arguments, event.arguments);
+}
+
+TEST(KernelRecords, OfEligibleDisksAreAskedForWithoutTheFlagThatNobodyReads) {
+  EXPECT_TRUE(Kovasvc::DiskQueryLimit().fifthFlag);
+  EXPECT_FALSE(Kovasvc::eligibleDisks.fifthFlag);
 }
 
 TEST(KernelRecords, AreFilteredByALimitWhoseFieldsStandInOrder) {

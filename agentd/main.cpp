@@ -105,7 +105,7 @@ void Serve(Options& options) {
         router.Serve(request, responder);
       },
       [&router](const Agentd::HttpRequest& head) { return router.Admit(head); });
-  server.OnRefusal(&Agentd::ToldAt);
+  server.OnRefusal(&Agentd::EncodeRefusal);
   router.OnLoad([&server] { return server.Now(); });
   server.OnStopping([&tasks] { tasks.Close(); });
   WriteReadyFile(options.readyFile, server.Addresses());

@@ -63,21 +63,21 @@ Tessa::Ref<Nox::Kova::Host::DiskMapping> AdmitGroup(const Nox::Kova::Host::DiskM
 // Disks as AdmitDisks lets them in: a cache disk of a group that is not mounted brings its whole group along,
 // and the plug-in cannot bear a member that the inventory lacks. Refuses the disk and names the member. A
 // kernel that cannot be asked is a SystemError, thrown as well.
-void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel);
+void RequireWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel);
 
 // The kernel must be able to tell about its disks before groups are made: the plug-in takes one that fails
 // for one without disks to refuse. A SystemError otherwise.
-void DemandAnswers(HostCtl::Kova::KovaInfo& kernel);
+void RequireAnswers(HostCtl::Kova::KovaInfo& kernel);
 
 // A group to be removed whose cache disk is named as one that has left: the kernel must have a group of that
 // cache disk, for it would take out any other absent disk of that name just as well. Nothing is asked about
 // other groups.
-void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::Kova::KovaInfo& kernel);
+void RequireGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::Kova::KovaInfo& kernel);
 
 // A disk to be taken out that is named as one that has left: no other disk that has left may bear the same
 // UUID, as copies of one disk do, for the kernel would take out any of them, and a cache disk's group with
 // it. `place` is where the request names it. Nothing is asked about other disks.
-void DemandOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel);
+void RequireOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel);
 
 // The text of a change of a simulated host, whatever that host is like now.
 void CheckHostChange(const Simulation& simulation, std::string_view change);

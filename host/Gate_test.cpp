@@ -34,7 +34,7 @@ std::string VerdictOn(const std::function<void()>& check) {
     check();
     return "let in";
   } catch (const Orbis::MethodFault::Exception& refused) {
-    return Told(refused.GetFault().Get());
+    return OutcomeText(refused.GetFault().Get());
   }
 }
 
@@ -117,7 +117,7 @@ class GateWithHost : public testing::Test {
   std::string VerdictOnWholeGroups(const Names& names) {
     return VerdictOn([&] {
       const KnownDisks known = Known();
-      DemandWholeGroups(*AdmitDisks(*DisksNamed(names), known), known, *_host);
+      RequireWholeGroups(*AdmitDisks(*DisksNamed(names), known), known, *_host);
     });
   }
 
@@ -266,7 +266,7 @@ TEST_F(GateWithHost, RefusesAFlaggedCacheDiskThatTheInventoryLacksItself) {
             .WithDisk("naa.1", true, [](OtxCtl::Sim::HostDisk& disk) { disk.inInventory = false; })
             .WithHdd("naa.2")
             .WithUnmountedGroup("naa.1", {"naa.2"}));
-  EXPECT_THAT(VerdictOn([&] { DemandWholeGroups(*Disks({ADisk("naa.1", true)}), Known(), *_host); }),
+  EXPECT_THAT(VerdictOn([&] { RequireWholeGroups(*Disks({ADisk("naa.1", true)}), Known(), *_host); }),
               HasSubstr("'naa.1'"));
 }
 

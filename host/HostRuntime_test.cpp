@@ -274,7 +274,7 @@ TEST_F(HostRuntimeTest, APluginThatCannotBeInitialisedLeavesNothingBehind) {
 
 // The whole way through the gate and the real plug-in, and back.
 std::string ToldBy(const Answer& answer) {
-  return Testing::Told(answer.fault.Get());
+  return Testing::OutcomeText(answer.fault.Get());
 }
 
 TEST_F(HostRuntimeTest, AddsUnmountsClaimsAndRemovesOnTheSimulatedHost) {

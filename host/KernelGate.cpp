@@ -21,7 +21,7 @@ namespace {
 using Positions = std::unordered_map<std::string, std::size_t>;
 
 // Which of the flash disks belong to groups that are not mounted, as the kernel says; and where each stands.
-Positions CacheDisksOffline(const DiskList& disks, HostCtl::Kova::KovaInfo& kernel) {
+Positions CacheDisksUnmounted(const DiskList& disks, HostCtl::Kova::KovaInfo& kernel) {
   Positions flash;
   std::vector<std::string> names;
   for (std::size_t i = 0; i < disks.Size(); ++i) {
@@ -34,14 +34,14 @@ Positions CacheDisksOffline(const DiskList& disks, HostCtl::Kova::KovaInfo& kern
   }
   std::vector<HostCtl::Kova::DiskResult> records;
   kernel.QueryDisks(names, records, true);
-  Positions offline;
+  Positions unmounted;
   for (const HostCtl::Kova::DiskResult& record : records) {
     const auto at = flash.find(record.name);
     if (record.isSsd && record.reason == HostCtl::Kova::DiskReason::GroupNotMounted && at != flash.end()) {
-      offline.insert(*at);
+      unmounted.insert(*at);
     }
   }
-  return offline;
+  return unmounted;
 }
 
 // How requests name one of the kernel's disks when the inventory lacks it; empty when it does not.
@@ -107,17 +107,17 @@ void AskOrFail(const char* what, Work ask) {
 
 }  // namespace
 
-void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel) {
+void RequireWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::Kova::KovaInfo& kernel) {
   AskOrFail("Whether the disks belong to groups that lack a disk could not be found out: ", [&] {
-    const Positions offline = CacheDisksOffline(disks, kernel);
-    if (offline.empty()) {
+    const Positions unmounted = CacheDisksUnmounted(disks, kernel);
+    if (unmounted.empty()) {
       return;
     }
     std::vector<HostCtl::Kova::DiskMapping> groups;
     kernel.GetDiskMappings(groups, true);
     for (const HostCtl::Kova::DiskMapping& group : groups) {
-      const auto at = offline.find(group.ssd.deviceName);
-      const std::string missing = at == offline.end() ? std::string() : MissingMember(group, known);
+      const auto at = unmounted.find(group.ssd.deviceName);
+      const std::string missing = at == unmounted.end() ? std::string() : MissingMember(group, known);
       if (!missing.empty()) {
         RefuseBrokenGroup(Indexed("disks", at->second), at->first, missing);
       }
@@ -125,7 +125,7 @@ void DemandWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl::
   });
 }
 
-void DemandAnswers(HostCtl::Kova::KovaInfo& kernel) {
+void RequireAnswers(HostCtl::Kova::KovaInfo& kernel) {
   AskOrFail("Nothing is formatted, for the kernel could not be asked about its disks: ", [&] {
     kernel.RefreshKovaInfo();
     std::vector<HostCtl::Kova::DiskResult> records;
@@ -133,7 +133,7 @@ void DemandAnswers(HostCtl::Kova::KovaInfo& kernel) {
   });
 }
 
-void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::Kova::KovaInfo& kernel) {
+void RequireGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::Kova::KovaInfo& kernel) {
   const std::string& name = mapping.GetSsd()->GetCanonicalName();
   if (!HasAbsentPrefix(name)) {
     return;
@@ -150,7 +150,7 @@ void DemandGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::K
   });
 }
 
-void DemandOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel) {
+void RequireOneIfAbsent(const std::string& place, const std::string& name, HostCtl::Kova::KovaInfo& kernel) {
   if (!HasAbsentPrefix(name)) {
     return;
   }

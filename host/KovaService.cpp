@@ -147,7 +147,7 @@ Answer GetConfigInfo(const PluginHooks& hooks, const Op::GetConfigInfo&) {
 Answer AddDisks(const PluginHooks& hooks, const Op::AddDisks& request) {
   const KnownDisks known = KnownDisks::Now();
   const Ref<DiskList> admitted = Gate::AdmitDisks(ItemsOf(request.GetDisks()), known);
-  Gate::DemandWholeGroups(*admitted, known, *Kernel());
+  Gate::RequireWholeGroups(*admitted, known, *Kernel());
   const Kovasvc::Texts texts = ToTexts(*admitted);
   Answer answer = Ask([&](std::string& faultText, std::string& resultText) {
     hooks.addDisks(texts, RequestTag(), faultText, resultText);
@@ -167,7 +167,7 @@ Answer AddAllEligibleDisks(const PluginHooks& hooks, const Op::AddAllEligibleDis
 Answer InitializeDisks(const PluginHooks& hooks, const Op::InitializeDisks& request) {
   const Kovasvc::Texts texts =
       ToTexts(*Gate::AdmitNewGroups(ItemsOf(request.GetMappings()), KnownDisks::Now()));
-  Gate::DemandAnswers(*Kernel());
+  Gate::RequireAnswers(*Kernel());
   return Ask([&](std::string& faultText, std::string& resultText) {
     hooks.initializeDisks(texts, RequestTag(), faultText, resultText);
   });
@@ -184,7 +184,7 @@ Answer RemoveDisk(const PluginHooks& hooks, const Op::RemoveDisk& request) {
   const std::string& disk = request.GetDisk();
   Gate::CheckName("disk", disk);
   const Removal removal(request);
-  Gate::DemandOneIfAbsent("disk", disk, *Kernel());
+  Gate::RequireOneIfAbsent("disk", disk, *Kernel());
   return Ask([&](std::string& faultText, std::string&) {
     hooks.removeDisks(disk, removal.passThrough, removal.optionText, removal.optionFirst,
                       removal.optionSecond, faultText);
@@ -195,8 +195,8 @@ Answer RemoveDiskMapping(const PluginHooks& hooks, const Op::RemoveDiskMapping& 
   const Removal removal(request);
   const Ref<DiskMapping> admitted = Gate::AdmitGroup(request.GetMapping().Get(), KnownDisks::Now());
   const auto kernel = Kernel();
-  Gate::DemandGroupIfAbsent(*admitted, *kernel);
-  Gate::DemandOneIfAbsent("mapping.ssd", admitted->GetSsd()->GetCanonicalName(), *kernel);
+  Gate::RequireGroupIfAbsent(*admitted, *kernel);
+  Gate::RequireOneIfAbsent("mapping.ssd", admitted->GetSsd()->GetCanonicalName(), *kernel);
   const std::string text = ToText(*admitted);
   return Ask([&](std::string& faultText, std::string&) {
     hooks.removeDiskMapping(text, removal.passThrough, removal.optionText, removal.optionFirst,

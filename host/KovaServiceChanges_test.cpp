@@ -140,8 +140,9 @@ class KovaServiceChanges : public testing::Test {
 };
 
 TEST_F(KovaServiceChanges, HandsDisksDownAsTheInventoryKnowsThem) {
-  EXPECT_EQ(Told(_service.Change(Op::AddDisks(Disks({ADisk("naa.1"), ADisk("naa.2", true)}))).fault.Get()),
-            "done");
+  EXPECT_EQ(
+      OutcomeText(_service.Change(Op::AddDisks(Disks({ADisk("naa.1"), ADisk("naa.2", true)}))).fault.Get()),
+      "done");
   EXPECT_THAT(heard, ElementsAre("add naa.1! naa.2 #"));
 }
 
@@ -165,9 +166,9 @@ TEST_F(KovaServiceChanges, HandsNoGroupDownThatGrowsBeyondWhatThePluginReads) {
     return service.Change(
         Op::UnmountDiskMapping(Mappings({MappingOf("naa.2", std::vector<std::string>(disks, "naa.2"))})));
   };
-  EXPECT_THAT(Told(unmount(99'000).fault.Get()), StartsWith("mappings[0].nonSsd | "));
+  EXPECT_THAT(OutcomeText(unmount(99'000).fault.Get()), StartsWith("mappings[0].nonSsd | "));
   EXPECT_EQ(bytes, 0u) << "the hook is not called";
-  EXPECT_EQ(Told(unmount(1000).fault.Get()), "done");
+  EXPECT_EQ(OutcomeText(unmount(1000).fault.Get()), "done");
   EXPECT_LT(bytes, 1'000'000u) << "names that no answer shows are not handed down";
 }
 
@@ -195,10 +196,10 @@ TEST_F(KovaServiceChanges, HandsUpResultAndFault) {
         _service.Change(Op::InitializeDisks(Mappings({}))),
         _service.Change(Op::UnmountDiskMapping(Mappings({})))}) {
     EXPECT_TRUE(answer.result);
-    EXPECT_EQ(Told(answer.fault.Get()), "half of it failed");
+    EXPECT_EQ(OutcomeText(answer.fault.Get()), "half of it failed");
   }
-  EXPECT_EQ(Told(_service.Change(Op::RemoveDisk("naa.2")).fault.Get()), "half of it failed");
-  EXPECT_EQ(Told(_service.Change(Op::RemoveDiskMapping(MappingOf("naa.1", {}))).fault.Get()),
+  EXPECT_EQ(OutcomeText(_service.Change(Op::RemoveDisk("naa.2")).fault.Get()), "half of it failed");
+  EXPECT_EQ(OutcomeText(_service.Change(Op::RemoveDiskMapping(MappingOf("naa.1", {}))).fault.Get()),
             "half of it failed");
 }
 
@@ -228,7 +229,7 @@ TEST_F(KovaServiceChanges, CallsNoHookForWhatTheGateRefuses) {
            {_service.Change(WithOptions(Op::RemoveDiskMapping(MappingOf("naa.1", {})), {"", "\n", 0, 0})),
             "optionText | "}}) {
     EXPECT_FALSE(answer.result);
-    EXPECT_THAT(Told(answer.fault.Get()), StartsWith(told));
+    EXPECT_THAT(OutcomeText(answer.fault.Get()), StartsWith(told));
   }
   EXPECT_THAT(heard, IsEmpty());
 }
@@ -240,7 +241,7 @@ TEST_F(KovaServiceChanges, MakesNoGroupWhileTheKernelCannotBeAsked) {
           {.operation = operation, .exception = "HostCtlException", .message = "busy", .disk = {}}};
     });
     const Answer answer = _service.Change(Op::InitializeDisks(Mappings({MappingOf("naa.1", {"naa.2"})})));
-    EXPECT_THAT(Told(answer.fault.Get()), HasSubstr("busy")) << operation;
+    EXPECT_THAT(OutcomeText(answer.fault.Get()), HasSubstr("busy")) << operation;
   }
   EXPECT_THAT(heard, IsEmpty());
 }
@@ -250,11 +251,12 @@ TEST_F(KovaServiceChanges, RemovesAGroupByAnAbsentDiskOnlyIfThatIsItsCacheDisk) 
   _inventory->Replace(Machines::DescribeInventory(_host->Snapshot()));
   for (const char* name : {"kova:uuid-of-naa.3", "kova:01234567-89ab-cdef-0123-456789abcdef", "kova:"}) {
     const Answer answer = _service.Change(Op::RemoveDiskMapping(MappingOf(name, {})));
-    EXPECT_THAT(Told(answer.fault.Get()), StartsWith("mapping.ssd | ")) << name;
+    EXPECT_THAT(OutcomeText(answer.fault.Get()), StartsWith("mapping.ssd | ")) << name;
   }
   EXPECT_THAT(heard, IsEmpty());
-  EXPECT_EQ(Told(_service.Change(Op::RemoveDiskMapping(MappingOf("kova:uuid-of-naa.1", {}))).fault.Get()),
-            "done");
+  EXPECT_EQ(
+      OutcomeText(_service.Change(Op::RemoveDiskMapping(MappingOf("kova:uuid-of-naa.1", {}))).fault.Get()),
+      "done");
   EXPECT_THAT(heard, ElementsAre("remove group kova:uuid-of-naa.1!<>   0 0"));
 }
 
@@ -268,18 +270,18 @@ TEST_F(KovaServiceChanges, RemovesNoAbsentDiskThatCouldBeAnother) {
     host.disks[1].absent = false;
   });
   const std::string both = "kova:same";
-  EXPECT_THAT(Told(_service.Change(Op::RemoveDisk(both)).fault.Get()),
+  EXPECT_THAT(OutcomeText(_service.Change(Op::RemoveDisk(both)).fault.Get()),
               StartsWith("disk | disk: more than one disk"));
-  EXPECT_THAT(Told(_service.Change(Op::RemoveDiskMapping(MappingOf(both, {}))).fault.Get()),
+  EXPECT_THAT(OutcomeText(_service.Change(Op::RemoveDiskMapping(MappingOf(both, {}))).fault.Get()),
               StartsWith("mapping.ssd | mapping.ssd: more than one disk"));
   _host->Change([](HostDescription& host) { host.disks[0].inKernel = host.disks[2].inKernel = false; });
-  EXPECT_THAT(Told(_service.Change(Op::RemoveDisk(both)).fault.Get()), StartsWith("disk | "))
+  EXPECT_THAT(OutcomeText(_service.Change(Op::RemoveDisk(both)).fault.Get()), StartsWith("disk | "))
       << "both in their group, which is all that the kernel knows of them";
   _host->Change([](HostDescription& host) {
     host.disks[1].absent = true;
     host.disks[2].absent = false;
   });
-  EXPECT_THAT(Told(_service.Change(Op::RemoveDisk(both)).fault.Get()), StartsWith("disk | "))
+  EXPECT_THAT(OutcomeText(_service.Change(Op::RemoveDisk(both)).fault.Get()), StartsWith("disk | "))
       << "one in a group and one in none";
   EXPECT_THAT(heard, IsEmpty());
   _host->Change([](HostDescription& host) { host.disks[1].absent = false; });
@@ -294,7 +296,8 @@ TEST_F(KovaServiceChanges, RemovesNoAbsentDiskWhileTheKernelCannotBeAsked) {
       host.faults = {
           {.operation = operation, .exception = "HostCtlException", .message = "busy", .disk = {}}};
     });
-    EXPECT_THAT(Told(_service.Change(Op::RemoveDisk("kova:uuid-of-naa.3")).fault.Get()), HasSubstr("busy"));
+    EXPECT_THAT(OutcomeText(_service.Change(Op::RemoveDisk("kova:uuid-of-naa.3")).fault.Get()),
+                HasSubstr("busy"));
   }
   EXPECT_THAT(heard, IsEmpty());
   _service.Change(Op::RemoveDisk("naa.3"));
@@ -306,12 +309,13 @@ TEST_F(KovaServiceChanges, AnswersAnExceptionOfAHookByASystemErrorWithItsText) {
   hooks.addAllEligibleDisks = [](const std::string&, std::string&, std::string&) {
     throw std::runtime_error("the kernel is gone");
   };
-  EXPECT_EQ(Told(KovaService(hooks).Change(Op::AddAllEligibleDisks()).fault.Get()), "the kernel is gone");
+  EXPECT_EQ(OutcomeText(KovaService(hooks).Change(Op::AddAllEligibleDisks()).fault.Get()),
+            "the kernel is gone");
 }
 
 TEST_F(KovaServiceChanges, AnswersWithoutAProviderByASystemError) {
   OtxCtl::Kova::SetProviderFactory({});
-  EXPECT_THAT(Told(_service.Change(Op::AddDisks(DisksNamed({"naa.1"}))).fault.Get()),
+  EXPECT_THAT(OutcomeText(_service.Change(Op::AddDisks(DisksNamed({"naa.1"}))).fault.Get()),
               HasSubstr("No kernel provider"));
   EXPECT_THAT(heard, IsEmpty());
 }
@@ -338,7 +342,7 @@ TEST_F(KovaServiceChanges, GroupsAreThoseOfStorageInfoAndTheUnmountedOnes) {
   });
   answer = service.Query(Op::GetDiskGroups());
   EXPECT_TRUE(answer.result) << "what could be read is answered";
-  EXPECT_EQ(Told(answer.fault.Get()), "busy");
+  EXPECT_EQ(OutcomeText(answer.fault.Get()), "busy");
 }
 
 TEST_F(KovaServiceChanges, DescribesTheHostAsAFileWould) {
@@ -347,7 +351,7 @@ TEST_F(KovaServiceChanges, DescribesTheHostAsAFileWould) {
 
 TEST_F(KovaServiceChanges, ChangesTheHostAndThenRefreshesThePlugin) {
   const Answer answer = _service.ChangeHost(R"({"disk": {"name": "naa.2", "absent": true}})");
-  EXPECT_EQ(Told(answer.fault.Get()), "done");
+  EXPECT_EQ(OutcomeText(answer.fault.Get()), "done");
   EXPECT_FALSE(answer.result);
   EXPECT_TRUE(_host->Snapshot().disks[1].absent);
   EXPECT_THAT(heard, ElementsAre("storage info"));
@@ -361,7 +365,7 @@ TEST_F(KovaServiceChanges, RefusesAChangeThatTheHostWouldNotAccept) {
            {R"({"autoMode": true})", "autoMode | "},
            {"[]", "document | "},
            {"", "line 1"}}) {
-    EXPECT_THAT(Told(_service.ChangeHost(change).fault.Get()), StartsWith(told));
+    EXPECT_THAT(OutcomeText(_service.ChangeHost(change).fault.Get()), StartsWith(told));
   }
   EXPECT_EQ(_host->Snapshot(), before);
   EXPECT_THAT(heard, IsEmpty());
@@ -369,7 +373,7 @@ TEST_F(KovaServiceChanges, RefusesAChangeThatTheHostWouldNotAccept) {
 
 TEST_F(KovaServiceChanges, AnswersAChangeThatCannotBeSavedByASystemError) {
   _host->SetSaver([](const HostDescription&) { throw std::runtime_error("no room"); });
-  EXPECT_EQ(Told(_service.ChangeHost(R"({"set": {"autoMode": true}})").fault.Get()), "no room");
+  EXPECT_EQ(OutcomeText(_service.ChangeHost(R"({"set": {"autoMode": true}})").fault.Get()), "no room");
   EXPECT_FALSE(_host->Snapshot().autoMode);
 }
 

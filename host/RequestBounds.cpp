@@ -124,7 +124,7 @@ std::size_t WeightOfObject(const Orbis::Any* value) {
 
 }  // namespace
 
-void Bound(Orbis::DataObject& request) {
+void BoundRequest(Orbis::DataObject& request) {
   for (const FieldDescriptor* field : request.GetType().fields) {
     if (const std::string* const text = TextIn(*field, request)) {
       CheckText(*field, *text);

@@ -15,7 +15,7 @@ namespace Host {
 // anything, or too long a text, is refused by an InvalidArgument as the gate does it; whatever else is wrong
 // is left to the gate. Texts are names of disks in a list; a text that must be there names one thing, one
 // that may be missing is handed on as it is.
-void Bound(Orbis::DataObject& request);
+void BoundRequest(Orbis::DataObject& request);
 
 // Roughly the bytes that the request takes in memory; a bounded one.
 std::size_t WeightOf(const Orbis::DataObject& request);

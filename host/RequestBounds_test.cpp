@@ -21,14 +21,14 @@ std::string Verdict(const std::function<void()>& check) {
     check();
     return "fits";
   } catch (const Orbis::MethodFault::Exception& refused) {
-    return Told(refused.GetFault().Get());
+    return OutcomeText(refused.GetFault().Get());
   }
 }
 
 // What is left of the request when it is bounded.
 template <class Request>
 Request Bounded(Request request) {
-  Bound(request);
+  BoundRequest(request);
   return request;
 }
 

@@ -22,7 +22,7 @@ std::string Refusal(const std::function<void()>& write) {
     write();
     return "written";
   } catch (const Orbis::MethodFault::Exception& refused) {
-    return Told(refused.GetFault().Get());
+    return OutcomeText(refused.GetFault().Get());
   }
 }
 

@@ -22,7 +22,7 @@ Ref<DiskResult> ADisk(const std::string& name, const char* state, Ref<Orbis::Met
 }
 
 // The messages of a fault beside such an answer.
-std::vector<std::string> Told(const std::vector<Ref<DiskResult>>& disks) {
+std::vector<std::string> MessagesAbout(const std::vector<Ref<DiskResult>>& disks) {
   const auto results = MakeRef<Orbis::DataArray<DiskResult>>();
   for (const auto& disk : disks) {
     results->Append(disk);
@@ -37,14 +37,15 @@ std::vector<std::string> Told(const std::vector<Ref<DiskResult>>& disks) {
 }
 
 TEST(UnusableDisks, AreNamedWithTheirReasons) {
-  EXPECT_THAT(Told({ADisk("naa.1", DiskResult::STATE_ELIGIBLE),
-                    ADisk("naa.2", DiskResult::STATE_INELIGIBLE, MakeRef<Nox::Fault::DiskIsUSB>("naa.2")),
-                    ADisk("naa.3", DiskResult::STATE_INUSE), ADisk("naa.4", DiskResult::STATE_INELIGIBLE)}),
-              testing::ElementsAre("naa.2: attached by USB; naa.3: in use already; naa.4: not to be used"));
+  EXPECT_THAT(
+      MessagesAbout({ADisk("naa.1", DiskResult::STATE_ELIGIBLE),
+                     ADisk("naa.2", DiskResult::STATE_INELIGIBLE, MakeRef<Nox::Fault::DiskIsUSB>("naa.2")),
+                     ADisk("naa.3", DiskResult::STATE_INUSE), ADisk("naa.4", DiskResult::STATE_INELIGIBLE)}),
+      testing::ElementsAre("naa.2: attached by USB; naa.3: in use already; naa.4: not to be used"));
 }
 
 TEST(UnusableDisks, AreNotMentionedWhereThereAreNone) {
-  EXPECT_THAT(Told({ADisk("naa.1", DiskResult::STATE_ELIGIBLE)}), testing::IsEmpty());
+  EXPECT_THAT(MessagesAbout({ADisk("naa.1", DiskResult::STATE_ELIGIBLE)}), testing::IsEmpty());
   Nox::Fault::InsufficientDisks fault;
   NameUnusableDisks({}, fault);
   EXPECT_TRUE(fault.GetFaultMessage()->IsEmpty());
@@ -55,9 +56,10 @@ TEST(UnusableDisks, BeyondASentenceAreCounted) {
   for (int i = 1; i <= 7; ++i) {
     many.push_back(ADisk("naa." + std::to_string(i), DiskResult::STATE_INUSE));
   }
-  EXPECT_THAT(Told(many), testing::ElementsAre(testing::EndsWith("naa.5: in use already; and 2 more")));
+  EXPECT_THAT(MessagesAbout(many),
+              testing::ElementsAre(testing::EndsWith("naa.5: in use already; and 2 more")));
   many.resize(5);
-  EXPECT_THAT(Told(many), testing::ElementsAre(testing::EndsWith("naa.5: in use already")));
+  EXPECT_THAT(MessagesAbout(many), testing::ElementsAre(testing::EndsWith("naa.5: in use already")));
 }
 
 }  // namespace

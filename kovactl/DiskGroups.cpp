@@ -27,7 +27,7 @@ const DiskMapInfo* DiskGroups::Find(const std::string& cacheDisk) const {
   return nullptr;
 }
 
-const DiskMapInfo& DiskGroups::Demand(const std::string& cacheDisk) const {
+const DiskMapInfo& DiskGroups::Require(const std::string& cacheDisk) const {
   const DiskMapInfo* const group = Find(cacheDisk);
   if (group == nullptr) {
     throw BadInput("this host has no disk group with the cache disk '" + Host::Printable(cacheDisk) +

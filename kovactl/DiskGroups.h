@@ -29,7 +29,7 @@ class DiskGroups {
   // The group of that cache disk, or null.
   const Nox::Kova::Host::DiskMapInfo* Find(const std::string& cacheDisk) const;
   // The same, for a group that somebody named; throws BadInput, which says so, when there is none.
-  const Nox::Kova::Host::DiskMapInfo& Demand(const std::string& cacheDisk) const;
+  const Nox::Kova::Host::DiskMapInfo& Require(const std::string& cacheDisk) const;
 
  private:
   Tessa::Ref<StorageInfo> _info;

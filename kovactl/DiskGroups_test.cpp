@@ -22,9 +22,9 @@ TEST(DiskGroups, AreFoundByTheirCacheDisk) {
 
 TEST(DiskGroups, RefuseOneThatTheHostDoesNotHave) {
   const DiskGroups groups(Testing::WithGroups({AGroup("naa.1", {"naa.2"})}));
-  EXPECT_NO_THROW(groups.Demand("naa.1"));
+  EXPECT_NO_THROW(groups.Require("naa.1"));
   try {
-    groups.Demand("naa.\x1b");
+    groups.Require("naa.\x1b");
     FAIL() << "it was found";
   } catch (const BadInput& refused) {
     EXPECT_THAT(refused.what(), HasSubstr("no disk group with the cache disk 'naa.\\x1b'"));

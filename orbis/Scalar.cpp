@@ -144,7 +144,7 @@ class DateReader {
     return true;
   }
 
-  void Demand(char wanted) { _sound = Skip(wanted) && _sound; }
+  void Require(char wanted) { _sound = Skip(wanted) && _sound; }
 
   // Microseconds behind the point: 1 to 6 digits.
   int Fraction() {
@@ -170,10 +170,10 @@ class DateReader {
     }
     const bool ahead = Skip('+');
     if (!ahead) {
-      Demand('-');
+      Require('-');
     }
     const int hours = Digits(2);
-    Demand(':');
+    Require(':');
     const int minutes = Digits(2);
     _sound = _sound && (hours < 14 || (hours == 14 && minutes == 0)) && minutes < 60;
     return (ahead ? 60 : -60) * (60 * hours + minutes);
@@ -190,15 +190,15 @@ bool Parse(std::string_view text, DateTime& value) {
   using namespace std::chrono;
   DateReader reader(text);
   const int y = reader.Digits(4);
-  reader.Demand('-');
+  reader.Require('-');
   const int m = reader.Digits(2);
-  reader.Demand('-');
+  reader.Require('-');
   const int d = reader.Digits(2);
-  reader.Demand('T');
+  reader.Require('T');
   const int hour = reader.Digits(2);
-  reader.Demand(':');
+  reader.Require(':');
   const int minute = reader.Digits(2);
-  reader.Demand(':');
+  reader.Require(':');
   const int second = reader.Digits(2);
   const int fraction = reader.Skip('.') ? reader.Fraction() : 0;
   const int zone = reader.Zone();

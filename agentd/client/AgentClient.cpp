@@ -94,7 +94,7 @@ Answer AgentClient::Post(std::string_view operation, const std::string& body,
   const HttpAnswer http =
       Exchange(_address, {"POST", std::string(folder) + std::string(operation), std::string(jsonType), body},
                patience, _files);
-  DemandJson(http);
+  RequireJson(http);
   if (http.status == takenOn) {
     return {};
   }
@@ -116,7 +116,7 @@ Answer AgentClient::Read(const HttpAnswer& http, const Orbis::TypeDescriptor* re
 
 std::string AgentClient::Get(const std::string& target) const {
   HttpAnswer http = Exchange(_address, {"GET", std::string(folder) + target, "", ""}, queryPatience, _files);
-  DemandJson(http);
+  RequireJson(http);
   if (http.status == 200) {
     return std::move(http.body);
   }
@@ -128,7 +128,7 @@ std::string AgentClient::Get(const std::string& target) const {
   throw RefusedByAgent(answer.fault);
 }
 
-void AgentClient::DemandJson(const HttpAnswer& http) const {
+void AgentClient::RequireJson(const HttpAnswer& http) const {
   if (http.contentType != jsonType) {
     throw AnswerError("the agent on " + _address.Name() + " answered with status " +
                       std::to_string(http.status) + ": " +

@@ -53,7 +53,7 @@ class AgentClient final : public Host::ManagementApi {
                     const Orbis::TypeDescriptor* resultType, std::chrono::milliseconds patience) const;
   // The body. Throws RefusedByAgent for a fault in its place.
   std::string Get(const std::string& target) const;
-  void DemandJson(const HttpAnswer& http) const;
+  void RequireJson(const HttpAnswer& http) const;
   Host::Answer Read(const HttpAnswer& http, const Orbis::TypeDescriptor* resultType) const;
 
   HttpAddress _address;

@@ -9,7 +9,7 @@
 
 namespace Agentd {
 
-void DemandDescriptors(std::size_t number) {
+void RequireDescriptors(std::size_t number) {
   rlimit limit{};
   if (getrlimit(RLIMIT_NOFILE, &limit) != 0) {
     throw std::runtime_error(std::string("cannot tell how many files may be open: ") + std::strerror(errno));

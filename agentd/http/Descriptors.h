@@ -7,6 +7,6 @@ namespace Agentd {
 
 // Sees to it that as many can be open at the same time: raises the process's own limit where it may. Throws
 // std::runtime_error that names both numbers where it may not.
-void DemandDescriptors(std::size_t number);
+void RequireDescriptors(std::size_t number);
 
 }  // namespace Agentd

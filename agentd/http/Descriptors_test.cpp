@@ -33,13 +33,13 @@ class Descriptors : public testing::Test {
 
 TEST_F(Descriptors, TheLimitIsRaisedToWhatIsNeededAndNoFurther) {
   Lower(100);
-  DemandDescriptors(200);
+  RequireDescriptors(200);
   EXPECT_EQ(Current(), 200u);
 }
 
 TEST_F(Descriptors, ALimitThatIsHighEnoughStays) {
   Lower(100);
-  DemandDescriptors(100);
+  RequireDescriptors(100);
   EXPECT_EQ(Current(), 100u);
 }
 
@@ -50,7 +50,7 @@ TEST_F(Descriptors, MoreThanTheProcessMayHaveIsRefusedWithBothNumbers) {
   const std::string most = std::to_string(_before.rlim_max);
   const std::string more = std::to_string(_before.rlim_max + 1);
   try {
-    DemandDescriptors(_before.rlim_max + 1);
+    RequireDescriptors(_before.rlim_max + 1);
     FAIL() << "there are as many";
   } catch (const std::runtime_error& refused) {
     EXPECT_THAT(refused.what(), AllOf(HasSubstr(most), HasSubstr(more)));

@@ -55,7 +55,7 @@ class Exchanger {
     if (address.isTls) {
       _context.emplace(MakeTlsContext(files));
       _tls.emplace(_stream, *_context);
-      DemandHost(_tls->native_handle(), address.place);
+      RequireHost(_tls->native_handle(), address.place);
     }
   }
 
@@ -111,8 +111,8 @@ class Exchanger {
     if (_tls && IsOfTls(received) && !parser.got_some()) {
       throw TlsError(WhyTlsFailed(received, _tls->native_handle(), _address, _files));
     }
-    Demand(sent, "cannot send to the agent on", Guess());
-    Demand(received, "no answer from the agent on", Guess());
+    Require(sent, "cannot send to the agent on", Guess());
+    Require(received, "no answer from the agent on", Guess());
   }
 
   // Why one who could be reached may have hung up.
@@ -133,7 +133,7 @@ class Exchanger {
     return result;
   }
 
-  void Demand(error_code result, const char* failure, const std::string& guess) const {
+  void Require(error_code result, const char* failure, const std::string& guess) const {
     if (result) {
       throw AnswerError(std::string(failure) + " " + _address.Name() + ": " + result.message() + guess);
     }

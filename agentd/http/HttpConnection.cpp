@@ -253,8 +253,8 @@ void HttpConnection::Refuse(HttpAnswer answer) {
 }
 
 void HttpConnection::TellRefusal(HttpAnswer refusal) {
-  const bool isAsked = _context.tell && _parser->is_header_done();
-  Refuse(isAsked ? _context.tell(WhatIsAsked(_parser->get()).target, std::move(refusal))
+  const bool isAsked = _context.encodeRefusal && _parser->is_header_done();
+  Refuse(isAsked ? _context.encodeRefusal(WhatIsAsked(_parser->get()).target, std::move(refusal))
                  : std::move(refusal));
 }
 

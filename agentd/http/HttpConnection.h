@@ -40,7 +40,7 @@ struct HttpContext {
   std::optional<boost::asio::ssl::context> tls;
   HttpDeferringHandler handler;
   HttpAdmit admit;                                                     // may be empty
-  HttpTell tell = {};                                                  // may be empty
+  RefusalEncoder encodeRefusal = {};                                   // may be empty
   std::function<void(HttpRefusal, const std::string& who)> onRefused;  // told on the network's thread
   boost::asio::io_context& network;
   boost::asio::thread_pool& workers;

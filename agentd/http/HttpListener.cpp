@@ -68,8 +68,8 @@ void HttpListener::BindTcp() {
   _address.port = real.port();
 }
 
-void HttpListener::Accept(Welcome welcome, Failed failed) {
-  _welcome = std::move(welcome);
+void HttpListener::Accept(AcceptHandler onAccept, Failed failed) {
+  _welcome = std::move(onAccept);
   _failed = std::move(failed);
   AcceptNext();
 }

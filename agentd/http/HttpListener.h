@@ -16,7 +16,7 @@ namespace Agentd {
 class HttpListener {
  public:
   using Protocol = boost::asio::generic::stream_protocol;
-  using Welcome = std::function<void(Protocol::socket socket)>;
+  using AcceptHandler = std::function<void(Protocol::socket socket)>;
   using Failed = std::function<void(boost::system::error_code error)>;
 
   // Binds; a Unix socket has mode 0660. Throws std::runtime_error that names the address.
@@ -29,7 +29,7 @@ class HttpListener {
   const HttpAddress& Address() const { return _address; }
 
   // Until Close, every client is welcomed. `failed` is told when one cannot be accepted; it may be later.
-  void Accept(Welcome welcome, Failed failed);
+  void Accept(AcceptHandler onAccept, Failed failed);
   // Accepts no more; the file of a Unix socket goes.
   void Close();
 
@@ -42,7 +42,7 @@ class HttpListener {
   HttpAddress _address;
   boost::asio::basic_socket_acceptor<Protocol> _acceptor;
   boost::asio::steady_timer _pause;
-  Welcome _welcome;
+  AcceptHandler _welcome;
   Failed _failed;
 };
 

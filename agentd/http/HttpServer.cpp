@@ -116,11 +116,11 @@ class HttpServer::Impl {
     asio::post(_network, [this] { BeginDrain(); });
   }
   void OnStopping(std::function<void()> listener) { _onStopping = std::move(listener); }
-  void OnRefusal(HttpTell tell) { _context.tell = std::move(tell); }
+  void OnRefusal(RefusalEncoder encodeRefusal) { _context.encodeRefusal = std::move(encodeRefusal); }
 
  private:
   void Listen(const HttpAddress& address);
-  void Welcome(const HttpListener& listener, Entrance& entrance, Socket socket);
+  void StartConnection(const HttpListener& listener, Entrance& entrance, Socket socket);
   Arrival ArrivalAt(const HttpListener& listener, Socket& socket) const;
   void RenewTicketSecretInTime();
   void TurnAway(HttpRefusal why, const std::string& who);
@@ -159,8 +159,8 @@ HttpServer::Impl::Impl(const HttpOptions& options, HttpDeferringHandler handler,
       _drainTimer(_network),
       _tallyTimer(_network) {
   const HttpLimits& limits = options.limits;
-  DemandDescriptors(options.listen.size() * (1 + limits.connections + limits.refusedConnections) +
-                    otherDescriptors);
+  RequireDescriptors(options.listen.size() * (1 + limits.connections + limits.refusedConnections) +
+                     otherDescriptors);
   for (const HttpAddress& address : options.listen) {
     Listen(address);
   }
@@ -207,7 +207,7 @@ bool HttpServer::Impl::Run() {
   for (std::size_t i = 0; i < _listeners.size(); ++i) {
     HttpListener& listener = *_listeners[i];
     listener.Accept([this, &listener, &entrance = *_entrances[i]](
-                        Socket socket) { Welcome(listener, entrance, std::move(socket)); },
+                        Socket socket) { StartConnection(listener, entrance, std::move(socket)); },
                     [this, &listener](error_code error) {
                       TurnAway(HttpRefusal::Descriptors,
                                "a client on " + listener.Address().Text() + " (" + error.message() + ")");
@@ -217,7 +217,7 @@ bool HttpServer::Impl::Run() {
   return _context.connections.empty();
 }
 
-void HttpServer::Impl::Welcome(const HttpListener& listener, Entrance& entrance, Socket socket) {
+void HttpServer::Impl::StartConnection(const HttpListener& listener, Entrance& entrance, Socket socket) {
   Arrival arrival = ArrivalAt(listener, socket);
   const std::optional<HttpRefusal> full = entrance.served.WhyFull(arrival.share);
   if (full) {
@@ -347,8 +347,8 @@ bool HttpServer::Run() {
 void HttpServer::Stop() {
   _impl->Stop();
 }
-void HttpServer::OnRefusal(HttpTell tell) {
-  _impl->OnRefusal(std::move(tell));
+void HttpServer::OnRefusal(RefusalEncoder encodeRefusal) {
+  _impl->OnRefusal(std::move(encodeRefusal));
 }
 void HttpServer::OnStopping(std::function<void()> listener) {
   _impl->OnStopping(std::move(listener));

@@ -33,7 +33,7 @@ using HttpAdmit = std::function<HttpAdmission(const HttpRequest& head)>;
 
 // How a refusal of the server's own is told to a client of that target: the answer, which is a line of text,
 // in the form that is usual there. Called on the thread in Run, which waits for it.
-using HttpTell = std::function<HttpAnswer(std::string_view target, HttpAnswer refusal)>;
+using RefusalEncoder = std::function<HttpAnswer(std::string_view target, HttpAnswer refusal)>;
 
 class HttpServer {
  public:
@@ -52,7 +52,7 @@ class HttpServer {
   HttpLoad Now() const;
 
   // Refusals whose target is known are told by `tell`. Set before Run; without it they are lines of text.
-  void OnRefusal(HttpTell tell);
+  void OnRefusal(RefusalEncoder encodeRefusal);
 
   // Told, on the thread in Run, when the server stops accepting, and before it waits for what is in flight.
   // Set before Run.

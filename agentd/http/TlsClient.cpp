@@ -82,7 +82,7 @@ ssl::context MakeTlsContext(const TlsClientFiles& files) {
   return context;
 }
 
-void DemandHost(SSL* session, std::string host) {
+void RequireHost(SSL* session, std::string host) {
   error_code isName;
   boost::asio::ip::make_address(host, isName);
   // A common name is no name of a host: only what the certificate lists as such counts.

@@ -14,7 +14,7 @@ boost::asio::ssl::context MakeTlsContext(const TlsClientFiles& files);
 
 // From now on the session asks for that host, and takes a certificate for no other: a numeric address, or a
 // name.
-void DemandHost(SSL* session, std::string host);
+void RequireHost(SSL* session, std::string host);
 
 // Whether that is what TLS itself has to say, and not the network below it.
 bool IsOfTls(const boost::system::error_code& error);

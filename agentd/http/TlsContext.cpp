@@ -16,7 +16,7 @@ using boost::system::error_code;
   throw std::runtime_error("cannot use " + what + " " + file + ": " + reason);
 }
 
-void Demand(const error_code& error, const std::string& what, const std::string& file) {
+void Require(const error_code& error, const std::string& what, const std::string& file) {
   if (error) {
     Refuse(what, file, error.message());
   }
@@ -40,18 +40,18 @@ ssl::context MakeTlsContext(ssl::context::method side) {
 void UseCertificate(ssl::context& context, const std::string& certificate, const std::string& key) {
   error_code error;
   context.use_certificate_chain_file(certificate, error);
-  Demand(error, "the certificate", certificate);
+  Require(error, "the certificate", certificate);
   context.use_private_key_file(key, ssl::context::pem, error);
   if (SaysThatKeysDiffer(error)) {
     Refuse("the key", key, "it is not that of the certificate " + certificate);
   }
-  Demand(error, "the key", key);
+  Require(error, "the key", key);
 }
 
 void UseCa(ssl::context& context, const std::string& ca, const char* whose) {
   error_code error;
   context.load_verify_file(ca, error);
-  Demand(error, std::string("the CA ") + whose, ca);
+  Require(error, std::string("the CA ") + whose, ca);
 }
 
 }  // namespace Agentd

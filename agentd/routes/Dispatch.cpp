@@ -62,7 +62,7 @@ void Submit(const Services& services, const OperationDescriptor& operation, cons
 
 void Dispatch(const Services& services, const OperationDescriptor& operation, const RequestRef& request,
               const Encoding& encoding, const HttpResponder& responder) {
-  Host::Bound(*request);
+  Host::BoundRequest(*request);
   if (operation.changes) {
     Submit(services, operation, request, encoding, responder);
   } else {

@@ -8,13 +8,13 @@
 
 #include "agentd/tasks/QueryQueue.h"
 #include "agentd/testing/RunningServer.h"
-#include "agentd/testing/ToldHost.h"
+#include "agentd/testing/ScriptedHost.h"
 
 namespace Agentd {
 namespace {
 
 using std::chrono::seconds;
-using Testing::ToldHost;
+using Testing::ScriptedHost;
 
 class HostWatchTest : public testing::Test {
  protected:
@@ -29,7 +29,7 @@ class HostWatchTest : public testing::Test {
   }
   std::size_t Asked() const { return _host.api.Asked().size(); }
 
-  ToldHost _host;
+  ScriptedHost _host;
   std::chrono::steady_clock::time_point _now{};
   QueryQueue _queries{{.atOnce = 1, .waiting = 1}};
   HostWatch _watch{_host.api, _queries, [this] { return _now; }};

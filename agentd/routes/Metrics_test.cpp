@@ -7,7 +7,7 @@
 
 #include "agentd/routes/Routes.h"
 #include "agentd/testing/RunningServer.h"
-#include "agentd/testing/ToldHost.h"
+#include "agentd/testing/ScriptedHost.h"
 #include "host/Build.h"
 
 namespace Agentd {
@@ -132,7 +132,7 @@ class MetricsRoute : public testing::Test {
   }
   std::string Metrics() const { return Ask({"GET", "/metrics", "", ""}).body; }
 
-  Testing::ToldHost _host;
+  Testing::ScriptedHost _host;
   Testing::FakeApi& _api = _host.api;
   TaskQueue _tasks;
   const Router _router{_api, _tasks};

@@ -37,7 +37,7 @@ HttpAnswer RefusalAt(std::string_view path, unsigned status, const std::string& 
   return http;
 }
 
-HttpAnswer ToldAt(std::string_view path, HttpAnswer refusal) {
+HttpAnswer EncodeRefusal(std::string_view path, HttpAnswer refusal) {
   if (!IsForPrograms(path)) {
     return refusal;
   }

@@ -24,6 +24,6 @@ HttpAnswer RefusalAt(std::string_view path, unsigned status, const std::string& 
 HttpAnswer RefusalAt(std::string_view path, const Orbis::ParseException& refused);
 
 // A line of text that the server itself refuses with, as a client of that path is told it.
-HttpAnswer ToldAt(std::string_view path, HttpAnswer refusal);
+HttpAnswer EncodeRefusal(std::string_view path, HttpAnswer refusal);
 
 }  // namespace Agentd

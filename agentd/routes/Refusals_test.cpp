@@ -23,7 +23,7 @@ using testing::HasSubstr;
 using testing::IsEmpty;
 
 // The fault of an answer that is nothing else, as a client reads it: "argument | message".
-std::string Told(const HttpAnswer& http) {
+std::string OutcomeText(const HttpAnswer& http) {
   EXPECT_EQ(http.contentType, "application/json");
   const Host::Answer answer = Host::ReadJsonAnswer(http.body, nullptr);
   EXPECT_FALSE(answer.result);
@@ -36,7 +36,7 @@ TEST(Refusals, AreJsonForProgramsAndALineForEverybodyElse) {
   for (const char* path : {"/api/v1", "/api/v1/", "/api/v1/disks", "/api/v1?x", "/api/v1/%"}) {
     const HttpAnswer http = RefusalAt(path, 418, "no tea");
     EXPECT_EQ(http.status, 418u);
-    EXPECT_EQ(Told(http), " | no tea") << path;
+    EXPECT_EQ(OutcomeText(http), " | no tea") << path;
   }
   for (const char* path : {"", "/", "/api", "/api/v12", "/api/v", "/healthz", "/soap"}) {
     const HttpAnswer http = RefusalAt(path, 418, "no tea");
@@ -48,24 +48,24 @@ TEST(Refusals, AreJsonForProgramsAndALineForEverybodyElse) {
 TEST(Refusals, OfABodyNameThePlace) {
   const HttpAnswer http = RefusalAt("/api/v1/AddDisks", Orbis::ParseException("disks[0]", 3, "is no disk"));
   EXPECT_EQ(http.status, 400u);
-  EXPECT_EQ(Told(http), "disks[0] | disks[0], line 3: is no disk");
+  EXPECT_EQ(OutcomeText(http), "disks[0] | disks[0], line 3: is no disk");
 }
 
 TEST(Refusals, OfTheServerItselfKeepTheirStatusAndHeaders) {
   const HttpAnswer line{
       .status = 405, .contentType = "text/plain", .body = "no tea\n", .retryAfterSeconds = 7, .allow = "GET"};
-  const HttpAnswer json = ToldAt("/api/v1/AddDisks", line);
+  const HttpAnswer json = EncodeRefusal("/api/v1/AddDisks", line);
   EXPECT_EQ(json.status, 405u);
-  EXPECT_EQ(Told(json), " | no tea");
+  EXPECT_EQ(OutcomeText(json), " | no tea");
   EXPECT_EQ(json.retryAfterSeconds, 7);
   EXPECT_EQ(json.allow, "GET");
-  EXPECT_EQ(ToldAt("/soap", line).body, "no tea\n");
+  EXPECT_EQ(EncodeRefusal("/soap", line).body, "no tea\n");
 }
 
 TEST(Refusals, OfAServerThatHasTooMuchToDoAreBusy) {
-  const HttpAnswer json =
-      ToldAt("/api/v1/disks",
-             {.status = 503, .contentType = "text/plain", .body = "too much\n", .retryAfterSeconds = 7});
+  const HttpAnswer json = EncodeRefusal(
+      "/api/v1/disks",
+      {.status = 503, .contentType = "text/plain", .body = "too much\n", .retryAfterSeconds = 7});
   EXPECT_EQ(json.status, 503u);
   const Host::Answer answer = Host::ReadJsonAnswer(json.body, nullptr);
   const auto& busy = dynamic_cast<const Nox::Fault::Busy&>(*answer.fault);
@@ -91,15 +91,16 @@ class RefusedRoutes : public testing::Test {
 };
 
 TEST_F(RefusedRoutes, BelowTheApiTellInJson) {
-  EXPECT_EQ(Told(Get("/api/v1/nothing")), " | nothing is served here");
-  EXPECT_EQ(Told(Get("/api/v1/AddDisks")), " | that method is not served here");
-  EXPECT_EQ(Told(Get("/api/v1/disks?names=%4")), " | the target holds a broken escape");
-  EXPECT_EQ(Told(Get("/api/v1/disks?name=a")), "name | unknown parameter 'name'; wanted 'names'");
-  EXPECT_EQ(Told(Get("/api/v1/tasks/7")), " | no task of that id; those that ended long ago are forgotten");
-  EXPECT_EQ(Told(Get("/api/v1/host")), " | this is no simulated host");
-  EXPECT_EQ(Told(Send({"POST", "/api/v1/AddDisks", "text/xml", "{}"})),
+  EXPECT_EQ(OutcomeText(Get("/api/v1/nothing")), " | nothing is served here");
+  EXPECT_EQ(OutcomeText(Get("/api/v1/AddDisks")), " | that method is not served here");
+  EXPECT_EQ(OutcomeText(Get("/api/v1/disks?names=%4")), " | the target holds a broken escape");
+  EXPECT_EQ(OutcomeText(Get("/api/v1/disks?name=a")), "name | unknown parameter 'name'; wanted 'names'");
+  EXPECT_EQ(OutcomeText(Get("/api/v1/tasks/7")),
+            " | no task of that id; those that ended long ago are forgotten");
+  EXPECT_EQ(OutcomeText(Get("/api/v1/host")), " | this is no simulated host");
+  EXPECT_EQ(OutcomeText(Send({"POST", "/api/v1/AddDisks", "text/xml", "{}"})),
             " | the body must be application/json");
-  EXPECT_EQ(Told(Post("/api/v1/AddDisks", "{}")), "disks | disks, line 1: is missing");
+  EXPECT_EQ(OutcomeText(Post("/api/v1/AddDisks", "{}")), "disks | disks, line 1: is missing");
 }
 
 TEST_F(RefusedRoutes, ElsewhereTellInALineOfText) {
@@ -115,7 +116,7 @@ TEST_F(RefusedRoutes, NeverHoldHalfACharacter) {
                            "{\"names\": \"\xF0\x9F\x98\x80", "{\"n\": 1, \xE2\x82\xAC}"}) {
     const HttpAnswer http = Post("/api/v1/QueryDisksForKova", body);
     EXPECT_EQ(http.status, 400u);
-    EXPECT_NO_THROW(Told(http)) << http.body;  // the reader takes nothing but UTF-8
+    EXPECT_NO_THROW(OutcomeText(http)) << http.body;  // the reader takes nothing but UTF-8
   }
 }
 
@@ -125,11 +126,11 @@ TEST_F(RefusedRoutes, RepeatNoLongText) {
 }
 
 TEST_F(RefusedRoutes, NameAnEmptyKeySoThatItCanBeSeen) {
-  EXPECT_THAT(Told(Post("/api/v1/QueryDisksForKova", R"({"": 1})")),
+  EXPECT_THAT(OutcomeText(Post("/api/v1/QueryDisksForKova", R"({"": 1})")),
               HasSubstr("'' | '', line 1: unknown parameter"));
-  EXPECT_THAT(Told(Post("/api/v1/AddDisks", R"({"disks": [{"": 1}]})")),
+  EXPECT_THAT(OutcomeText(Post("/api/v1/AddDisks", R"({"disks": [{"": 1}]})")),
               HasSubstr("disks[0].'', line 1: unknown field"));
-  EXPECT_THAT(Told(Post("/api/v1/InitializeDisks", R"({"mappings": [{"ssd": "a", "": 1}]})")),
+  EXPECT_THAT(OutcomeText(Post("/api/v1/InitializeDisks", R"({"mappings": [{"ssd": "a", "": 1}]})")),
               HasSubstr("mappings[0].'', line 1: unknown field"));
 }
 
@@ -141,7 +142,7 @@ TEST_F(RefusedRoutes, LeaveNoTask) {
     for (const char* target : {"/api/v1/host", "/api/v1/AddDisks", "/api/v1/RemoveDiskMapping"}) {
       const HttpAnswer http = Post(target, body);
       EXPECT_EQ(http.status, 400u) << target << " " << body;
-      EXPECT_FALSE(Told(http).empty());
+      EXPECT_FALSE(OutcomeText(http).empty());
     }
   }
   EXPECT_THAT(_tasks.List(), IsEmpty());

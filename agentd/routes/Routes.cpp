@@ -214,7 +214,7 @@ constexpr std::array<Route, 13> routes = {{
     {HttpRole::Read, xmlType, "/soap", &IsNothing, &PostSoap},
 }};
 
-bool Leads(const Route& route, std::string_view path) {
+bool Matches(const Route& route, std::string_view path) {
   return path.substr(0, route.path.size()) == route.path && route.takes(path.substr(route.path.size()));
 }
 
@@ -233,7 +233,7 @@ HttpRole RoleFor(const Route& route, std::string_view rest) {
   return operation == nullptr ? route.role : operation->changes ? HttpRole::Change : HttpRole::Read;
 }
 
-void Follow(const Route& route, const Call& call) {
+void ServeRoute(const Route& route, const Call& call) {
   try {
     route.serve(call);
   } catch (...) {
@@ -247,7 +247,7 @@ std::string NameOf(const Route& route, std::string_view rest) {
 }
 
 // Where a request leads, as far as its header tells. It looks into the target.
-struct Way {
+struct RouteMatch {
   const Route* route = nullptr;
   std::string_view rest = {};
   std::string name = "none";
@@ -257,7 +257,7 @@ struct Way {
 // The route of that method; otherwise, what else is served there.
 const Route* FindRoute(std::string_view method, std::string_view path, std::string& allow) {
   for (const Route& route : routes) {
-    if (!Leads(route, path)) {
+    if (!Matches(route, path)) {
       continue;
     }
     const bool isGet = route.bodyType.empty();
@@ -289,7 +289,7 @@ std::optional<HttpAnswer> RefusalOn(const Route& route, std::string_view rest, c
   return std::nullopt;
 }
 
-Way FindWay(const HttpRequest& head, const std::optional<HttpTarget>& target) {
+RouteMatch MatchRoute(const HttpRequest& head, const std::optional<HttpTarget>& target) {
   if (!target) {
     return {.refusal = RefusalAt(head.target, 400, "the target holds a broken escape")};
   }
@@ -332,22 +332,23 @@ bool Router::WaitUntilIdle(std::chrono::milliseconds patience) const {
 }
 
 HttpAdmission Router::Admit(const HttpRequest& head) const {
-  Way way = FindWay(head, ParseTarget(head.target));
-  if (way.refusal) {
-    _metrics->Count(way.name, way.refusal->status, {});
+  RouteMatch match = MatchRoute(head, ParseTarget(head.target));
+  if (match.refusal) {
+    _metrics->Count(match.name, match.refusal->status, {});
   }
-  return {std::move(way.refusal), MostBodyOf(head.peer.role)};
+  return {std::move(match.refusal), MostBodyOf(head.peer.role)};
 }
 
 void Router::Serve(const HttpRequest& request, const HttpResponder& responder) const {
   const std::optional<HttpTarget> target = ParseTarget(request.target);
-  const Way way = FindWay(request, target);
-  const HttpResponder counted = Counted(_metrics, way.name, responder);
-  if (way.refusal) {
-    counted.Answer(*way.refusal);
+  const RouteMatch match = MatchRoute(request, target);
+  const HttpResponder counted = Counted(_metrics, match.name, responder);
+  if (match.refusal) {
+    counted.Answer(*match.refusal);
   } else {
-    Follow(*way.route,
-           {{*_api, _tasks, *_queries}, *_metrics, *_watch, _load, *target, request, counted, way.rest});
+    ServeRoute(
+        *match.route,
+        {{*_api, _tasks, *_queries}, *_metrics, *_watch, _load, *target, request, counted, match.rest});
   }
 }
 

@@ -157,11 +157,11 @@ void TaskQueue::Run(Entry& entry) {
     entry.task.percent = percent;
     entry.task.step = step;
   });
-  auto [answer, outcome] = Carry(entry);
+  auto [answer, outcome] = CallWork(entry);
   End(entry, std::move(answer), outcome);
 }
 
-std::pair<Host::Answer, Host::Outcome> TaskQueue::Carry(const Entry& entry) {
+std::pair<Host::Answer, Host::Outcome> TaskQueue::CallWork(const Entry& entry) {
   try {
     Host::Answer answer = entry.work();
     const Host::Outcome outcome =

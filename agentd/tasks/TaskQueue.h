@@ -76,7 +76,7 @@ class TaskQueue {
 
   void RunAll();
   void Run(Entry& entry);
-  std::pair<Host::Answer, Host::Outcome> Carry(const Entry& entry);
+  std::pair<Host::Answer, Host::Outcome> CallWork(const Entry& entry);
   std::shared_ptr<Entry> NextWaiting(Lock& lock);
   // Ends the task, and tells its listener with the lock let go.
   void End(Entry& entry, Host::Answer answer, Host::Outcome outcome);

@@ -86,7 +86,7 @@ Request WithOptions(Request request, const RemovalOptions& options) {
 
 // What an answer or a refusal comes to: "done", "KovaFault", "PROPERTY | MESSAGE" for an InvalidArgument with
 // a message, the reason of a SystemError.
-inline std::string Told(const Orbis::MethodFault* fault) {
+inline std::string OutcomeText(const Orbis::MethodFault* fault) {
   if (fault == nullptr) {
     return "done";
   }

@@ -151,7 +151,7 @@ class RemoveGroupChange final : public Change {
     if (groups.Info() == nullptr) {
       return groups.Fault();
     }
-    _group = groups.Demand(_cacheDisk).GetMapping();
+    _group = groups.Require(_cacheDisk).GetMapping();
     return nullptr;
   }
   bool Destroys() const override { return true; }
@@ -179,7 +179,7 @@ class UnmountChange final : public Change {
     }
     _groups = MakeRef<Host::MappingList>();
     for (const std::string& cacheDisk : _cacheDisks) {
-      _groups->Append(groups.Demand(cacheDisk).GetMapping());
+      _groups->Append(groups.Require(cacheDisk).GetMapping());
     }
     return nullptr;
   }

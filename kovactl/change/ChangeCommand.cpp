@@ -59,7 +59,7 @@ void NoteForgotten(const ChangeOptions& options, std::ostream& err) {
 ExitStatus RunChange(const Host::ManagementApi& host, Change& change, const Consent& consent,
                      const ChangeOptions& options, std::ostream& out, std::ostream& err) {
   if (change.Destroys()) {
-    consent.Demand();
+    consent.Require();
   }
   if (const Ref<Orbis::MethodFault> fault = change.LookAt(host)) {
     PrintFault(*fault, err);

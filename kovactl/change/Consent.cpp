@@ -20,14 +20,14 @@ Consent Consent::OfNobody() {
   return {false, nullptr, nullptr};
 }
 
-void Consent::Demand() const {
+void Consent::Require() const {
   if (!_given && _in == nullptr) {
     throw BadInput("this destroys data, and nobody is at the terminal to be asked: give --yes to go on");
   }
 }
 
 bool Consent::AskFor(const std::vector<std::string>& disks) const {
-  Demand();
+  Require();
   if (_given) {
     return true;
   }

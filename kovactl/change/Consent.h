@@ -17,7 +17,7 @@ class Consent {
   static Consent OfNobody();
 
   // Throws BadInput, which says how to give consent, when it can neither be taken for granted nor asked for.
-  void Demand() const;
+  void Require() const;
   // Names the disks that may lose their data and asks whether to go on; only "y" or "yes" means that.
   bool AskFor(const std::vector<std::string>& disks) const;
 

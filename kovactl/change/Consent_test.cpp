@@ -43,13 +43,13 @@ TEST(Consent, IsAskedForWithTheNamesOfTheDisks) {
 }
 
 TEST(Consent, GivenBeforehandIsNotAskedFor) {
-  EXPECT_NO_THROW(Consent::Given().Demand());
+  EXPECT_NO_THROW(Consent::Given().Require());
   EXPECT_TRUE(Consent::Given().AskFor({"naa.1"}));
 }
 
 TEST(Consent, OfNobodyIsRefusedWithTheWayToGiveIt) {
   try {
-    Consent::OfNobody().Demand();
+    Consent::OfNobody().Require();
     FAIL() << "nobody agreed";
   } catch (const BadInput& refused) {
     EXPECT_THAT(refused.what(), HasSubstr("--yes"));

@@ -80,7 +80,7 @@ std::vector<Kovasvc::Planning::OfferedDisk> OfferedOf(const KernelRecords& recor
                                  listed.count(record.name) != 0,
                      .isSsd = record.isSsd,
                      .capacityFlash = record.capacityFlash,
-                     .offline = record.reason == HostCtl::Kova::DiskReason::GroupNotMounted,
+                     .unmounted = record.reason == HostCtl::Kova::DiskReason::GroupNotMounted,
                      .group = group == groups.end() ? std::nullopt : std::optional(group->second)});
   }
   return disks;

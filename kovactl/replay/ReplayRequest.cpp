@@ -26,19 +26,19 @@ constexpr std::string_view tagKey = "requestTag";
   throw Orbis::ParseException(path, value.line, reason);
 }
 
-void Demand(Kind kind, const char* wanted, const Value& value, const std::string& path) {
+void Require(Kind kind, const char* wanted, const Value& value, const std::string& path) {
   if (value.kind != kind) {
     Refuse(value, path, std::string("wanted ") + wanted + ", found " + Orbis::Json::Describe(value));
   }
 }
 
 const std::string& TextOf(const Value& value, const std::string& path) {
-  Demand(Kind::String, "a text", value, path);
+  Require(Kind::String, "a text", value, path);
   return value.text;
 }
 
 std::vector<std::string> TextsOf(const Value& value, const std::string& path) {
-  Demand(Kind::Array, "an array", value, path);
+  Require(Kind::Array, "an array", value, path);
   std::vector<std::string> texts;
   for (const Value& item : value.items) {
     texts.push_back(TextOf(item, path + "[" + std::to_string(texts.size()) + "]"));
@@ -47,7 +47,7 @@ std::vector<std::string> TextsOf(const Value& value, const std::string& path) {
 }
 
 std::int32_t IntOf(const Value& value, const std::string& path) {
-  Demand(Kind::Integer, "an integer", value, path);
+  Require(Kind::Integer, "an integer", value, path);
   if (value.integer < std::numeric_limits<std::int32_t>::min() ||
       value.integer > std::numeric_limits<std::int32_t>::max()) {
     Refuse(value, path, "does not fit in 32 bits");
@@ -156,7 +156,7 @@ void ParseRaw(const Value& root, ReplayRequest& request) {
 void ParseHost(const Value& root, std::string_view line, ReplayRequest& request) {
   const auto read = [&](const std::string& key, nlohmann::json& part) {
     if (const Value* const value = root.Find(key)) {
-      Demand(Kind::Object, "an object", *value, key);
+      Require(Kind::Object, "an object", *value, key);
       part = nlohmann::json::parse(line)[key];  // sound and free of double keys: it was read before
     }
   };
@@ -169,7 +169,7 @@ void ParseHost(const Value& root, std::string_view line, ReplayRequest& request)
 
 ReplayRequest ParseReplayRequest(std::string_view line) {
   const Value root = Orbis::Json::Parse(line, Orbis::Limits::OwnOutput());
-  Demand(Kind::Object, "an object", root, "(root)");
+  Require(Kind::Object, "an object", root, "(root)");
   const Value* const operation = root.Find("operation");
   if (operation == nullptr) {
     Refuse(root, "operation", "is missing");

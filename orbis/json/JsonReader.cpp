@@ -42,7 +42,7 @@ struct Place {
   throw ParseException(path.empty() ? "(root)" : path, value.line, reason);
 }
 
-void Demand(Kind kind, const char* wanted, const Value& value, const Place& place) {
+void Require(Kind kind, const char* wanted, const Value& value, const Place& place) {
   if (value.kind != kind) {
     Refuse(value, place, std::string("wanted ") + wanted + ", found " + Json::Describe(value));
   }
@@ -63,7 +63,7 @@ class JsonReader {
     if (named && value.kind == Kind::String) {
       return _rules.named(*declared, value.text);
     }
-    Demand(Kind::Object, named ? "an object or its name" : "an object", value, place);
+    Require(Kind::Object, named ? "an object or its name" : "an object", value, place);
     const TypeDescriptor& type = TypeOf(value, declared, place);
     return type.kind == TypeKind::DataObject ? ReadObject(value, type, place)
                                              : ReadWrapped(value, type, place);
@@ -73,7 +73,7 @@ class JsonReader {
   const TypeDescriptor& TypeOf(const Value& value, const TypeDescriptor* declared, const Place& place) const {
     const Value* const name = value.Find(typeKey);
     if (name != nullptr) {
-      Demand(Kind::String, "the name of a type", *name, Place{&place, typeKey});
+      Require(Kind::String, "the name of a type", *name, Place{&place, typeKey});
     }
     const TypeDescriptor* const type = name == nullptr ? declared : Named(name->text);
     if (name != nullptr && type == nullptr) {
@@ -151,7 +151,7 @@ class JsonReader {
   }
 
   Ref<Any> ReadList(const Value& value, const TypeDescriptor& type, const Place& place) const {
-    Demand(Kind::Array, "an array", value, place);
+    Require(Kind::Array, "an array", value, place);
     Place itemPlace{&place, {}, 0};
     if (type.kind == TypeKind::StringArray) {
       const Ref<TextList> texts = MakeRef<TextList>();

@@ -34,7 +34,7 @@ void SleepFor(std::chrono::milliseconds delay) {
   std::this_thread::sleep_for(delay);
 }
 
-void Suffer(const FaultEffect& effect, const Waiter& wait) {
+void ApplyEffect(const FaultEffect& effect, const Waiter& wait) {
   if (effect.delay.count() > 0) {
     wait(effect.delay);
   }

@@ -49,6 +49,6 @@ using Waiter = std::function<void(std::chrono::milliseconds)>;
 void SleepFor(std::chrono::milliseconds delay);
 
 // Waits if there is a delay, then throws if the effect says so. Call it without holding a lock.
-void Suffer(const FaultEffect& effect, const Waiter& wait = &SleepFor);
+void ApplyEffect(const FaultEffect& effect, const Waiter& wait = &SleepFor);
 
 }  // namespace OtxCtl::Fault

@@ -53,14 +53,14 @@ TEST(FaultRules, DelaysAloneAddUpAndThrowNothing) {
       EffectOf({Waiting("RemoveDisk", 1, 5), Waiting("RemoveDisk", 0, 7)}, "RemoveDisk", 1);
   EXPECT_FALSE(effect.thrown);
   EXPECT_EQ(effect.delay, milliseconds(12));
-  EXPECT_NO_THROW(Suffer({}));
+  EXPECT_NO_THROW(ApplyEffect({}));
 }
 
 TEST(FaultRules, SufferingThrowsWhatTheRuleSays) {
   FaultEffect effect;
   effect.thrown = Throwing("RemoveDisk", 0, "broken");
   try {
-    Suffer(effect);
+    ApplyEffect(effect);
     FAIL();
   } catch (const HostCtl::Lib::KovaStorageException& exception) {
     EXPECT_STREQ(exception.what(), "broken");

@@ -57,7 +57,7 @@ void RecordingProvider::AroundCall(const Provider::ProviderCall& call, const For
   FaultEffect effect;
   const std::uint64_t ticket = _recorder->Begin(call.operation, ArgumentsOf(call), effect);
   try {
-    Suffer(effect);
+    ApplyEffect(effect);
     forward();
     _recorder->End(ticket, "ok");
   } catch (const std::exception& failure) {

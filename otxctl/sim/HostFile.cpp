@@ -19,12 +19,12 @@ namespace {
 
 constexpr mode_t kNewFileMode = 0644;
 
-std::string Told(const std::string& path, const std::string& what, int error) {
+std::string ErrorText(const std::string& path, const std::string& what, int error) {
   return path + ": " + what + ": " + std::system_category().message(error);
 }
 
 [[noreturn]] void Fail(const std::string& path, const std::string& what, int error) {
-  throw HostFileError(Told(path, what, error));
+  throw HostFileError(ErrorText(path, what, error));
 }
 
 // Repeats a system call that a signal interrupted.
@@ -190,7 +190,7 @@ std::optional<std::string> HostFileWriter::Save(const HostDescription& host) con
   file.Write(text);
   file.Place();
   if (Uninterrupted([&] { return _syncFolder(folder.Get()); }) != 0) {
-    return Told(_path, "was saved, but may not last a power cut", errno);
+    return ErrorText(_path, "was saved, but may not last a power cut", errno);
   }
   return std::nullopt;
 }

@@ -110,7 +110,7 @@ void SimHost::Enter(std::string_view operation) {
     effect = Fault::EffectOf(_rules.Host().faults, operation, _counter.Next(operation));
     waiter = _waiter;
   }
-  Fault::Suffer(effect, waiter);
+  Fault::ApplyEffect(effect, waiter);
 }
 
 template <typename Look>

@@ -278,12 +278,12 @@ std::string HostModel::CheckGroup(const NamedGroup& group, bool& isRead) const {
 }
 
 void HostModel::MakeOrRestamp(const NamedGroup& group) {
-  const bool isOffline = std::any_of(_records.begin(), _records.end(), [&](const auto& record) {
+  const bool isUnmounted = std::any_of(_records.begin(), _records.end(), [&](const auto& record) {
     return record.name == group.ssd && record.reason == DiskReason::GroupNotMounted;
   });
   if (IsLost(group.ssd)) {
     RestampByUuid(UuidIn(group.ssd));
-  } else if (isOffline) {
+  } else if (isUnmounted) {
     Restamp(group.ssd);
     Mount(group.ssd);
   } else {

@@ -9,25 +9,26 @@ namespace Integration {
 
 struct KernelException {
   std::string_view name;
-  enum class Told { Reason, Disk, Words } told;  // by its words as a SystemError, its disk, its words
+  enum class FaultShows { Reason, Disk, Words } told;  // by its words as a SystemError, its disk, its words
   std::string_view fault;
 
   // The fault as the answers of requests write it.
   std::string FaultText(const std::string& words, const std::string& disk) const {
     const std::string type(fault);
-    return told == Told::Reason ? type + ": " + words : type + " " + (told == Told::Disk ? disk : words);
+    return told == FaultShows::Reason ? type + ": " + words
+                                      : type + " " + (told == FaultShows::Disk ? disk : words);
   }
 };
 
 inline constexpr std::array<KernelException, 8> kernelExceptions = {{
-    {"HostCtlException", KernelException::Told::Reason, "SystemError"},
-    {"KovaStorageException", KernelException::Told::Reason, "SystemError"},
-    {"KovaExceptionHasPartition", KernelException::Told::Disk, "DiskHasPartitions"},
-    {"KovaExceptionLastRemainingHDD", KernelException::Told::Disk, "DiskIsLastRemainingNonSSD"},
-    {"KovaExceptionRescanError", KernelException::Told::Words, "KovaDiskFault"},
-    {"KovaExceptionRemoveMappingAutoModeEnabled", KernelException::Told::Words, "KovaDiskFault"},
-    {"KovaExceptionRemoveDiskAutoModeEnabled", KernelException::Told::Words, "KovaDiskFault"},
-    {"KovaExceptionIncompatibleDiskMapping", KernelException::Told::Reason, "SystemError"},
+    {"HostCtlException", KernelException::FaultShows::Reason, "SystemError"},
+    {"KovaStorageException", KernelException::FaultShows::Reason, "SystemError"},
+    {"KovaExceptionHasPartition", KernelException::FaultShows::Disk, "DiskHasPartitions"},
+    {"KovaExceptionLastRemainingHDD", KernelException::FaultShows::Disk, "DiskIsLastRemainingNonSSD"},
+    {"KovaExceptionRescanError", KernelException::FaultShows::Words, "KovaDiskFault"},
+    {"KovaExceptionRemoveMappingAutoModeEnabled", KernelException::FaultShows::Words, "KovaDiskFault"},
+    {"KovaExceptionRemoveDiskAutoModeEnabled", KernelException::FaultShows::Words, "KovaDiskFault"},
+    {"KovaExceptionIncompatibleDiskMapping", KernelException::FaultShows::Reason, "SystemError"},
 }};
 
 }  // namespace Integration

@@ -178,7 +178,7 @@ const Made secondHybrid = {
     "s2", {"c2"}, Making::Format, States({"s2", "c2"}, "eligible"), States({"s2", "c2"}, "inUse")};
 const Made flashOnly = {
     "f", {"t"}, Making::Format, States({"f", "t"}, "eligible"), States({"f", "t"}, "inUse")};
-const Made offline = {
+const Made unmounted = {
     "u", {"m"}, Making::Restamp, States({"u", "m"}, "ineligible"), States({"u", "m"}, "inUse")};
 
 // The group of the host that the request did not make, unless it did.
@@ -199,7 +199,7 @@ Forecast ForecastAddition(const Failure& failure) {
                          "Error checking disks (only found 0): insufficient disks in given mappings"};
   } else {
     // The kernel's groups are asked for thrice: for groups of flash, for hybrid ones, for unmounted ones.
-    std::vector<Made> plan = {firstHybrid, secondHybrid, offline, flashOnly};
+    std::vector<Made> plan = {firstHybrid, secondHybrid, unmounted, flashOnly};
     if (failure.Is("GetDiskMappings", 3)) {
       plan.erase(plan.begin() + 2);
     }

@@ -29,7 +29,7 @@ using Tessa::System::LockGuard;
 namespace {
 
 // Whether the kernel knows exactly one disk of that name, and as part of a group that is not mounted.
-bool IsOffline(Logger& logger, DiskCache& diskCache, const std::string& ssdName) {
+bool IsUnmounted(Logger& logger, DiskCache& diskCache, const std::string& ssdName) {
   std::vector<HostCtl::Kova::DiskResult> records;
   const DiskCache::Locked cache(diskCache);
   LimitQueryDisksForKova(logger, {ssdName}, DiskQueryLimit(), cache.Records(), records);
@@ -90,7 +90,7 @@ void KovaManagerImpl::InitializeMapping(Ref<DiskMapping> mapping, const std::str
   AskKernel(*_logger, "Error formatting KOVA disks: %1", refused, [&] {
     const std::string ssdName = SsdNameOf(mapping.Get());
     Texts capacityNames = CapacityNamesOf(mapping.Get());
-    if (IsOffline(*_logger, *_diskCache, ssdName) || IsPDLDiskInput(ssdName)) {
+    if (IsUnmounted(*_logger, *_diskCache, ssdName) || IsPDLDiskInput(ssdName)) {
       RestampDiskMapping(ssdName, capacityNames);
     } else {
       FormatDiskMapping(ssdName, capacityNames, requestTag, mappingCount, mappingIndex);

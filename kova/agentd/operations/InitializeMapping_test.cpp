@@ -66,43 +66,47 @@ using InitializeMapping = TestSupport::InitializeFixture;
 
 // ---- groups that are there but off-line
 
-struct OfflineCase {
+struct UnmountedCase {
   const char* name;
   std::string ssd;
   std::vector<DiskResult> records;
   bool restamped;
 };
-void PrintTo(const OfflineCase& row, std::ostream* out) {
+void PrintTo(const UnmountedCase& row, std::ostream* out) {
   *out << row.name;
 }
 
-class InitializeGroup : public InitializeMapping, public testing::WithParamInterface<OfflineCase> {};
+class InitializeGroup : public InitializeMapping, public testing::WithParamInterface<UnmountedCase> {};
 
-const DiskReason offline = DiskReason::GroupNotMounted;
+const DiskReason unmounted = DiskReason::GroupNotMounted;
 INSTANTIATE_TEST_SUITE_P(
-    Offline, InitializeGroup,
+    Unmounted, InitializeGroup,
     testing::Values(
-        OfflineCase{"KnownAsOffline", "s1", {ARecord("s1").Ssd().Ineligible(offline)}, true},
-        OfflineCase{"KnownAsOfflineWhateverTheState", "s1", {ARecord("s1").Ssd().Reason(offline)}, true},
-        OfflineCase{"KnownAsOfflineWhateverTheKind", "s1", {ARecord("s1").Ineligible(offline)}, true},
-        OfflineCase{"LostDevice", "kova:" + uuid, {}, true},
-        OfflineCase{"LostDeviceThatTheKernelCallsEligible", "kova:x", {ARecord("kova:x")}, true},
-        OfflineCase{"TwoRecords",
-                    "s1",
-                    {ARecord("s1").Ssd().Ineligible(offline), ARecord("s1").Ssd().Ineligible(offline)},
-                    false},
-        OfflineCase{"NoRecord", "s1", {}, false}, OfflineCase{"Eligible", "s1", {ARecord("s1").Ssd()}, false},
-        OfflineCase{
+        UnmountedCase{"KnownAsUnmounted", "s1", {ARecord("s1").Ssd().Ineligible(unmounted)}, true},
+        UnmountedCase{
+            "KnownAsUnmountedWhateverTheState", "s1", {ARecord("s1").Ssd().Reason(unmounted)}, true},
+        UnmountedCase{"KnownAsUnmountedWhateverTheKind", "s1", {ARecord("s1").Ineligible(unmounted)}, true},
+        UnmountedCase{"LostDevice", "kova:" + uuid, {}, true},
+        UnmountedCase{"LostDeviceThatTheKernelCallsEligible", "kova:x", {ARecord("kova:x")}, true},
+        UnmountedCase{"TwoRecords",
+                      "s1",
+                      {ARecord("s1").Ssd().Ineligible(unmounted), ARecord("s1").Ssd().Ineligible(unmounted)},
+                      false},
+        UnmountedCase{"NoRecord", "s1", {}, false},
+        UnmountedCase{"Eligible", "s1", {ARecord("s1").Ssd()}, false},
+        UnmountedCase{
             "EligibleWithAnotherReason", "s1", {ARecord("s1").Ssd().Reason(DiskReason::TooSmall)}, false},
-        OfflineCase{"InUse", "s1", {ARecord("s1").Ssd().InUse(uuid)}, false},
-        OfflineCase{
-            "ItsCapacityDiskIsOffline", "s1", {ARecord("s1").Ssd(), ARecord("a").Ineligible(offline)}, false},
-        OfflineCase{"NameLikeALostDevices", "KOVA:x", {}, false},
-        OfflineCase{"NameWithTheMarkInside", "xkova:", {}, false}),
+        UnmountedCase{"InUse", "s1", {ARecord("s1").Ssd().InUse(uuid)}, false},
+        UnmountedCase{"ItsCapacityDiskIsUnmounted",
+                      "s1",
+                      {ARecord("s1").Ssd(), ARecord("a").Ineligible(unmounted)},
+                      false},
+        UnmountedCase{"NameLikeALostDevices", "KOVA:x", {}, false},
+        UnmountedCase{"NameWithTheMarkInside", "xkova:", {}, false}),
     [](const auto& test) { return std::string(test.param.name); });
 
 TEST_P(InitializeGroup, IsRestampedOrFormatted) {
-  const OfflineCase& row = GetParam();
+  const UnmountedCase& row = GetParam();
   _kernel.records = row.records;
   const auto spy = UseManager<SpyManager>();
   Initialize({AMapping(Ssd(row.ssd), {Hdd("b"), Hdd("a")})});
@@ -115,7 +119,7 @@ TEST_P(InitializeGroup, IsRestampedOrFormatted) {
 }
 
 TEST_F(InitializeMapping, LooksUpTheSsdInWhatTheLastGroupLeftInTheCache) {
-  WhenFormatting("s1", [this] { SetRecord(ARecord("s2").Ssd().Ineligible(offline)); });
+  WhenFormatting("s1", [this] { SetRecord(ARecord("s2").Ssd().Ineligible(unmounted)); });
   Initialize({_first, _second});
   EXPECT_THAT(Formats(), ElementsAre("FormatDiskMapping(s1, [a], {tag, 2, 0})"));
   EXPECT_THAT(Calls("RestampDiskMapping"), ElementsAre("RestampDiskMapping(s2, [b])"));

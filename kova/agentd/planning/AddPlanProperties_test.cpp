@@ -119,12 +119,12 @@ class HostDraw {
       group.cacheListed = other.cacheListed;
     } else if (Chance(3)) {
       group.cacheListed = true;
-      sample.disks.push_back({.name = group.cacheDisk, .isSsd = true, .offline = true, .group = number});
+      sample.disks.push_back({.name = group.cacheDisk, .isSsd = true, .unmounted = true, .group = number});
       for (std::size_t i = 0; i < group.capacityDisks; ++i) {
         sample.disks.push_back({.name = Name(std::string(group.cacheDisk) + "-", i + 1),
                                 .isSsd = group.allFlash,
                                 .capacityFlash = group.allFlash,
-                                .offline = true,
+                                .unmounted = true,
                                 .group = number});
       }
     }
@@ -156,7 +156,7 @@ class AddPlanOfRandomHosts : public TestSupport::PluginFixture {
       record.CapacityFlash();
     }
     if (!disk.eligible) {
-      record.Ineligible(disk.offline ? DiskReason::GroupNotMounted : DiskReason::Usb);
+      record.Ineligible(disk.unmounted ? DiskReason::GroupNotMounted : DiskReason::Usb);
     }
     return record;
   }

@@ -44,7 +44,7 @@ bool IsRequested(const HostCtl::Kova::DiskMapping& group, const std::string& ssd
                      [&](const DiskName& disk) { return requested.contains(RequestNameOf(disk)); });
 }
 
-bool IsOfflineSsd(const DiskResult& record) {
+bool IsUnmountedSsd(const DiskResult& record) {
   return record.isSsd && record.reason == DiskReason::GroupNotMounted;
 }
 
@@ -103,7 +103,7 @@ void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candida
     const DiskCache::Locked cache(*_diskCache);
     LimitQueryDisksForKova(*_logger, ssdNames, DiskQueryLimit(), cache.Records(), records);
   }
-  std::erase_if(records, [](const DiskResult& record) { return !IsOfflineSsd(record); });
+  std::erase_if(records, [](const DiskResult& record) { return !IsUnmountedSsd(record); });
   NameList notMounted(NamesOfRecords(records));
   if (notMounted.IsEmpty()) {
     return;

@@ -72,7 +72,7 @@ void PlanHybrid(const Disks& disks, const Names& taken, const Groups& groups, Ad
 // Adds the groups that are not mounted and whose cache disks are among the disks.
 void PlanMounts(const Disks& disks, const Groups& groups, AddPlan& plan) {
   const auto heads = [](const OfferedDisk& disk, const HostGroup& group) {
-    return disk.isSsd && disk.offline && disk.name == group.cacheDisk;
+    return disk.isSsd && disk.unmounted && disk.name == group.cacheDisk;
   };
   for (std::size_t position = 0; position < groups.size(); ++position) {
     const HostGroup& group = groups[position];

@@ -22,7 +22,7 @@ struct OfferedDisk {
   bool eligible = false;
   bool isSsd = false;
   bool capacityFlash = false;                       // a flash disk that is meant for capacity
-  bool offline = false;                             // the kernel says that its group is not mounted
+  bool unmounted = false;                           // the kernel says that its group is not mounted
   std::optional<std::size_t> group = std::nullopt;  // of the host, to which it belongs
 };
 

@@ -148,14 +148,14 @@ OfferedDisk Named(std::string_view name, OfferedDisk disk) {
   disk.name = name;
   return disk;
 }
-OfferedDisk Offline(std::string_view name, bool isSsd, std::size_t group) {
-  return {.name = name, .isSsd = isSsd, .offline = true, .group = group};
+OfferedDisk Unmounted(std::string_view name, bool isSsd, std::size_t group) {
+  return {.name = name, .isSsd = isSsd, .unmounted = true, .group = group};
 }
 
 TEST(NamedAddPlan, MountsTheGroupsOfItsDisksBetweenHybridAndAllFlashOnes) {
-  const std::vector<OfferedDisk> disks = {Offline("g1", true, 1), Offline("c1", false, 1),
-                                          Named("s", cacheDisk),  Named("h", hardDisk),
-                                          Named("t", cacheDisk),  Named("f", capacityFlash)};
+  const std::vector<OfferedDisk> disks = {Unmounted("g1", true, 1), Unmounted("c1", false, 1),
+                                          Named("s", cacheDisk),    Named("h", hardDisk),
+                                          Named("t", cacheDisk),    Named("f", capacityFlash)};
   const std::vector<HostGroup> groups = {Headed("g0", AHybridGroup(1)), Headed("g1", AHybridGroup(2))};
   const AddPlan plan = PlanNamedAddition(disks, groups, {"g1", "c1", "s", "h", "t", "f"});
   EXPECT_THAT(Groups(plan), ElementsAre("new hybrid 4: 3", "mounted hybrid 1: 1", "new all-flash 2: 5"));
@@ -164,7 +164,7 @@ TEST(NamedAddPlan, MountsTheGroupsOfItsDisksBetweenHybridAndAllFlashOnes) {
 }
 
 TEST(NamedAddPlan, MountsNoGroupOfWhichItHasOnlyCapacityDisks) {
-  const AddPlan plan = PlanNamedAddition({Offline("c1", false, 0), Offline("f1", true, 0)},
+  const AddPlan plan = PlanNamedAddition({Unmounted("c1", false, 0), Unmounted("f1", true, 0)},
                                          {Headed("g0", AHybridGroup(2))}, {"c1", "f1"});
   EXPECT_THAT(plan.groups, IsEmpty());
   EXPECT_THAT(plan.leftOver, testing::Each(LeftOver::NotEligible));
@@ -177,12 +177,13 @@ TEST(NamedAddPlan, MountsNoGroupThatIsMounted) {
 }
 
 TEST(NamedAddPlan, MountsNoGroupByACacheDiskThatIsNoFlashDisk) {
-  const AddPlan plan = PlanNamedAddition({Offline("g0", false, 0)}, {Headed("g0", AHybridGroup(2))}, {"g0"});
+  const AddPlan plan =
+      PlanNamedAddition({Unmounted("g0", false, 0)}, {Headed("g0", AHybridGroup(2))}, {"g0"});
   EXPECT_THAT(plan.groups, IsEmpty());
 }
 
 TEST(AddPlan, OfEveryDiskMountsNothing) {
-  const AddPlan plan = PlanAddition({Offline("g0", true, 0)}, {Headed("g0", AHybridGroup(1))});
+  const AddPlan plan = PlanAddition({Unmounted("g0", true, 0)}, {Headed("g0", AHybridGroup(1))});
   EXPECT_THAT(plan.groups, IsEmpty());
 }
 
@@ -228,7 +229,8 @@ TEST(FindRepeatedNeighbour, MindsOnlyNeighbours) {
 
 #ifndef NDEBUG
 TEST(NamedAddPlanDeath, TakesNoDiskOfAGroupThatTheHostLacks) {
-  EXPECT_DEATH(PlanNamedAddition({Offline("g0", true, 1)}, {Headed("g0", AHybridGroup(1))}, {"g0"}), "group");
+  EXPECT_DEATH(PlanNamedAddition({Unmounted("g0", true, 1)}, {Headed("g0", AHybridGroup(1))}, {"g0"}),
+               "group");
 }
 #endif
 

@@ -10,9 +10,9 @@
 
 namespace Agentd::Testing {
 
-class ToldHost {
+class ScriptedHost {
  public:
-  ToldHost() {
+  ScriptedHost() {
     Tell({}, {});
     api.answerTo = [this](const std::string& asked) -> Host::Answer {
       const bool isDisks = asked.rfind("QueryDisksForKova", 0) == 0;

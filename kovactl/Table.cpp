@@ -5,15 +5,10 @@
 #include <utility>
 
 #include "host/Text.h"
+#include "tessa/text/Utf8.h"
 
 namespace Kovactl {
 namespace {
-
-// How many characters a clean text has.
-std::size_t Width(const std::string& text) {
-  return static_cast<std::size_t>(
-      std::count_if(text.begin(), text.end(), [](char byte) { return (byte & 0xc0) != 0x80; }));
-}
 
 std::string Trimmed(std::string line) {
   line.erase(line.find_last_not_of(' ') + 1);
@@ -36,7 +31,7 @@ void Table::Print(std::ostream& out) const {
   std::vector<std::size_t> widths(_columns.size(), 0);
   for (const std::vector<std::string>& row : _rows) {
     for (std::size_t i = 0; i < row.size(); ++i) {
-      widths[i] = std::max(widths[i], Width(row[i]));
+      widths[i] = std::max(widths[i], Tessa::CountCharacters(row[i]));
     }
   }
   const auto printLine = [&](const auto& cellOf) {
@@ -46,7 +41,8 @@ void Table::Print(std::ostream& out) const {
         continue;
       }
       const std::string& cell = cellOf(i);
-      const std::string padding(std::max(widths[i], Width(_columns[i].title)) - Width(cell), ' ');
+      const std::string padding(
+          std::max(widths[i], Tessa::CountCharacters(_columns[i].title)) - Tessa::CountCharacters(cell), ' ');
       line += line.empty() ? "" : "  ";
       line += _columns[i].align == Align::Right ? padding + cell : cell + padding;
     }

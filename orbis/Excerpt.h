@@ -3,6 +3,8 @@
 
 #include <string_view>
 
+#include "tessa/text/Utf8.h"
+
 namespace Orbis {
 
 // At most `most` bytes of the text, cut between two characters of UTF-8. A text that is not UTF-8 is cut no
@@ -13,7 +15,7 @@ inline std::string_view Excerpt(std::string_view text, std::size_t most = 64) {
     return text;
   }
   std::size_t end = most;
-  const auto isInside = [&] { return (static_cast<unsigned char>(text[end]) & 0xC0) == 0x80; };
+  const auto isInside = [&] { return Tessa::IsContinuationByte(text[end]); };
   while (end > 0 && most - end < mostContinuations && isInside()) {
     --end;
   }

@@ -9,6 +9,7 @@
 
 #include "orbis/Excerpt.h"
 #include "orbis/ParseException.h"
+#include "tessa/text/Utf8.h"
 
 namespace Orbis::Json {
 namespace {
@@ -56,8 +57,7 @@ class LineCounter {
 // The library's words, which end in all that it read of a broken value, perhaps in the middle of a character.
 std::string Readable(std::string_view words) {
   constexpr std::size_t most = 200;
-  const Library cut(std::string(Excerpt(words, most)));
-  return Library::parse(cut.dump(-1, ' ', false, Library::error_handler_t::replace)).get<std::string>();
+  return Tessa::ReplaceInvalidUtf8(Excerpt(words, most));
 }
 
 // Builds the tree from the library's events and refuses what passes the limits.

@@ -3,11 +3,11 @@
 #include <array>
 #include <cstddef>
 
+#include "tessa/text/Utf8.h"
+
 namespace Orbis::Xml {
 
 namespace {
-
-constexpr std::string_view kReplacement = "\xEF\xBF\xBD";
 
 // What is written for an ASCII character; empty: the character itself.
 using Escapes = std::array<std::string_view, 128>;
@@ -15,7 +15,7 @@ using Escapes = std::array<std::string_view, 128>;
 constexpr Escapes TextEscapes() {
   Escapes escapes{};
   for (std::size_t control = 0; control < 0x20; ++control) {
-    escapes[control] = kReplacement;
+    escapes[control] = Tessa::replacementCharacter;
   }
   escapes['\t'] = {};
   escapes['\n'] = {};
@@ -38,55 +38,6 @@ constexpr Escapes AttributeEscapes() {
 constexpr Escapes kTextEscapes = TextEscapes();
 constexpr Escapes kAttributeEscapes = AttributeEscapes();
 
-// How a character of more than one byte may begin: its size, and the bounds of its second byte, which
-// keep out overlong forms, surrogates and what lies beyond U+10FFFF.
-struct LeadByte {
-  unsigned char first;
-  unsigned char last;
-  std::size_t size;
-  unsigned char secondFrom;
-  unsigned char secondTo;
-};
-
-constexpr LeadByte kLeadBytes[] = {
-    {0xC2, 0xDF, 2, 0x80, 0xBF}, {0xE0, 0xE0, 3, 0xA0, 0xBF}, {0xE1, 0xEC, 3, 0x80, 0xBF},
-    {0xED, 0xED, 3, 0x80, 0x9F}, {0xEE, 0xEF, 3, 0x80, 0xBF}, {0xF0, 0xF0, 4, 0x90, 0xBF},
-    {0xF1, 0xF3, 4, 0x80, 0xBF}, {0xF4, 0xF4, 4, 0x80, 0x8F},
-};
-
-unsigned char ByteAt(std::string_view text, std::size_t at) {
-  return static_cast<unsigned char>(text[at]);
-}
-
-struct Character {
-  std::size_t size;  // bytes of the character, or of what is replaced
-  bool valid;
-};
-
-bool IsNonCharacter(std::string_view character) {
-  return character == "\xEF\xBF\xBE" || character == "\xEF\xBF\xBF";
-}
-
-// The character that begins at `at`, where a byte beyond ASCII stands.
-Character MeasureCharacter(std::string_view text, std::size_t at) {
-  for (const LeadByte& lead : kLeadBytes) {
-    if (ByteAt(text, at) < lead.first || ByteAt(text, at) > lead.last) {
-      continue;
-    }
-    std::size_t size = 1;
-    unsigned char from = lead.secondFrom;
-    unsigned char to = lead.secondTo;
-    while (size < lead.size && at + size < text.size() && ByteAt(text, at + size) >= from &&
-           ByteAt(text, at + size) <= to) {
-      ++size;
-      from = 0x80;
-      to = 0xBF;
-    }
-    return {size, size == lead.size && !IsNonCharacter(text.substr(at, size))};
-  }
-  return {1, false};
-}
-
 void Append(std::string& out, std::string_view text, const Escapes& escapes) {
   std::size_t copied = 0;  // everything before is in `out`
   std::size_t at = 0;
@@ -96,16 +47,17 @@ void Append(std::string& out, std::string_view text, const Escapes& escapes) {
     copied = at;
   };
   while (at < text.size()) {
-    if (const unsigned char c = ByteAt(text, at); c < 0x80) {
+    if (const auto c = static_cast<unsigned char>(text[at]); c < 0x80) {
       if (escapes[c].empty()) {
         ++at;
       } else {
         replace(1, escapes[c]);
       }
-    } else if (const Character character = MeasureCharacter(text, at); character.valid) {
+    } else if (const Tessa::Utf8Character character = Tessa::FirstCharacter(text.substr(at));
+               character.isValid && !Tessa::IsNonCharacter(character.codePoint)) {
       at += character.size;
     } else {
-      replace(character.size, kReplacement);
+      replace(character.size, Tessa::replacementCharacter);
     }
   }
   out.append(text, copied);

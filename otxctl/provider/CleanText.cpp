@@ -1,68 +1,19 @@
 #include "otxctl/provider/CleanText.h"
 
-#include <array>
-#include <cstdint>
+#include "tessa/text/Utf8.h"
 
 namespace OtxCtl::Provider {
 namespace {
 
+using Tessa::FirstCharacter;
+using Tessa::IsNonCharacter;
+using Tessa::replacementCharacter;
+using Tessa::Utf8Character;
+
 constexpr std::size_t kLongestQuote = 120;
 
-struct Character {
-  std::uint32_t codePoint = 0;
-  std::size_t length = 0;  // in bytes; 0: the text does not begin with a character
-};
-
-// The forms of UTF-8: the lead byte's fixed bits, and the smallest code point that may use the form.
-struct Form {
-  std::uint8_t mask;
-  std::uint8_t lead;
-  std::size_t length;
-  std::uint32_t smallest;
-};
-constexpr std::array<Form, 4> kForms = {{
-    {0x80, 0x00, 1, 0},
-    {0xE0, 0xC0, 2, 0x80},
-    {0xF0, 0xE0, 3, 0x800},
-    {0xF8, 0xF0, 4, 0x10000},
-}};
-
-bool IsScalarValue(std::uint32_t codePoint) noexcept {
-  const bool isSurrogate = codePoint >= 0xD800 && codePoint <= 0xDFFF;
-  return codePoint <= 0x10FFFF && !isSurrogate;
-}
-
-// `text` is not empty.
-Character Decode(std::string_view text) noexcept {
-  const auto lead = static_cast<std::uint8_t>(text.front());
-  for (const Form& form : kForms) {
-    if ((lead & form.mask) != form.lead) {
-      continue;
-    }
-    if (text.size() < form.length) {
-      return {};
-    }
-    std::uint32_t codePoint = lead & static_cast<std::uint8_t>(~form.mask);
-    for (std::size_t index = 1; index < form.length; ++index) {
-      const auto next = static_cast<std::uint8_t>(text[index]);
-      if ((next & 0xC0) != 0x80) {
-        return {};
-      }
-      codePoint = codePoint << 6 | (next & 0x3FU);
-    }
-    const bool isValid = codePoint >= form.smallest && IsScalarValue(codePoint);
-    return isValid ? Character{codePoint, form.length} : Character{};
-  }
-  return {};
-}
-
-bool IsControl(std::uint32_t codePoint) noexcept {
+bool IsControl(char32_t codePoint) noexcept {
   return codePoint < 0x20 || (codePoint >= 0x7F && codePoint <= 0x9F);
-}
-
-// What no XML text can hold, and so neither a request nor an answer.
-bool IsNoCharacter(std::uint32_t codePoint) noexcept {
-  return codePoint == 0xFFFE || codePoint == 0xFFFF;
 }
 
 std::string Trimmed(const std::string& text) {
@@ -77,11 +28,11 @@ std::string Trimmed(const std::string& text) {
 
 bool IsCleanText(std::string_view text) noexcept {
   while (!text.empty()) {
-    const Character next = Decode(text);
-    if (next.length == 0 || IsControl(next.codePoint) || IsNoCharacter(next.codePoint)) {
+    const Utf8Character next = FirstCharacter(text);
+    if (!next.isValid || IsControl(next.codePoint) || IsNonCharacter(next.codePoint)) {
       return false;
     }
-    text.remove_prefix(next.length);
+    text.remove_prefix(next.size);
   }
   return true;
 }
@@ -89,18 +40,18 @@ bool IsCleanText(std::string_view text) noexcept {
 std::string CleanText(std::string_view text) {
   std::string clean;
   while (!text.empty()) {
-    const Character next = Decode(text);
-    if (next.length == 0) {
-      clean += "\xEF\xBF\xBD";
+    const Utf8Character next = FirstCharacter(text);
+    if (!next.isValid) {
+      clean += replacementCharacter;
       text.remove_prefix(1);
       continue;
     }
-    if (IsNoCharacter(next.codePoint)) {
-      clean += "\xEF\xBF\xBD";
+    if (IsNonCharacter(next.codePoint)) {
+      clean += replacementCharacter;
     } else if (!IsControl(next.codePoint)) {
-      clean += text.substr(0, next.length);
+      clean += text.substr(0, next.size);
     }
-    text.remove_prefix(next.length);
+    text.remove_prefix(next.size);
   }
   return Trimmed(clean);
 }
@@ -111,8 +62,7 @@ std::string Shortened(std::string_view text) {
   }
   std::size_t end = 0;
   while (end < kLongestQuote) {
-    const Character next = Decode(text.substr(end));
-    end += next.length == 0 ? 1 : next.length;
+    end += FirstCharacter(text.substr(end)).size;
   }
   return std::string(text.substr(0, end)) + "...";
 }

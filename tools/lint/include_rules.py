@@ -15,7 +15,7 @@ RULES = {
     "tessa": [],
     "orbis": ["tessa"],
     "orbis/json": ["tessa", "orbis"],
-    "orbis/xml": ["orbis/Limits.h", "orbis/ParseException.h", "orbis/Soap.h"],
+    "orbis/xml": ["tessa/text", "orbis/Limits.h", "orbis/ParseException.h", "orbis/Soap.h"],
     "orbis/soap": ["tessa", "orbis", "orbis/json", "orbis/xml"],
     "nox": ["tessa", "orbis"],
     "kova/agentd/include": [],
@@ -33,7 +33,7 @@ RULES = {
                                "kova/agentd/marshal", "kova/agentd/planning/pure", "kova/agentd/KovaManagerImpl.h",
                                "kova/agentd/KovaLibManager.h"],
     "otxctl": ["kova/agentd/include"],
-    "otxctl/provider": ["kova/agentd/include"],
+    "otxctl/provider": ["tessa/text", "kova/agentd/include"],
     "otxctl/fault": ["otxctl/provider", "kova/agentd/include"],
     # Faults on demand are a part of a host's description; who records calls is nothing to it.
     "otxctl/sim": ["otxctl", "otxctl/provider", "otxctl/fault/FaultRules.h", "kova/agentd/include"],
@@ -60,6 +60,7 @@ FORBIDDEN = {
 }
 # Library: (pattern of its headers, folders that may include it).
 LIBRARIES = {
+    "UTF-8": (r"utf8(cpp)?(/.*|\.h)", ["tessa/text"]),
     "expat": (r"expat\.h", ["orbis/xml"]),
     "JSON": (r"nlohmann/.*", ["orbis/json", "otxctl/sim", "otxctl/fault", "kovactl"]),
     "HTTP and network": (r"boost/.*", ["agentd/http"]),

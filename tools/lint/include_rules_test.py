@@ -38,6 +38,8 @@ class IncludeRules(unittest.TestCase):
     def test_libraries_stay_in_their_rooms(self):
         self.assertEqual(len(reasons("orbis/soap/SoapReader.cpp", "#include <expat.h>")), 1)
         self.assertEqual(reasons("orbis/xml/XmlReader.cpp", "#include <expat.h>"), [])
+        self.assertEqual(len(reasons("orbis/xml/XmlWriter.cpp", "#include <utf8.h>")), 1)
+        self.assertEqual(reasons("tessa/text/Utf8.cpp", "#include <utf8.h>"), [])
         self.assertEqual(len(reasons("kovactl/main.cpp", "#include <boost/asio.hpp>")), 1)
         self.assertEqual(len(reasons("agentd/routes/Routes.cpp", "#include <openssl/ssl.h>")), 1)
         self.assertEqual(reasons("agentd/http/TlsServer.cpp", "#include <openssl/ssl.h>"), [])

@@ -4,7 +4,7 @@
 #include <charconv>
 #include <chrono>
 
-#include "orbis/Base64.h"
+#include "tessa/text/Base64.h"
 
 namespace Orbis {
 namespace {
@@ -56,7 +56,7 @@ void Append(const std::string& value, std::string& out) {
   out += value;
 }
 void Append(const Bytes& value, std::string& out) {
-  AppendBase64(value, out);
+  Tessa::AppendBase64(value, out);
 }
 
 void Append(const DateTime& value, std::string& out) {
@@ -114,7 +114,7 @@ bool Parse(std::string_view text, std::string& value) {
 }
 
 bool Parse(std::string_view text, Bytes& value) {
-  return ParseBase64(text, value);
+  return Tessa::ParseBase64(text, value);
 }
 
 // Reads a date piece by piece, from the front.

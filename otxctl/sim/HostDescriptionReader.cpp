@@ -6,10 +6,10 @@
 #include <vector>
 
 #include "otxctl/provider/CleanText.h"
-#include "otxctl/sim/Base64.h"
 #include "otxctl/sim/HostDescription.h"
 #include "otxctl/sim/HostDescriptionFields.h"
 #include "otxctl/sim/JsonText.h"
+#include "tessa/text/Base64.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -99,11 +99,9 @@ void Read(const json& value, const Place& place, const Rule& rule, StorageSystem
 void Read(const json& value, const Place& place, const Rule& rule, std::vector<std::uint8_t>& bytes) {
   std::string text;
   Read(value, place, rule, text);
-  std::optional<std::vector<std::uint8_t>> decoded = DecodeBase64(text);
-  if (!decoded) {
+  if (!Tessa::ParseBase64(text, bytes)) {
     Refuse(place, "must be base64");
   }
-  bytes = std::move(*decoded);
 }
 
 template <typename Value>

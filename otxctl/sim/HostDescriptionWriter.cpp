@@ -4,10 +4,10 @@
 #include <type_traits>
 
 #include "otxctl/provider/CleanText.h"
-#include "otxctl/sim/Base64.h"
 #include "otxctl/sim/HostDescription.h"
 #include "otxctl/sim/HostDescriptionFields.h"
 #include "otxctl/sim/JsonText.h"
+#include "tessa/text/Base64.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -32,7 +32,9 @@ ordered_json ToJson(const StorageSystem& system) {
 }
 
 ordered_json ToJson(const std::vector<std::uint8_t>& bytes) {
-  return EncodeBase64(bytes);
+  std::string text;
+  Tessa::AppendBase64(bytes, text);
+  return text;
 }
 
 template <typename Value>

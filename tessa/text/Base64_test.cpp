@@ -1,4 +1,4 @@
-#include "orbis/Base64.h"
+#include "tessa/text/Base64.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -7,8 +7,10 @@
 
 #include "tests/support/Seed.h"
 
-namespace Orbis {
+namespace Tessa {
 namespace {
+
+using Bytes = std::vector<std::uint8_t>;
 
 struct Pair {
   Bytes bytes;
@@ -44,9 +46,9 @@ TEST_P(BrokenBase64, IsRefusedAndTheBytesStay) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Texts, BrokenBase64,
-                         ::testing::Values("Z", "Zg", "Zg=", "Zg===", "=", "====", "Z===", "Zg==Zg==", "Zm=v",
-                                           "Zm 9v", " Zm9v", "Zm9v\n", "Zm9*", "Zm9-", "Zm9_",
-                                           "Zh==", "Zm9=", "Zm\xc3\xb6"));
+                         ::testing::Values("Z", "Zg", "Zg=", "Zg= =", "Zg===", "=",
+                                           "====", "Z===", "Zg==Zg==", "Zm=v", "Zm 9v", " Zm9v", "Zm9v\n",
+                                           "Zm9*", "Zm9-", "Zm9_", "Zh==", "Zm9=", "Zm\xc3\xb6"));
 
 TEST(Base64, ReadsBackAnyBytes) {
   const TestSupport::Seed seed;
@@ -66,4 +68,4 @@ TEST(Base64, ReadsBackAnyBytes) {
 }
 
 }  // namespace
-}  // namespace Orbis
+}  // namespace Tessa

@@ -1,10 +1,12 @@
-#include "orbis/Base64.h"
+#include "tessa/text/Base64.h"
 
 #include <algorithm>
 #include <array>
 
-namespace Orbis {
+namespace Tessa {
 namespace {
+
+using Bytes = std::vector<std::uint8_t>;
 
 constexpr std::string_view alphabet = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
 constexpr std::uint8_t invalid = 0xff;
@@ -64,4 +66,4 @@ bool ParseBase64(std::string_view text, Bytes& bytes) {
   return true;
 }
 
-}  // namespace Orbis
+}  // namespace Tessa

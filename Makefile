@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test clients check commits api-check bench growth soak door tls-check mutants build format-check format asan tsan clang tidy fuzz clean
+.PHONY: help demo test clients check commits api-check bench growth soak door tls-check mutants build format-check format asan tsan shipped clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -10,7 +10,7 @@ help:
 	@echo "make demo    build, start the agent on an example host; its disks are added, lost, unmounted, claimed"
 	@echo "make test    build and run every test but those of make clients"
 	@echo "make clients tests with SOAP clients whose tools are large (Java)"
-	@echo "make check   commit messages, format, second compiler, clang-tidy on what changed, sanitizers, fuzzing"
+	@echo "make check   commit messages, format, warnings, second compiler, clang-tidy on what changed, sanitizers, fuzzing"
 	@echo "make api-check  the OpenAPI description before two judges, and a client's types of it; needs npm"
 	@echo "make bench   benchmarks"
 	@echo "make growth  instructions per disk of planning, among few disks and among many"
@@ -43,7 +43,7 @@ clients:
 	@cmake --build --preset dev -j $(JOBS) --target agentd kovactl
 	@cd build/dev && ctest --output-on-failure --no-tests=error -L clients
 
-check: commits format-check clang tidy asan tsan fuzz
+check: commits format-check shipped clang tidy asan tsan fuzz
 
 # What the commits since BASE say of themselves (the origin's main branch, if there is one).
 commits:
@@ -55,6 +55,12 @@ format-check:
 
 format:
 	@git ls-files '*.h' '*.cpp' | xargs clang-format-14 -i
+
+# What is shipped, compiled as it is shipped: the optimizer then sees more than in the dev build, and must be content.
+shipped:
+	@$(SETUP) build
+	@cmake --preset shipped >/dev/null
+	@cmake --build --preset shipped -j $(JOBS) --target agentd kovactl
 
 # The second compiler: it must understand everything without a warning. Uses the flags of the dev build.
 clang:

@@ -4,6 +4,7 @@ option(KOVA_WERROR "Treat warnings as errors" OFF)
 option(KOVA_BENCHMARKS "Build the benchmarks" ON)
 option(KOVA_FUZZ "Build the fuzz targets (clang only)" OFF)
 set(KOVA_SANITIZE "" CACHE STRING "Sanitizers, as for -fsanitize=, or empty")
+set(KOVA_TEST_OPTIONS "" CACHE STRING "What the sources of tests are compiled with besides")
 
 if(NOT CMAKE_BUILD_TYPE)
   set(CMAKE_BUILD_TYPE RelWithDebInfo CACHE STRING "" FORCE)
@@ -20,9 +21,10 @@ set(CMAKE_LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib)
 set(CMAKE_ARCHIVE_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR}/lib)
 set(CMAKE_INSTALL_RPATH "$ORIGIN/../${CMAKE_INSTALL_LIBDIR}" "$ORIGIN")
 
+# With precompiled headers the compiler cache has to be told to trust what the compiler itself checks.
 find_program(KOVA_CCACHE ccache)
 if(KOVA_CCACHE)
-  set(CMAKE_CXX_COMPILER_LAUNCHER ${KOVA_CCACHE})
+  set(CMAKE_CXX_COMPILER_LAUNCHER env CCACHE_SLOPPINESS=pch_defines,time_macros ${KOVA_CCACHE})
 endif()
 
 add_library(kova_options INTERFACE)

@@ -1,26 +1,25 @@
 #!/usr/bin/env python3
 """Lets clang read every source that a build compiles, with the build's own flags, and write nothing.
+Without the build's precompiled headers, so that each source has to include what it uses.
 
     clang_syntax.py BUILD_DIR [JOBS]
 """
 
-import json
 import os
 import shlex
 import subprocess
 import sys
 from concurrent.futures import ThreadPoolExecutor
 
+from plain_commands import plain_entries
+
 COMPILER = "clang++-14"
 
 
 def command_of(entry):
-    """The build's command for one file, made clang's, without launcher and output."""
-    words = shlex.split(entry["command"])
-    while not os.path.basename(words[0]).startswith(("c++", "g++", "clang++")):
-        words.pop(0)
+    """The build's command for one file, made clang's, without output."""
     kept, skip = [COMPILER, "-fsyntax-only"], False
-    for word in words[1:]:
+    for word in shlex.split(entry["command"])[1:]:
         if skip or word == "-c":
             skip = False
         elif word == "-o":
@@ -36,8 +35,7 @@ def check(entry):
 
 
 def main(build, jobs):
-    with open(os.path.join(build, "compile_commands.json"), encoding="utf-8") as file:
-        entries = json.load(file)
+    entries = plain_entries(build)
     failed = 0
     with ThreadPoolExecutor(jobs) as pool:
         for file, status, text in pool.map(check, entries):

@@ -12,4 +12,7 @@ if [ -z "$files" ]; then
   exit 0
 fi
 echo "clang-tidy on $(echo "$files" | wc -l) changed file(s)"
-echo "$files" | xargs -P "$(nproc)" -n 1 clang-tidy-14 -p "$build" --quiet 2>/dev/null
+plain=$(mktemp -d)
+trap 'rm -rf "$plain"' EXIT
+python3 -B "$(dirname "$0")/plain_commands.py" "$build" "$plain"
+echo "$files" | xargs -P "$(nproc)" -n 1 clang-tidy-14 -p "$plain" --quiet 2>/dev/null

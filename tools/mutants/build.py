@@ -40,8 +40,8 @@ class Build:
             words.pop(0)
         kept, skip = [], False
         for word in words:
-            skip_next = word in ("-o", "-MT", "-MF")
-            if not (skip or skip_next or word in ("-c", "-MD", "-g") or word.startswith(("-W", "-O"))):
+            skip_next = word in ("-o", "-MT", "-MF", "-include")  # a precompiled header fits only the build's own flags
+            if not (skip or skip_next or word in ("-c", "-MD") or word.startswith(("-W", "-O", "-g"))):
                 kept.append(word)
             skip = skip_next
         return kept[:-1] + ["-w", "-g0"]

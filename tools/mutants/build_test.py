@@ -39,7 +39,7 @@ class Building(unittest.TestCase):
         self.write(self.root, SOURCES)
         (self.root / "build").mkdir()
         (self.root / "build/build.ninja").write_text(NINJA.format(root=self.root), encoding="utf-8")
-        command = ("ccache /usr/bin/c++ -Wall -Werror -I{root} -O1 -g -MD -MF {name}.o.d -o {name}.o "
+        command = ("ccache /usr/bin/c++ -Wall -Werror -I{root} -O1 -g1 -Winvalid-pch -include cmake_pch.hxx -MD -MF {name}.o.d -o {name}.o "
                    "-c {root}/room/{name}.cpp")
         entries = [{"file": str(self.root / f"room/{name}.cpp"), "command": command.format(root=self.root, name=name)}
                    for name in ("answer", "other", "answer_test")]

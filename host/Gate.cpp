@@ -3,9 +3,9 @@
 #include "host/KnownDisks.h"
 #include "host/Refusal.h"
 #include "host/Simulation.h"
-#include "host/Text.h"
 #include "nox/Kova.h"
 #include "orbis/Engine.h"
+#include "tessa/text/Escape.h"
 
 namespace Host::Gate {
 
@@ -107,8 +107,8 @@ void CheckName(const std::string& place, const std::string& name) {
     Refuse(place, "the name of a disk is empty");
   }
   CheckLength(place, name);
-  if (!IsClean(name)) {
-    Refuse(place, "the name '" + Printable(name) + "' holds control characters or is not UTF-8");
+  if (!Tessa::IsPrintable(name)) {
+    Refuse(place, "the name '" + Tessa::Escape(name) + "' holds control characters or is not UTF-8");
   }
 }
 
@@ -116,8 +116,8 @@ void CheckOption(const std::string& property, const std::string& text) {
   if (text.size() > longestOption) {
     Refuse(property, "a text of more than " + std::to_string(longestOption) + " bytes");
   }
-  if (!IsClean(text)) {
-    Refuse(property, "the text '" + Printable(text) + "' holds control characters or is not UTF-8");
+  if (!Tessa::IsPrintable(text)) {
+    Refuse(property, "the text '" + Tessa::Escape(text) + "' holds control characters or is not UTF-8");
   }
 }
 

@@ -12,7 +12,6 @@
 #include "host/Refusal.h"
 #include "host/RequestTexts.h"
 #include "host/Simulation.h"
-#include "host/Text.h"
 #include "host/UnmountedGroups.h"
 #include "host/UnusableDisks.h"
 #include "kova/agentd/include/HostCtlException.h"
@@ -24,6 +23,7 @@
 #include "nox/Tasks.h"
 #include "orbis/TypeDescriptor.h"
 #include "otxctl/TaskScope.h"
+#include "tessa/text/Escape.h"
 
 namespace Host {
 
@@ -215,7 +215,7 @@ Answer GetTasks(const PluginHooks&, const Op::GetTasks&) {
 }
 
 Answer GetTask(const PluginHooks&, const Op::GetTask& request) {
-  Refuse("id", "there is no task '" + Printable(request.GetId()) + "'");
+  Refuse("id", "there is no task '" + Tessa::Escape(request.GetId()) + "'");
 }
 
 // Which function answers which request.

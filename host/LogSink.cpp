@@ -1,4 +1,5 @@
 #include "host/LogSink.h"
+#include "tessa/text/Escape.h"
 
 #include <spdlog/sinks/stdout_sinks.h>
 #include <spdlog/spdlog.h>
@@ -6,8 +7,6 @@
 #include <memory>
 #include <string>
 #include <utility>
-
-#include "host/Text.h"
 
 namespace Host {
 namespace {
@@ -53,7 +52,7 @@ class ConsoleLogger final : public Logger {
   void Write(LogLevel level, std::string_view format, std::span<const LogArgument> arguments) override {
     try {
       const std::string message = Tessa::Service::FormatMessage(format, arguments);
-      _logger.log(ToSpdlog(level), Printable(message));
+      _logger.log(ToSpdlog(level), Tessa::Escape(message));
     } catch (const std::exception&) {
       // A line that cannot be written must not stop the work it tells of.
     }

@@ -4,8 +4,8 @@
 
 #include "host/FaultWords.h"
 #include "host/Refusal.h"
-#include "host/Text.h"
 #include "nox/Kova.h"
+#include "tessa/text/Escape.h"
 
 namespace Host {
 namespace {
@@ -30,7 +30,7 @@ void NameUnusableDisks(const Answer& queried, Orbis::MethodFault& fault) {
   if (results != nullptr) {
     for (const DiskResult* result : *results) {
       if (result->GetState() != DiskResult::STATE_ELIGIBLE && ++count <= mostNamed) {
-        text += (text.empty() ? "" : "; ") + Printable(result->GetDisk()->GetCanonicalName()) + ": " +
+        text += (text.empty() ? "" : "; ") + Tessa::Escape(result->GetDisk()->GetCanonicalName()) + ": " +
                 ReasonOf(*result);
       }
     }

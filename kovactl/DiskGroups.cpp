@@ -1,8 +1,8 @@
 #include "kovactl/DiskGroups.h"
 
-#include "host/Text.h"
 #include "kovactl/ExitStatus.h"
 #include "kovactl/Words.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 
@@ -30,7 +30,7 @@ const DiskMapInfo* DiskGroups::Find(const std::string& cacheDisk) const {
 const DiskMapInfo& DiskGroups::Require(const std::string& cacheDisk) const {
   const DiskMapInfo* const group = Find(cacheDisk);
   if (group == nullptr) {
-    throw BadInput("this host has no disk group with the cache disk '" + Host::Printable(cacheDisk) +
+    throw BadInput("this host has no disk group with the cache disk '" + Tessa::Escape(cacheDisk) +
                    "'; `kovactl groups` lists those it has");
   }
   return *group;

@@ -4,12 +4,12 @@
 #include <ostream>
 #include <set>
 
-#include "host/Text.h"
 #include "kovactl/Print.h"
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
 #include "nox/Kova.h"
 #include "nox/Operations.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 namespace {
@@ -30,7 +30,7 @@ void PrintSummary(const DiskResults& disks, std::ostream& out) {
   out << disks.Size() << (disks.Size() == 1 ? " disk" : " disks");
   const char* separator = ": ";
   for (const auto& [state, count] : counts) {
-    out << separator << count << " " << Host::Printable(state);
+    out << separator << count << " " << Tessa::Escape(state);
     separator = ", ";
   }
   out << "\n";
@@ -66,7 +66,7 @@ ExitStatus RunDisks(const Host::ManagementApi& host, const std::vector<std::stri
     unknown.erase(NameOf(*disk->GetDisk()));
   }
   for (const std::string& name : unknown) {
-    err << "kovactl: this host has no disk '" << Host::Printable(name) << "'\n";
+    err << "kovactl: this host has no disk '" << Tessa::Escape(name) << "'\n";
   }
   return status == ExitStatus::Done && !unknown.empty() ? ExitStatus::BadInput : status;
 }

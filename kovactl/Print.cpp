@@ -3,10 +3,10 @@
 #include <ostream>
 
 #include "host/FaultWords.h"
-#include "host/Text.h"
 #include "kovactl/FaultAdvice.h"
 #include "orbis/Json.h"
 #include "orbis/Soap.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 
@@ -21,7 +21,7 @@ void PrintObject(const Orbis::Any& object, const std::string& output, std::ostre
 }
 
 void PrintFault(const Orbis::MethodFault& fault, std::ostream& err) {
-  err << "kovactl: " << Host::Printable(Host::Explain(fault)) << "\n";
+  err << "kovactl: " << Tessa::Escape(Host::Explain(fault)) << "\n";
   if (const std::string advice = Advise(fault); !advice.empty()) {
     err << "  " << advice << "\n";
   }

@@ -4,7 +4,7 @@
 #include <ostream>
 #include <utility>
 
-#include "host/Text.h"
+#include "tessa/text/Escape.h"
 #include "tessa/text/Utf8.h"
 
 namespace Kovactl {
@@ -22,7 +22,7 @@ Table::Table(std::vector<Column> columns) : _columns(std::move(columns)) {}
 void Table::AddRow(const std::vector<std::string>& cells) {
   std::vector<std::string>& row = _rows.emplace_back();
   for (const std::string& cell : cells) {
-    row.push_back(Host::Printable(cell));
+    row.push_back(Tessa::Escape(cell));
   }
   row.resize(_columns.size());
 }

@@ -4,12 +4,12 @@
 #include <ostream>
 
 #include "host/FaultWords.h"
-#include "host/Text.h"
 #include "kovactl/Table.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/json/JsonText.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 namespace {
@@ -50,7 +50,7 @@ void PrintSummary(const std::map<std::string, int>& counts, std::size_t total, s
   out << total << (total == 1 ? " task" : " tasks");
   const char* separator = ": ";
   for (const auto& [state, count] : counts) {
-    out << separator << count << " " << Host::Printable(state);
+    out << separator << count << " " << Tessa::Escape(state);
     separator = ", ";
   }
   out << "\n";

@@ -4,9 +4,9 @@
 
 #include "agentd/client/AgentClient.h"
 #include "host/Build.h"
-#include "host/Text.h"
 #include "kovactl/Print.h"
 #include "kovactl/cli/CommandLine.h"
+#include "tessa/text/Escape.h"
 
 namespace {
 
@@ -33,15 +33,15 @@ ExitStatus Run(const CommandLine& line) {
     Kovactl::PrintFault(refused.GetFault(), std::cerr);
     return ExitStatus::Fault;
   } catch (const Agentd::AnswerError& error) {
-    std::cerr << "kovactl: " << Host::Printable(error.what()) << "\n";
+    std::cerr << "kovactl: " << Tessa::Escape(error.what()) << "\n";
     return ExitStatus::Unreachable;
   } catch (const Agentd::ConnectionError& error) {
-    std::cerr << "kovactl: " << Host::Printable(error.what())
+    std::cerr << "kovactl: " << Tessa::Escape(error.what())
               << "\nStart one with `agentd`, or work on a description with --host FILE.\n";
     return ExitStatus::Unreachable;
   } catch (const std::exception& error) {
     // What is left: files, descriptions, names and options that cannot be used.
-    std::cerr << "kovactl: " << Host::Printable(error.what()) << "\n";
+    std::cerr << "kovactl: " << Tessa::Escape(error.what()) << "\n";
     return ExitStatus::BadInput;
   }
 }

@@ -4,11 +4,11 @@
 #include <utility>
 
 #include "host/HostError.h"
-#include "orbis/Excerpt.h"
 #include "orbis/FaultText.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
 #include "orbis/TypeDescriptor.h"
+#include "tessa/text/Escape.h"
 
 namespace Agentd {
 
@@ -132,7 +132,7 @@ void AgentClient::RequireJson(const HttpAnswer& http) const {
   if (http.contentType != jsonType) {
     throw AnswerError("the agent on " + _address.Name() + " answered with status " +
                       std::to_string(http.status) + ": " +
-                      std::string(Orbis::Excerpt(http.body, longestShown)));
+                      std::string(Tessa::Excerpt(http.body, longestShown)));
   }
 }
 

@@ -1,4 +1,5 @@
 #include "agentd/http/AccessRules.h"
+#include "tessa/text/Escape.h"
 
 #include <grp.h>
 #include <pwd.h>
@@ -8,8 +9,6 @@
 #include <charconv>
 #include <optional>
 #include <stdexcept>
-
-#include "agentd/http/Shown.h"
 
 namespace Agentd {
 namespace {
@@ -50,7 +49,7 @@ HttpPeer AccessRules::PeerOf(const std::vector<std::string>& certificateNames) c
   }
   const HttpRole role =
       HighestOf(*this, [&](const Grant& grant) { return HoldsAny(grant.names, certificateNames); });
-  return {role, "certificate '" + Shown(certificateNames.front()) + "'"};
+  return {role, "certificate '" + Tessa::EscapeToAscii(certificateNames.front()) + "'"};
 }
 
 uid_t FindUser(const std::string& text) {

@@ -2,10 +2,10 @@
 
 #include <string>
 
-#include "agentd/http/Shown.h"
 #include "host/Refusal.h"
 #include "nox/Faults.h"
 #include "tessa/Logger.h"
+#include "tessa/text/Escape.h"
 
 namespace Agentd {
 namespace {
@@ -30,7 +30,8 @@ std::optional<Host::Answer> RefusalOf(const HttpRequest& request, HttpRole role)
                        " has the role '" + std::string(NameOf(request.peer.role)) + "'";
   if (const auto logger = Tessa::Service::GetDefaultLogger()) {
     Tessa::Service::LogInternal(logger, Tessa::Service::LogLevel::Info, "Refused '%1 %2' of %3: %4",
-                                Shown(request.method), Shown(request.target), request.peer.identity, reason);
+                                Tessa::EscapeToAscii(request.method), Tessa::EscapeToAscii(request.target),
+                                request.peer.identity, reason);
   }
   return NotPermitted(role, reason);
 }

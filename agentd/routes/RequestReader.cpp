@@ -2,14 +2,13 @@
 
 #include <string>
 
-#include "host/Text.h"
 #include "orbis/Envelope.h"
-#include "orbis/Excerpt.h"
 #include "orbis/Json.h"
 #include "orbis/ParseException.h"
 #include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/json/JsonText.h"
+#include "tessa/text/Escape.h"
 
 namespace Agentd {
 namespace {
@@ -24,7 +23,7 @@ using Orbis::Json::Value;
 
 // A key of the client's, in a place: '' for one without a letter.
 std::string Named(std::string_view key) {
-  return key.empty() ? "''" : Host::Printable(key);
+  return key.empty() ? "''" : Tessa::Escape(key);
 }
 
 const FieldDescriptor* FindParameter(const OperationDescriptor& operation, std::string_view name) {
@@ -75,7 +74,7 @@ void CheckLabel(const Orbis::DataObject& request, int line) {
     throw Orbis::ParseException("label", line,
                                 "a label of more than " + std::to_string(longestLabel) + " bytes");
   }
-  if (!Host::IsClean(change->GetLabel())) {
+  if (!Tessa::IsPrintable(change->GetLabel())) {
     throw Orbis::ParseException("label", line, "a label has no control characters");
   }
 }
@@ -119,7 +118,7 @@ SoapRequest ReadSoapRequest(std::string_view body, std::string_view action) {
   const OperationDescriptor* const operation = Nox::FindOperation(message.GetName());
   if (operation == nullptr) {
     throw EnvelopeException("Client", "/Envelope/Body", 0,
-                            "there is no operation '" + std::string(Orbis::Excerpt(message.GetName())) + "'");
+                            "there is no operation '" + std::string(Tessa::Excerpt(message.GetName())) + "'");
   }
   CheckAction(action, operation->name);
   return {operation, AsRequest(message.Read(operation->request), 0)};

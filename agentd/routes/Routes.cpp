@@ -9,7 +9,6 @@
 #include <utility>
 
 #include "agentd/http/HttpTarget.h"
-#include "agentd/http/Shown.h"
 #include "agentd/routes/Dispatch.h"
 #include "agentd/routes/DoorMetrics.h"
 #include "agentd/routes/HostWatch.h"
@@ -26,10 +25,10 @@
 #include "host/Gate.h"
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
-#include "host/Text.h"
 #include "nox/Documents.h"
 #include "nox/Operations.h"
 #include "orbis/ParseException.h"
+#include "tessa/text/Escape.h"
 
 namespace Agentd {
 namespace {
@@ -63,9 +62,9 @@ bool HasOnly(std::string_view known, const Call& call) {
   for (const auto& [name, value] : call.target.parameters) {
     if (name != known) {
       Refuse(call, 400,
-             "unknown parameter '" + Shown(name) + "'" +
+             "unknown parameter '" + Tessa::EscapeToAscii(name) + "'" +
                  (known.empty() ? "; there are none here" : "; wanted '" + std::string(known) + "'"),
-             Shown(name));
+             Tessa::EscapeToAscii(name));
       return false;
     }
   }

@@ -2,11 +2,11 @@
 
 #include <ostream>
 
-#include "host/Text.h"
 #include "kovactl/DiskGroups.h"
 #include "kovactl/Print.h"
 #include "kovactl/change/GroupResults.h"
 #include "kovactl/plan/LeftOvers.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 namespace {
@@ -15,7 +15,7 @@ using Tessa::Ref;
 
 // Where the host has nothing to tell, what is left over says why.
 void PrintSilence(const Host::ManagementApi& host, const Change& change, std::ostream& out) {
-  out << Host::Printable(change.WordsForSilence()) << "\n";
+  out << Tessa::Escape(change.WordsForSilence()) << "\n";
   const std::optional<Texts> offered = change.OfferedDisks();
   const auto leftOver = offered ? ExplainLeftOvers(host, *offered) : std::vector<LeftOverDisk>();
   if (!leftOver.empty()) {

@@ -2,7 +2,6 @@
 
 #include <ostream>
 
-#include "host/Text.h"
 #include "kovactl/DiskGroups.h"
 #include "kovactl/Print.h"
 #include "kovactl/Table.h"

@@ -3,8 +3,8 @@
 #include <istream>
 #include <ostream>
 
-#include "host/Text.h"
 #include "kovactl/ExitStatus.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 
@@ -33,7 +33,7 @@ bool Consent::AskFor(const std::vector<std::string>& disks) const {
   }
   *_err << "What is on these disks may be lost:\n";
   for (const std::string& disk : disks) {
-    *_err << "  " << Host::Printable(disk) << "\n";
+    *_err << "  " << Tessa::Escape(disk) << "\n";
   }
   *_err << "Go on? [y/N] " << std::flush;
   std::string reply;

@@ -5,7 +5,6 @@
 #include <set>
 
 #include "host/FaultWords.h"
-#include "host/Text.h"
 #include "kovactl/DiskGroups.h"
 #include "kovactl/FaultAdvice.h"
 #include "kovactl/Table.h"
@@ -13,6 +12,7 @@
 #include "nox/Faults.h"
 #include "orbis/Engine.h"
 #include "orbis/TypeDescriptor.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 namespace {
@@ -72,7 +72,7 @@ class Explainer {
  public:
   explicit Explainer(std::ostream& err) : _err(err) {}
   void Tell(const std::string& subject, const MethodFault& fault) {
-    _err << "kovactl: " << Host::Printable(subject + Host::Explain(fault)) << "\n";
+    _err << "kovactl: " << Tessa::Escape(subject + Host::Explain(fault)) << "\n";
     const std::string advice = Advise(fault);
     if (!advice.empty() && _given.insert(advice).second) {
       _err << "  " << advice << "\n";

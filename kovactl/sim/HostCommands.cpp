@@ -4,9 +4,9 @@
 #include <istream>
 #include <ostream>
 
-#include "host/Text.h"
 #include "otxctl/sim/HostFile.h"
 #include "otxctl/sim/LsblkImport.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 namespace {
@@ -67,7 +67,7 @@ ExitStatus RunHostImport(const ImportOptions& options, std::istream& in, std::os
 ExitStatus RunHostCheck(const std::string& file, std::ostream& out) {
   try {
     const OtxCtl::Sim::HostDescription host = OtxCtl::Sim::LoadHostFile(file);
-    const std::string name = host.name.empty() ? "unnamed host" : "host " + Host::Printable(host.name);
+    const std::string name = host.name.empty() ? "unnamed host" : "host " + Tessa::Escape(host.name);
     out << file << ": " << name << ", " << Count(host.disks.size(), "disk") << ", "
         << Count(host.groups.size(), "disk group") << ": sound\n";
     return ExitStatus::Done;

@@ -2,8 +2,8 @@
 
 #include <ostream>
 
-#include "host/Text.h"
 #include "kovactl/Print.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 namespace {
@@ -16,7 +16,7 @@ constexpr const char* nameKey = "name";
 void PrintSettings(const std::string& subject, const Json& settings, std::ostream& out) {
   for (const auto& [key, value] : settings.items()) {
     if (key != nameKey) {
-      out << Host::Printable(subject + ": " + key + " = " + value.dump()) << "\n";
+      out << Tessa::Escape(subject + ": " + key + " = " + value.dump()) << "\n";
     }
   }
 }

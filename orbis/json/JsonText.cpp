@@ -7,8 +7,8 @@
 #include <nlohmann/json.hpp>
 #include <set>
 
-#include "orbis/Excerpt.h"
 #include "orbis/ParseException.h"
+#include "tessa/text/Escape.h"
 #include "tessa/text/Utf8.h"
 
 namespace Orbis::Json {
@@ -57,7 +57,7 @@ class LineCounter {
 // The library's words, which end in all that it read of a broken value, perhaps in the middle of a character.
 std::string Readable(std::string_view words) {
   constexpr std::size_t most = 200;
-  return Tessa::ReplaceInvalidUtf8(Excerpt(words, most));
+  return Tessa::ReplaceInvalidUtf8(Tessa::Excerpt(words, most));
 }
 
 // Builds the tree from the library's events and refuses what passes the limits.
@@ -199,9 +199,9 @@ std::string Describe(const Value& value) {
     case Kind::Integer:
       return "the number " + std::to_string(value.integer);
     case Kind::Number:
-      return "the number " + std::string(Excerpt(value.text));
+      return "the number " + std::string(Tessa::Excerpt(value.text));
     case Kind::String:
-      return "the text '" + std::string(Excerpt(value.text)) + "'";
+      return "the text '" + std::string(Tessa::Excerpt(value.text)) + "'";
     case Kind::Array:
       return "an array";
     case Kind::Object:

@@ -2,7 +2,6 @@
 #include <string>
 #include <vector>
 
-#include "orbis/Excerpt.h"
 #include "orbis/ParseException.h"
 #include "orbis/Scalar.h"
 #include "orbis/Soap.h"
@@ -10,6 +9,7 @@
 #include "orbis/Version.h"
 #include "orbis/soap/ElementCodec.h"
 #include "orbis/xml/XmlReader.h"
+#include "tessa/text/Escape.h"
 
 namespace Orbis {
 namespace {
@@ -259,7 +259,7 @@ class SoapReader {
       Refuse(*element.firstChild, "unexpected element inside a simple value");
     }
     if (!ParseScalar(kind, element.text, value)) {
-      Refuse(element, Quoted(Excerpt(element.text)) + " is not " + std::string(DescribeKind(kind)));
+      Refuse(element, Quoted(Tessa::Excerpt(element.text)) + " is not " + std::string(DescribeKind(kind)));
     }
   }
 
@@ -282,7 +282,7 @@ class SoapReader {
 
   static void CheckNoText(const Element& element) {
     if (element.text.find_first_not_of(" \t\r\n") != std::string_view::npos) {
-      Refuse(element, "unexpected text " + Quoted(Excerpt(element.text)));
+      Refuse(element, "unexpected text " + Quoted(Tessa::Excerpt(element.text)));
     }
   }
 

@@ -5,11 +5,11 @@
 #include <unordered_map>
 #include <vector>
 
-#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostDescription.h"
 #include "otxctl/sim/HostDescriptionFields.h"
 #include "otxctl/sim/JsonText.h"
 #include "tessa/text/Base64.h"
+#include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -78,11 +78,11 @@ void Read(const json& value, const Place& place, const Rule& rule, std::string& 
   if (read.size() > kLongestText) {
     Refuse(place, "must not be longer than " + std::to_string(kLongestText) + " bytes");
   }
-  if (!Provider::IsCleanText(read)) {
+  if (!Tessa::IsPrintable(read)) {
     Refuse(place, "must be UTF-8 without control characters");
   }
   if (rule.isKnown != nullptr && !read.empty() && !rule.isKnown(read)) {
-    Refuse(place, Provider::Quoted(read) + " is no " + rule.kind);
+    Refuse(place, Tessa::Quote(read) + " is no " + rule.kind);
   }
   text = read;
 }
@@ -151,7 +151,7 @@ class FieldReader {
     }
     for (const auto& [key, value] : _source.items()) {
       if (std::find(_keys.begin(), _keys.end(), key) == _keys.end()) {
-        const std::string clean = Provider::Shortened(Provider::CleanText(key));
+        const std::string clean = Tessa::Abbreviate(Tessa::Sanitize(key));
         Refuse(Place{&_place, clean.empty() ? std::string_view("\"\"") : clean}, "is no known key");
       }
     }
@@ -209,7 +209,7 @@ class ReferenceCheck {
     if (!isNew) {
       const Place disk{&_disks, {}, index};
       Refuse(Place{&disk, "name"},
-             Provider::Quoted(name) + " is the name of disks[" + std::to_string(other->second) + "] already");
+             Tessa::Quote(name) + " is the name of disks[" + std::to_string(other->second) + "] already");
     }
   }
 
@@ -225,11 +225,11 @@ class ReferenceCheck {
 
   void AddMember(const Place& place, const std::string& name) {
     if (_diskIndex.count(name) == 0) {
-      Refuse(place, "the host has no disk " + Provider::Quoted(name));
+      Refuse(place, "the host has no disk " + Tessa::Quote(name));
     }
     const auto [other, isNew] = _members.emplace(name, std::string());
     if (!isNew) {
-      Refuse(place, Provider::Quoted(name) + " is in use already by " + other->second);
+      Refuse(place, Tessa::Quote(name) + " is in use already by " + other->second);
     }
     other->second = place.Text();
   }

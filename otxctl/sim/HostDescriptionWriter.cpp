@@ -3,11 +3,11 @@
 #include <nlohmann/json.hpp>
 #include <type_traits>
 
-#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostDescription.h"
 #include "otxctl/sim/HostDescriptionFields.h"
 #include "otxctl/sim/JsonText.h"
 #include "tessa/text/Base64.h"
+#include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -113,7 +113,7 @@ json& FindDisk(json& document, const json& change) {
     }
   }
   throw HostDescriptionError("disk.name: the host has no disk " +
-                             Provider::Quoted(Provider::CleanText(name.get_ref<const std::string&>())));
+                             Tessa::Quote(Tessa::Sanitize(name.get_ref<const std::string&>())));
 }
 
 }  // namespace
@@ -148,7 +148,7 @@ json ReadChange(std::string_view change) {
   const std::array<const char*, 2> keys = {"set", "disk"};
   for (const auto& [key, value] : document.items()) {
     if (std::find(keys.begin(), keys.end(), key) == keys.end()) {
-      const std::string clean = Provider::Shortened(Provider::CleanText(key));
+      const std::string clean = Tessa::Abbreviate(Tessa::Sanitize(key));
       throw HostDescriptionError((clean.empty() ? "''" : clean) +
                                  ": is no known key; a change has set and disk");
     }

@@ -5,8 +5,8 @@
 
 #include <random>
 
-#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostBuilder.h"
+#include "tessa/text/Escape.h"
 #include "tests/support/Seed.h"
 
 namespace OtxCtl::Sim {
@@ -18,7 +18,7 @@ std::string ErrorOf(std::string_view text) {
   try {
     ParseHostDescription(text);
   } catch (const HostDescriptionError& error) {
-    EXPECT_TRUE(Provider::IsCleanText(error.what())) << error.what();
+    EXPECT_TRUE(Tessa::IsPrintable(error.what())) << error.what();
     return error.what();
   }
   return "accepted";

@@ -6,8 +6,8 @@
 #include <utility>
 #include <vector>
 
-#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostDescriptionError.h"
+#include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -119,7 +119,7 @@ std::string DocumentBuilder::Path() const {
       const std::size_t index = level.container->size() - (isLast ? 0 : 1);
       path += "[" + std::to_string(index) + "]";
     } else {
-      path += (path.empty() ? "" : ".") + Provider::Shortened(Provider::CleanText(level.key));
+      path += (path.empty() ? "" : ".") + Tessa::Abbreviate(Tessa::Sanitize(level.key));
     }
   }
   return path.empty() ? "document" : path;
@@ -131,8 +131,7 @@ std::string ReasonOf(const json::exception& failure) {
   const std::size_t column = whole.find("column ");
   std::size_t start = whole.find(": ", column == std::string::npos ? 0 : column);
   start = start == std::string::npos ? whole.find("] ") : start;
-  return Provider::Shortened(
-      Provider::CleanText(start == std::string::npos ? whole : whole.substr(start + 2)));
+  return Tessa::Abbreviate(Tessa::Sanitize(start == std::string::npos ? whole : whole.substr(start + 2)));
 }
 
 bool DocumentBuilder::parse_error(std::size_t position, const std::string&, const json::exception& failure) {

@@ -6,8 +6,8 @@
 #include <nlohmann/json.hpp>
 #include <string>
 
-#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostDescriptionError.h"
+#include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -19,7 +19,7 @@ std::string ErrorOf(std::string_view text, const JsonLimits& limits = {}) {
   try {
     ParseJsonText(text, limits);
   } catch (const HostDescriptionError& error) {
-    EXPECT_TRUE(Provider::IsCleanText(error.what()));
+    EXPECT_TRUE(Tessa::IsPrintable(error.what()));
     return error.what();
   }
   return "accepted";

@@ -4,9 +4,9 @@
 #include <limits>
 #include <nlohmann/json.hpp>
 
-#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostDescriptionError.h"
 #include "otxctl/sim/JsonText.h"
+#include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -37,7 +37,7 @@ class DeviceReader {
     if (!value->is_string()) {
       Refuse(_path + "." + key, "must be a text");
     }
-    return Provider::CleanText(value->get_ref<const std::string&>());
+    return Tessa::Sanitize(value->get_ref<const std::string&>());
   }
 
   std::string RequiredText(const char* key) const {

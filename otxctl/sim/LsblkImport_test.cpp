@@ -5,9 +5,9 @@
 
 #include <nlohmann/json.hpp>
 
-#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/HostFile.h"
 #include "otxctl/sim/SimRules.h"
+#include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -45,7 +45,7 @@ std::string ErrorOf(std::string_view text) {
   try {
     ImportLsblk(text);
   } catch (const HostDescriptionError& error) {
-    EXPECT_TRUE(Provider::IsCleanText(error.what()));
+    EXPECT_TRUE(Tessa::IsPrintable(error.what()));
     return error.what();
   }
   return "accepted";

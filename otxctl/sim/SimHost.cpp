@@ -7,7 +7,7 @@
 
 #include "kova/agentd/include/HostCtlException.h"
 #include "otxctl/TaskScope.h"
-#include "otxctl/provider/CleanText.h"
+#include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -53,7 +53,7 @@ HostDescription Checked(HostDescription host) {
 void Report(int percent, const std::string& step) {
   if (const TaskScope* const task = TaskScope::Current()) {
     // Names come from requests and may hold anything.
-    task->ReportProgress(percent, Provider::CleanText(step));
+    task->ReportProgress(percent, Tessa::Sanitize(step));
   }
 }
 

@@ -6,8 +6,8 @@
 #include <utility>
 
 #include "kova/agentd/include/HostCtlException.h"
-#include "otxctl/provider/CleanText.h"
 #include "otxctl/sim/KovaUuid.h"
+#include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -48,8 +48,7 @@ constexpr std::array<ReasonRule, 6> kReasons = {{
 template <typename Exception>
 [[noreturn]] void Refuse(const std::string& disk, const std::string& why) {
   // The name comes from a request and may hold anything; the message must not.
-  throw Exception(std::string(kSpeaker) + "disk " + Provider::Quoted(Provider::CleanText(disk)) + " " + why,
-                  disk);
+  throw Exception(std::string(kSpeaker) + "disk " + Tessa::Quote(Tessa::Sanitize(disk)) + " " + why, disk);
 }
 
 DiskName NameOf(const HostDisk& disk) {

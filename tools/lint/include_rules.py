@@ -33,7 +33,7 @@ RULES = {
                                "kova/agentd/marshal", "kova/agentd/planning/pure", "kova/agentd/KovaManagerImpl.h",
                                "kova/agentd/KovaLibManager.h"],
     "otxctl": ["kova/agentd/include"],
-    "otxctl/provider": ["tessa/text", "kova/agentd/include"],
+    "otxctl/provider": ["kova/agentd/include"],
     "otxctl/fault": ["otxctl/provider", "kova/agentd/include"],
     # Faults on demand are a part of a host's description; who records calls is nothing to it.
     "otxctl/sim": ["tessa/text", "otxctl", "otxctl/provider", "otxctl/fault/FaultRules.h", "kova/agentd/include"],
@@ -42,7 +42,7 @@ RULES = {
     "machines": ["tessa", "orbis", "nox", "host", "otxctl/sim", "kova/agentd/include"],
     "agentd": ["tessa", "host", "machines/Machines.h", "otxctl/fault", "agentd/http", "agentd/routes",
                "agentd/tasks"],
-    "agentd/http": ["tessa/Logger.h", "host/Outcome.h"],
+    "agentd/http": ["tessa/Logger.h", "tessa/text", "host/Outcome.h"],
     "agentd/client": ["tessa", "orbis", "orbis/json", "nox", "host", "agentd/http"],
     "agentd/tasks": ["tessa", "orbis", "orbis/json", "nox", "host", "otxctl/TaskScope.h"],
     "agentd/routes": ["tessa", "orbis", "orbis/json", "nox", "host", "agentd/http", "agentd/tasks"],
@@ -51,7 +51,7 @@ RULES = {
     # A plan is what becomes of a simulated copy, so it compares descriptions.
     "kovactl/plan": ["orbis", "nox", "host", "kovactl", "machines/SimulatedInventory.h", "otxctl/sim",
                      "kova/agentd/planning/pure"],
-    "kovactl/sim": ["host", "kovactl", "otxctl/sim"],
+    "kovactl/sim": ["tessa/text", "host", "kovactl", "otxctl/sim"],
 }
 # What only one library must not drag into another: these headers are for whoever links the kernel library.
 FORBIDDEN = {

@@ -1,5 +1,3 @@
-#include "orbis/Excerpt.h"
-
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
@@ -16,29 +14,11 @@ namespace {
 
 using testing::HasSubstr;
 
-TEST(Excerpt, IsTheWholeOfAShortText) {
-  EXPECT_EQ(Excerpt("", 4), "");
-  EXPECT_EQ(Excerpt("abcd", 4), "abcd");
-  EXPECT_EQ(Excerpt("abcde", 4), "abcd");
-}
-
-TEST(Excerpt, IsCutBetweenTwoCharacters) {
-  EXPECT_EQ(Excerpt("abc\xC3\xA4", 4), "abc");
-  EXPECT_EQ(Excerpt("ab\xC3\xA4x", 4), "ab\xC3\xA4");
-  EXPECT_EQ(Excerpt("a\xF0\x9F\x98\x80", 4), "a");
-  EXPECT_EQ(Excerpt("\xF0\x9F\x98\x80x", 4), "\xF0\x9F\x98\x80");
-}
-
-TEST(Excerpt, OfWhatIsNotUtf8IsCutAnywhere) {
-  EXPECT_EQ(Excerpt(std::string(9, '\x80'), 4), std::string(4, '\x80'));
-  EXPECT_EQ(Excerpt(std::string(9, '\xFF'), 4), std::string(4, '\xFF'));
-}
-
 // 63 letters, and a character of two bytes over the edge.
 const std::string letters(63, 'l');
 const std::string tooLong = letters + "\xC3\xA4";
 
-TEST(Excerpt, IsWhatMessagesShowOfALongText) {
+TEST(LongText, IsCutInMessagesBetweenTwoCharacters) {
   EXPECT_EQ(Json::Describe(Json::Parse("\"" + tooLong + "\"", Limits::Untrusted())),
             "the text '" + letters + "'");
   const auto whyNot = [](const std::string& item) {

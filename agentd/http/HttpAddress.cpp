@@ -1,6 +1,7 @@
 #include "agentd/http/HttpAddress.h"
 
 #include <boost/asio/ip/address.hpp>
+#include <boost/url/authority_view.hpp>
 #include <charconv>
 #include <optional>
 #include <stdexcept>
@@ -34,25 +35,41 @@ bool IsHostName(std::string_view text) {
          text.find_first_not_of(nameCharacters) == std::string_view::npos;
 }
 
-// "127.0.0.1" or "[::1]", without brackets.
-std::optional<std::string> ParseNumeric(std::string_view text) {
-  const bool bracketed = text.size() > 2 && text.front() == '[' && text.back() == ']';
-  const std::string place(bracketed ? text.substr(1, text.size() - 2) : text);
+// "127.0.0.1" or "::1", as it is written shortest.
+std::optional<std::string> ParseNumeric(const std::string& text, bool isBracketed) {
   boost::system::error_code error;
-  const ip::address address = ip::make_address(place, error);
-  return error || address.is_v6() != bracketed ? std::nullopt : std::optional(address.to_string());
+  const ip::address address = ip::make_address(text, error);
+  return error || address.is_v6() != isBracketed ? std::nullopt : std::optional(address.to_string());
+}
+
+// Takes the zone out of "[fe80::1%eth0]:80", as the library of URLs knows none: "%eth0".
+std::string TakeZone(std::string& text) {
+  const std::size_t start = text.find('%');
+  const std::size_t end = text.rfind(']');
+  if (text.substr(0, 1) != "[" || start == std::string::npos || end == std::string::npos || end < start) {
+    return {};
+  }
+  const std::string zone = text.substr(start, end - start);
+  text.erase(start, zone.size());
+  return zone;
 }
 
 // "127.0.0.1:80", "[::1]:80" or, with TLS, "kova.example:80".
-std::optional<HttpAddress> ParseTcp(std::string_view text, bool isTls) {
-  const std::size_t colon = text.rfind(':');
-  if (colon == std::string_view::npos) {
+std::optional<HttpAddress> ParseTcp(std::string text, bool isTls) {
+  const std::string zone = TakeZone(text);
+  const auto authority = boost::urls::parse_authority(text);
+  if (!authority || authority->has_userinfo()) {
     return std::nullopt;
   }
-  const std::optional<std::uint16_t> port = ParsePort(text.substr(colon + 1));
-  std::optional<std::string> place = ParseNumeric(text.substr(0, colon));
-  if (!place && isTls && IsHostName(text.substr(0, colon))) {
-    place = text.substr(0, colon);
+  std::string host(std::string_view(authority->encoded_host()));
+  const bool isBracketed = host.size() > 2 && host.front() == '[';
+  if (isBracketed) {
+    host = host.substr(1, host.size() - 2) + zone;
+  }
+  const std::optional<std::uint16_t> port = ParsePort(authority->port());
+  std::optional<std::string> place = ParseNumeric(host, isBracketed);
+  if (!place && isTls && !isBracketed && IsHostName(host)) {
+    place = host;
   }
   return port && place ? std::optional(HttpAddress{false, *place, *port, isTls}) : std::nullopt;
 }
@@ -62,9 +79,10 @@ std::optional<HttpAddress> ParseAny(std::string_view text) {
     return UnixAddress(std::string(text.substr(unixScheme.size())));
   }
   if (StartsWith(text, tcpScheme)) {
-    return ParseTcp(text.substr(tcpScheme.size()), false);
+    return ParseTcp(std::string(text.substr(tcpScheme.size())), false);
   }
-  return StartsWith(text, tlsScheme) ? ParseTcp(text.substr(tlsScheme.size()), true) : std::nullopt;
+  return StartsWith(text, tlsScheme) ? ParseTcp(std::string(text.substr(tlsScheme.size())), true)
+                                     : std::nullopt;
 }
 
 [[noreturn]] void Refuse(std::string_view text, const char* forms) {

@@ -28,6 +28,11 @@ TEST(HttpAddress, OfTcpIsANumericAddressAndAPort) {
   EXPECT_EQ(v6.Name(), "[::1]:0");
 }
 
+TEST(HttpAddress, OfTcpMayNameAZone) {
+  EXPECT_EQ(ParseAddress("tcp:[2001:db8::1%7]:80").place, "2001:db8::1%7");
+  EXPECT_EQ(ParseAgentAddress("tls:[2001:db8::1%7]:80").Text(), "tls:[2001:db8::1%7]:80");
+}
+
 TEST(HttpAddress, TellsWhetherOnlyThisHostReachesIt) {
   for (const char* text : {"tcp:127.0.0.1:1", "tcp:127.9.9.9:1", "tcp:[::1]:1"}) {
     EXPECT_TRUE(ParseAddress(text).IsLoopback()) << text;
@@ -69,7 +74,8 @@ TEST(HttpAddress, OfAnyOtherFormIsRefusedWithTheForms) {
   for (const char* text :
        {"", "unix:", "/run/a.sock", "tcp:", "tcp:127.0.0.1", "tcp:127.0.0.1:", "tcp:127.0.0.1:65536",
         "tcp:127.0.0.1:-1", "tcp:127.0.0.1:1x", "tcp:localhost:80", "tcp:::1:80", "tcp:[127.0.0.1]:80",
-        "tcp:[]:80", "tcp::80", "http://127.0.0.1:80", "tls:127.0.0.1:80"}) {
+        "tcp:[]:80", "tcp::80", "tcp:user@10.0.0.1:80", "tcp:10.0.0.1:80/", "tcp:127.0.0.1%1:80",
+        "http://127.0.0.1:80", "tls:127.0.0.1:80"}) {
     try {
       ParseAddress(text);
       ADD_FAILURE() << text;

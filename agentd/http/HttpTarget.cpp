@@ -1,27 +1,16 @@
 #include "agentd/http/HttpTarget.h"
 
-#include <charconv>
+#include <algorithm>
+#include <boost/url/pct_string_view.hpp>
 
 namespace Agentd {
 namespace {
 
+// Nothing when an escape is broken. What the library would refuse besides, bytes that stand in a target
+// without need of their escape, is taken as it is: names of disks may hold any.
 std::optional<std::string> Decode(std::string_view text) {
-  std::string decoded;
-  for (std::size_t at = 0; at < text.size(); ++at) {
-    if (text[at] != '%') {
-      decoded.push_back(text[at]);
-      continue;
-    }
-    const std::string_view digits = text.substr(at + 1, 2);
-    unsigned value = 0;
-    const auto [end, error] = std::from_chars(digits.data(), digits.data() + digits.size(), value, 16);
-    if (digits.size() != 2 || error != std::errc() || end != digits.data() + 2) {
-      return std::nullopt;
-    }
-    decoded.push_back(static_cast<char>(value));
-    at += 2;
-  }
-  return decoded;
+  const auto escaped = boost::urls::make_pct_string_view(text);
+  return escaped ? std::optional<std::string>(escaped->decode()) : std::nullopt;
 }
 
 }  // namespace

@@ -33,6 +33,13 @@ TEST(HttpTarget, DecodesEscapesEverywhere) {
   EXPECT_THAT(target->parameters, ElementsAre(Pair("name", "a b&=ß")));
 }
 
+TEST(HttpTarget, TakesBytesThatShouldHaveBeenEscapedAsTheyAre) {
+  const auto target = ParseTarget("/|?names=\"a|{b}\xC3\x9F#[c]");
+  ASSERT_TRUE(target);
+  EXPECT_EQ(target->path, "/|");
+  EXPECT_THAT(target->ValuesOf("names"), ElementsAre("\"a|{b}\xC3\x9F#[c]"));
+}
+
 TEST(HttpTarget, TakesAPlusForAPlus) {
   EXPECT_EQ(ParseTarget("/?names=a+b")->ValuesOf("names").front(), "a+b");
 }

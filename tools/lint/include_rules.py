@@ -63,7 +63,7 @@ LIBRARIES = {
     "UTF-8": (r"utf8(cpp)?(/.*|\.h)", ["tessa/text"]),
     "expat": (r"expat\.h", ["orbis/xml"]),
     "JSON": (r"nlohmann/.*", ["orbis/json", "otxctl/sim", "otxctl/fault", "kovactl"]),
-    "HTTP and network": (r"boost/.*", ["agentd/http"]),
+    "HTTP, URLs and network": (r"boost/.*", ["agentd/http"]),
     "TLS": (r"openssl/.*", ["agentd/http"]),
     "log sink": (r"spdlog/.*", ["host"]),
     "command line": (r"CLI/.*", ["agentd", "kovactl"]),

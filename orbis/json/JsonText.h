@@ -1,4 +1,4 @@
-// A bounded reader of JSON texts: text in, tree of values out. The one place that knows the JSON library.
+// JSON texts: read into a tree of values, bounded as JsonEvents.h says, and written.
 #pragma once
 
 #include <cstdint>

@@ -105,7 +105,7 @@ class BoundedEvents final : public Library::json_sax_t {
   }
 
  private:
-  bool Pass(Scalar value) {
+  bool Pass(Scalar&& value) {
     Count();
     _handler.OnScalar(std::move(value), _line);
     return true;

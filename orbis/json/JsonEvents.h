@@ -50,7 +50,7 @@ class EventHandler {
   virtual ~EventHandler() = default;
 
   // A value, or the beginning of one that holds others. `line` is where it ends, or begins to hold them.
-  virtual void OnScalar(Scalar value, int line) = 0;
+  virtual void OnScalar(Scalar&& value, int line) = 0;
   virtual void OnOpen(bool isArray, int line) = 0;
   virtual void OnClose() = 0;
   // Of the member whose value comes next.

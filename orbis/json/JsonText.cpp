@@ -58,7 +58,9 @@ class TreeBuilder final : public EventHandler {
  public:
   explicit TreeBuilder(Value& root) : _root(root) {}
 
-  void OnScalar(Scalar scalar, int line) override { std::visit(ScalarWriter{Add(line)}, std::move(scalar)); }
+  void OnScalar(Scalar&& scalar, int line) override {
+    std::visit(ScalarWriter{Add(line)}, std::move(scalar));
+  }
   void OnOpen(bool isArray, int line) override {
     Value& opened = Add(line);
     opened.kind = isArray ? Kind::Array : Kind::Object;

@@ -52,7 +52,7 @@ class DocumentBuilder final : public Orbis::Json::EventHandler {
 
   json Take() { return std::move(_root); }
 
-  void OnScalar(Orbis::Json::Scalar value, int) override { Place(std::visit(ToJson(), std::move(value))); }
+  void OnScalar(Orbis::Json::Scalar&& value, int) override { Place(std::visit(ToJson(), std::move(value))); }
   void OnOpen(bool isArray, int) override {
     _open.push_back({Place(isArray ? json::array() : json::object()), {}});
   }

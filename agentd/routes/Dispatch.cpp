@@ -30,9 +30,10 @@ HttpAnswer Answered(const Encoding& encoding, const Make& make) {
 
 void Ask(const Services& services, const OperationDescriptor& operation, const RequestRef& request,
          const Encoding& encoding, const HttpResponder& responder) {
-  services.queries.Run([&api = services.api, &operation, request, encoding, responder] {
-    HttpAnswer made = Answered(
-        encoding, [&] { return encoding.answer(operation, api.Query(static_cast<const Query&>(*request))); });
+  services.queries.Run([api = services.api, &operation, request, encoding, responder] {
+    HttpAnswer made = Answered(encoding, [&] {
+      return encoding.answer(operation, api->Query(static_cast<const Query&>(*request)));
+    });
     const Host::Outcome outcome = OutcomeOf(made);
     responder.Answer(std::move(made));
     return outcome;
@@ -51,7 +52,7 @@ void Submit(const Services& services, const OperationDescriptor& operation, cons
   }
   const Task task = services.tasks.Submit(
       std::string(operation.name), change.HasLabel() ? change.GetLabel() : "",
-      [&api = services.api, request] { return api.Change(static_cast<const Change&>(*request)); },
+      [api = services.api, request] { return api->Change(static_cast<const Change&>(*request)); },
       std::move(onEnded), Host::WeightOf(*request));
   if (!waits) {
     responder.Answer(encoding.takenOn(task));

@@ -4,6 +4,8 @@
 // answers one already if not. Changes are handed to the task queue.
 #pragma once
 
+#include <memory>
+
 #include "agentd/http/HttpResponder.h"
 #include "agentd/http/HttpTypes.h"
 #include "agentd/routes/RequestReader.h"
@@ -19,9 +21,9 @@ namespace Agentd {
 class QueryQueue;
 class TaskQueue;
 
-// What carries requests out. All of it outlives what was dispatched.
+// What carries requests out. The queues outlive what was dispatched; a request keeps the API that it needs.
 struct Services {
-  const Host::ManagementApi& api;
+  std::shared_ptr<const Host::ManagementApi> api;
   TaskQueue& tasks;
   QueryQueue& queries;
 };

@@ -147,7 +147,7 @@ void GetHost(const Call& call) {
     return;
   }
   try {
-    call.responder.Answer({200, std::string(jsonType), call.services.api.DescribeHost()});
+    call.responder.Answer({200, std::string(jsonType), call.services.api->DescribeHost()});
   } catch (const Host::HostError& unknown) {
     Refuse(call, 404, unknown.what());
   }
@@ -155,10 +155,10 @@ void GetHost(const Call& call) {
 
 // A task like any other: nothing changes the host while a request is at work on it.
 void PostHost(const Call& call) {
-  call.services.api.CheckHostChange(call.request.body);
+  call.services.api->CheckHostChange(call.request.body);
   call.services.tasks.Submit(
       "ChangeHost", "",
-      [&api = call.services.api, change = call.request.body] { return api.ChangeHost(change); },
+      [api = call.services.api, change = call.request.body] { return api->ChangeHost(change); },
       [responder = call.responder](const Task& ended) { responder.Answer(ToHttp(ended)); },
       call.request.body.size());
 }
@@ -320,7 +320,7 @@ HttpResponder Counted(const std::shared_ptr<Metrics>& metrics, std::string route
 
 Router::Router(const ManagementApi& api, TaskQueue& tasks, const QueryLimits& limits)
     : _tasks(tasks),
-      _api(std::make_unique<TaskApi>(api, tasks)),
+      _api(std::make_shared<TaskApi>(api, tasks)),
       _queries(std::make_unique<QueryQueue>(limits)),
       _watch(std::make_unique<HostWatch>(api, *_queries)),
       _metrics(std::make_shared<Metrics>()) {}
@@ -345,9 +345,8 @@ void Router::Serve(const HttpRequest& request, const HttpResponder& responder) c
   if (match.refusal) {
     counted.Answer(*match.refusal);
   } else {
-    ServeRoute(
-        *match.route,
-        {{*_api, _tasks, *_queries}, *_metrics, *_watch, _load, *target, request, counted, match.rest});
+    ServeRoute(*match.route,
+               {{_api, _tasks, *_queries}, *_metrics, *_watch, _load, *target, request, counted, match.rest});
   }
 }
 

@@ -78,7 +78,7 @@ class Router {
 
  private:
   TaskQueue& _tasks;
-  const std::unique_ptr<TaskApi> _api;
+  const std::shared_ptr<const TaskApi> _api;  // also of what was handed to the queue
   const std::unique_ptr<QueryQueue> _queries;
   const std::unique_ptr<HostWatch> _watch;
   const std::shared_ptr<Metrics> _metrics;  // answers that come late are still counted

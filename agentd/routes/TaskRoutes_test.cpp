@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
+#include <future>
 #include <memory>
 
 #include "agentd/routes/Routes.h"
@@ -130,6 +131,31 @@ TEST_F(TaskRoutes, ATaskKeepsTheTextOfItsResultAlone) {
   _api.answer.result = Host::Result::OfText(text);
   EXPECT_THAT(Post("AddAllEligibleDisks", "{}").body, HasSubstr("\"result\":[]"));
   EXPECT_EQ(*_tasks.List().at(0).answer.result.GetText(), text);
+}
+
+TEST(TaskRoutesOfARouterThatIsGone, AreStillCarriedOut) {
+  FakeApi api;
+  Gate gate;
+  api.onChange = [&gate] { gate.Enter(); };
+  TaskQueue tasks;
+  {
+    const Router router(api, tasks);
+    const HttpRequest request{.method = "POST",
+                              .target = "/api/v1/RemoveDisk",
+                              .contentType = "application/json",
+                              .body = R"({"disk": "naa.1", "wait": false})",
+                              .peer = {.role = HttpRole::Change}};
+    for (int i = 0; i < 2; ++i) {
+      router.Serve(request, HttpResponder([](const HttpAnswer&) {}));
+    }
+    gate.WaitUntilEntered();  // the first runs, the second waits
+  }
+  gate.Open();
+  std::promise<void> done;
+  tasks.Submit(
+      "Last", "", [] { return Host::Answer(); }, [&done](const Task&) { done.set_value(); });
+  done.get_future().wait();
+  EXPECT_THAT(api.Asked(), ElementsAre("RemoveDisk naa.1   0 0", "RemoveDisk naa.1   0 0"));
 }
 
 TEST_F(TaskRoutes, AQueryIsNoTask) {

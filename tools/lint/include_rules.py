@@ -34,10 +34,11 @@ RULES = {
                                "kova/agentd/KovaLibManager.h"],
     "otxctl": ["kova/agentd/include"],
     "otxctl/provider": ["kova/agentd/include"],
+    "otxctl/disks": ["kova/agentd/include/KovaRecords.h"],
     "otxctl/fault": ["otxctl/provider", "kova/agentd/include"],
     # Faults on demand are a part of a host's description; who records calls is nothing to it.
-    "otxctl/sim": ["tessa/text", "orbis/Limits.h", "orbis/json/JsonEvents.h", "otxctl", "otxctl/provider",
-                   "otxctl/fault/FaultRules.h", "kova/agentd/include"],
+    "otxctl/sim": ["tessa/text", "orbis/Limits.h", "orbis/json/JsonEvents.h", "otxctl", "otxctl/disks",
+                   "otxctl/provider", "otxctl/fault/FaultRules.h", "kova/agentd/include"],
     "host": ["tessa", "orbis", "orbis/json", "nox", "otxctl", "otxctl/provider", "otxctl/fault",
              "kova/agentd/include"],
     "machines": ["tessa", "orbis", "nox", "host", "otxctl/sim", "kova/agentd/include"],

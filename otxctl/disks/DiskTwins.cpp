@@ -1,0 +1,109 @@
+#include "otxctl/disks/DiskTwins.h"
+
+#include <array>
+
+namespace OtxCtl::Disks {
+namespace {
+
+constexpr std::size_t kMostNamed = 3;  // twins that are named; of more, the number is told
+
+// A zero byte stands in neither text.
+std::string SerialKey(const DiskIdentity& identity) {
+  return identity.model + '\0' + identity.serial;
+}
+
+std::string PathsInWords(std::size_t paths) {
+  constexpr std::array<const char*, 3> kWords = {"two", "three", "four"};
+  return (paths - 2 < kWords.size() ? kWords[paths - 2] : std::to_string(paths)) + std::string(" paths");
+}
+
+}  // namespace
+
+DiskTwins::DiskTwins(const std::vector<DiskFacts>& disks) : _disks(disks) {
+  FindDevices();
+  for (std::size_t index = 0; index < disks.size(); ++index) {
+    if (!disks[index].identity.IsKnown()) {
+      _unidentified.push_back(index);
+      continue;
+    }
+    const DiskIdentity& identity = disks[index].identity.Get();
+    const bool isNamed = !identity.worldWideName.empty();
+    if (isNamed) {
+      Add(index, _byName[identity.worldWideName]);
+    }
+    if (!identity.serial.empty()) {
+      SameSerial& same = _bySerial[SerialKey(identity)];
+      Add(index, isNamed ? same.named : same.unnamed);
+    }
+  }
+}
+
+void DiskTwins::FindDevices() {
+  std::unordered_map<std::string, std::size_t> maps;
+  for (const DiskFacts& disk : _disks) {
+    if (disk.multipathMap.IsKnown() && !disk.multipathMap.Get().empty()) {
+      maps.try_emplace(disk.multipathMap.Get(), _disks.size() + maps.size());
+    }
+  }
+  for (std::size_t index = 0; index < _disks.size(); ++index) {
+    const DiskFacts& disk = _disks[index];
+    const bool isPath = disk.multipathMap.IsKnown() && !disk.multipathMap.Get().empty();
+    const auto map = maps.find(isPath ? disk.multipathMap.Get() : disk.kernelName);
+    _deviceOf.push_back(map == maps.end() ? index : map->second);
+  }
+}
+
+// All paths of a device come to the same list, so to look at the last one is not enough, and at all of them
+// too much: a map is rarely far from its paths.
+void DiskTwins::Add(std::size_t index, Devices& devices) const {
+  constexpr std::size_t kLooked = 16;
+  const std::size_t first = devices.size() < kLooked ? 0 : devices.size() - kLooked;
+  for (std::size_t i = first; i < devices.size(); ++i) {
+    if (_deviceOf[devices[i]] == _deviceOf[index]) {
+      return;
+    }
+  }
+  devices.push_back(index);
+}
+
+std::string DiskTwins::NameOf(std::size_t index) const {
+  return _disks[index].canonicalName + " (" + _disks[index].kernelName + ")";
+}
+
+std::string DiskTwins::WordsFor(std::size_t index) const {
+  for (std::size_t i = 0; i < _unidentified.size() && i < 2; ++i) {
+    if (_unidentified[i] != index) {
+      return "nobody knows whether it is the same disk as " + NameOf(_unidentified[i]);
+    }
+  }
+  if (!_disks[index].identity.IsKnown()) {
+    return {};
+  }
+  const DiskIdentity& identity = _disks[index].identity.Get();
+  const bool isNamed = !identity.worldWideName.empty();
+  static const Devices kNone;
+  static const SameSerial kNoSerial;
+  const Devices& sameName = isNamed ? _byName.at(identity.worldWideName) : kNone;
+  const SameSerial& sameSerial = identity.serial.empty() ? kNoSerial : _bySerial.at(SerialKey(identity));
+  const Devices& named = isNamed ? kNone : sameSerial.named;
+
+  std::string words;
+  std::size_t told = 0;
+  std::size_t others = 0;
+  for (const Devices* const devices : {&sameName, &named, &sameSerial.unnamed}) {
+    others += devices->size();
+    for (std::size_t i = 0; i < devices->size() && told < kMostNamed; ++i) {
+      const std::size_t other = (*devices)[i];
+      if (_deviceOf[other] != _deviceOf[index]) {
+        words += (told++ == 0 ? "" : ", ") + NameOf(other);
+      }
+    }
+  }
+  if (told == 0) {
+    return {};
+  }
+  // The device of the disk itself is among them.
+  return "same disk as " + words + (others - 1 > told ? ", ..." : "") + ": " + PathsInWords(others);
+}
+
+}  // namespace OtxCtl::Disks

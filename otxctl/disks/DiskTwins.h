@@ -1,0 +1,44 @@
+// Which disks of a host are one and the same disk, seen by two paths. Part of DiskJudge.
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <unordered_map>
+#include <vector>
+
+#include "otxctl/disks/DiskFacts.h"
+
+namespace OtxCtl::Disks {
+
+// Two disks of one world wide name are the same; where one of them has none, two of the same model and serial
+// number. A multipath device and its paths are one device, so not twins of each other. A disk of which nobody
+// knows what identifies it may be the twin of any other.
+class DiskTwins {
+ public:
+  // Keeps a reference to `disks`.
+  explicit DiskTwins(const std::vector<DiskFacts>& disks);
+
+  // "same disk as naa.1 (sdb): two paths"; empty for a disk that is surely seen once.
+  std::string WordsFor(std::size_t index) const;
+
+ private:
+  // The first disk of each device, in the order of the disks.
+  using Devices = std::vector<std::size_t>;
+  struct SameSerial {
+    Devices named;  // that have a world wide name, too
+    Devices unnamed;
+  };
+
+  void FindDevices();
+  void Add(std::size_t index, Devices& devices) const;
+  std::string NameOf(std::size_t index) const;
+
+  const std::vector<DiskFacts>& _disks;
+  std::vector<std::size_t> _deviceOf;  // a path has the number of its map
+  std::unordered_map<std::string, Devices> _byName;
+  std::unordered_map<std::string, SameSerial> _bySerial;
+  Devices _unidentified;
+};
+
+}  // namespace OtxCtl::Disks

@@ -8,7 +8,7 @@
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   OtxCtl::Sim::HostDescription host;
   try {
-    host = OtxCtl::Sim::ImportLsblk({reinterpret_cast<const char*>(data), size});
+    host = OtxCtl::Sim::ImportLsblk({reinterpret_cast<const char*>(data), size}).host;
   } catch (const OtxCtl::Sim::HostDescriptionError&) {
     return 0;
   }

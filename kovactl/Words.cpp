@@ -63,13 +63,17 @@ std::string StateOf(const DiskResult& result) {
 }
 
 std::string ReasonOf(const DiskResult& result) {
+  const bool isIneligible = result.GetState() == DiskResult::STATE_INELIGIBLE;
+  if (isIneligible && result.GetDisk() && result.GetDisk()->HasDetail()) {
+    return result.GetDisk()->GetDetail();
+  }
   if (result.GetError()) {
     return Host::WordsFor(*result.GetError());
   }
   if (result.GetDisk() && HasLeft(*result.GetDisk())) {
     return "has left the host";
   }
-  if (result.GetState() != DiskResult::STATE_INELIGIBLE) {
+  if (!isIneligible) {
     return "";
   }
   return result.GetDisk() && HasOperationalState(*result.GetDisk(), ScsiDisk::STATE_OFF)

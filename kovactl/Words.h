@@ -27,7 +27,8 @@ std::string HumanSize(std::uint64_t bytes);
 // "in use", "eligible", "ineligible".
 std::string StateOf(const Nox::Kova::Host::DiskResult& result);
 
-// Why a disk cannot be used; empty when it can, or already is.
+// Why a disk cannot be used: what was found on it, if the host says so, else its fault or state; empty when
+// it can be, or already is.
 std::string ReasonOf(const Nox::Kova::Host::DiskResult& result);
 
 }  // namespace Kovactl

@@ -98,5 +98,15 @@ TEST(Words, ForTheReasonFollowTheFaultThenTheDisksState) {
   EXPECT_EQ(ReasonOf(*ADisk("ineligible", {"ok"})), "the kernel gives no reason");
 }
 
+TEST(Words, WhatWasFoundOnADiskSaysMoreThanItsFault) {
+  const auto disk = ADisk("ineligible", {"ok"});
+  disk->SetError(MakeRef<Nox::Fault::DiskHasPartitions>("naa.1"));
+  disk->GetDisk()->SetDetail("ext4 file system, mounted at /data");
+  EXPECT_EQ(ReasonOf(*disk), "ext4 file system, mounted at /data");
+  disk->SetState("eligible");
+  disk->SetError(nullptr);
+  EXPECT_EQ(ReasonOf(*disk), "");
+}
+
 }  // namespace
 }  // namespace Kovactl

@@ -71,6 +71,7 @@ Ref<ScsiDisk> ToDisk(const HostDisk& described) {
   disk->SetSsd(described.ssd);
   disk->SetLocal(described.local);
   disk->SetTransport(described.transport);
+  disk->SetDetail(UnlessEmpty(described.detail));
   return disk;
 }
 

@@ -47,6 +47,7 @@ const std::map<std::string, Getter>& OptionalGetters() {
       {"HostScsiDisk.ssd", [](DataObject& o) { As<Host::ScsiDisk>(o).GetSsd(); }},
       {"HostScsiDisk.local", [](DataObject& o) { As<Host::ScsiDisk>(o).GetLocal(); }},
       {"HostScsiDisk.transport", [](DataObject& o) { As<Host::ScsiDisk>(o).GetTransport(); }},
+      {"HostScsiDisk.detail", [](DataObject& o) { As<Host::ScsiDisk>(o).GetDetail(); }},
       {"KovaHostKovaDiskInfo.formatVersion",
        [](DataObject& o) { As<Kova::Host::KovaDiskInfo>(o).GetFormatVersion(); }},
       {"KovaHostDiskResult.kovaUuid", [](DataObject& o) { As<Kova::Host::DiskResult>(o).GetKovaUuid(); }},

@@ -19,8 +19,9 @@ void AddImport(CLI::App& host, CommandLine& line) {
       ->check(CLI::NonNegativeNumber)
       ->capture_default_str();
   command->add_option("--write", options->output, "File to write instead of standard output");
-  command->callback(
-      [&line, options] { line.action = [options] { return RunHostImport(*options, std::cin, std::cout); }; });
+  command->callback([&line, options] {
+    line.action = [options] { return RunHostImport(*options, std::cin, std::cout, std::cerr); };
+  });
 }
 
 void AddCheck(CLI::App& host, CommandLine& line) {

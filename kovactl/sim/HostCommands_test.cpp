@@ -16,9 +16,32 @@ namespace {
 using testing::AllOf;
 using testing::HasSubstr;
 
-constexpr const char* twoDisks = R"({"blockdevices": [
-  {"name": "sda", "type": "disk", "size": 4000787030016, "rota": true, "wwn": "0x5000c50000000001"},
-  {"name": "sdb", "type": "disk", "size": 1048576, "rota": false, "wwn": "0x5000c50000000002"}]})";
+std::string LsblkDevice(const std::string& name, const std::string& more) {
+  return R"({"name": ")" + name + R"(", "kname": ")" + name +
+         R"(", "ro": false, "rm": false, "hotplug": false,
+    "state": null, "tran": "sas", "serial": ")" +
+         name + R"(", "model": "HDD", "fstype": null, "label": null,
+    "uuid": null, "pttype": null, "ptuuid": null, "zoned": "none", "subsystems": "block:scsi:pci",
+    "mountpoints": [null], )" +
+         more + "}";
+}
+
+const std::string twoDisks =
+    R"({"blockdevices": [)" +
+    LsblkDevice("sda",
+                R"("type": "disk", "size": 4000787030016, "rota": true, "wwn": "0x5000c50000000001")") +
+    "," +
+    LsblkDevice("sdb", R"("type": "disk", "size": 1048576, "rota": false, "wwn": "0x5000c50000000002")") +
+    "," + LsblkDevice("sr0", R"("type": "rom", "size": 1048576, "rota": true, "wwn": null)") + "]}";
+
+constexpr const char* reportOfTwoDisks = R"(Took 2 disks, 1 of them eligible.
+DISK                  DEVICE  STATE       WHY NOT
+naa.5000c50000000001  sda     eligible
+naa.5000c50000000002  sdb     ineligible  1 MiB, smaller than 1 GiB
+Left out 1 device.
+DEVICE  WHY
+sr0     no disk, but of type rom
+)";
 
 class HostCommands : public testing::Test {
  protected:
@@ -31,7 +54,9 @@ class HostCommands : public testing::Test {
   std::string Import(ImportOptions options, const std::string& input = twoDisks) {
     std::istringstream in(input);
     std::ostringstream out;
-    EXPECT_EQ(RunHostImport(options, in, out), ExitStatus::Done);
+    std::ostringstream err;
+    EXPECT_EQ(RunHostImport(options, in, out, err), ExitStatus::Done);
+    _report = err.str();
     return out.str();
   }
 
@@ -39,7 +64,7 @@ class HostCommands : public testing::Test {
     std::istringstream in(input);
     std::ostringstream out;
     try {
-      RunHostImport(options, in, out);
+      RunHostImport(options, in, out, out);
       return "it was imported";
     } catch (const BadInput& refused) {
       EXPECT_EQ(out.str(), "");
@@ -59,6 +84,7 @@ class HostCommands : public testing::Test {
     }
   }
 
+  std::string _report;
   const std::string _file = testing::TempDir() + "kova-host-" + std::to_string(getpid()) + ".json";
 };
 
@@ -70,6 +96,11 @@ TEST_F(HostCommands, ImportPrintsADescriptionThatIsSound) {
   ASSERT_EQ(host.disks.size(), 2u);
   EXPECT_FALSE(host.disks[0].ssd);
   EXPECT_TRUE(host.disks[1].ssd);
+}
+
+TEST_F(HostCommands, ImportReportsWhatItTookAndWhatItLeftOut) {
+  Import({.file = "-"});
+  EXPECT_EQ(_report, reportOfTwoDisks);
 }
 
 TEST_F(HostCommands, ImportTakesNameAndMinimumFromTheOptions) {
@@ -85,7 +116,8 @@ TEST_F(HostCommands, ImportReadsAFile) {
 }
 
 TEST_F(HostCommands, ImportWritesAFileAndSaysSo) {
-  EXPECT_EQ(Import({.file = "-", .output = _file}), "Wrote " + _file + ": 2 disks.\n");
+  EXPECT_EQ(Import({.file = "-", .output = _file}), "Wrote " + _file + ": 2 disks.\n" + reportOfTwoDisks);
+  EXPECT_EQ(_report, "");
   EXPECT_EQ(OtxCtl::Sim::LoadHostFile(_file).disks.size(), 2u);
 }
 

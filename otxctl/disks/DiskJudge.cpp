@@ -56,13 +56,13 @@ class Findings {
 };
 
 std::string SizeInWords(std::int64_t bytes) {
-  constexpr std::array<const char*, 5> kUnits = {" bytes", " KiB", " MiB", " GiB", " TiB"};
+  constexpr std::array<const char*, 5> units = {" bytes", " KiB", " MiB", " GiB", " TiB"};
   std::size_t unit = 0;
-  while (bytes >= 1024 && bytes % 1024 == 0 && unit + 1 < kUnits.size()) {
+  while (bytes >= 1024 && bytes % 1024 == 0 && unit + 1 < units.size()) {
     bytes /= 1024;
     ++unit;
   }
-  return std::to_string(bytes) + kUnits[unit];
+  return std::to_string(bytes) + units[unit];
 }
 
 void JudgeConnection(const DiskFacts& disk, Findings& findings) {

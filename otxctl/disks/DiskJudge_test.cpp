@@ -13,8 +13,8 @@ namespace {
 using HostCtl::Kova::DiskReason;
 using HostCtl::Kova::DiskState;
 
-constexpr std::int64_t kGibibyte = std::int64_t{1} << 30;
-constexpr DiskLimits kLimits{kGibibyte};
+constexpr std::int64_t gibibyte = std::int64_t{1} << 30;
+constexpr DiskLimits limits{gibibyte};
 
 // About which everything is known, and nothing speaks against it.
 DiskFacts FreeDisk(const std::string& name = "naa.1", const std::string& serial = "S1") {
@@ -22,7 +22,7 @@ DiskFacts FreeDisk(const std::string& name = "naa.1", const std::string& serial 
   disk.kernelName = "sd-" + name;
   disk.canonicalName = name;
   disk.identity = DiskIdentity{name, "LAB", "HDD", serial};
-  disk.bytes = 4 * kGibibyte;
+  disk.bytes = 4 * gibibyte;
   disk.isFlash = false;
   disk.connection = Connection{Attachment::Machine, "sas"};
   disk.isReadOnly = false;
@@ -40,7 +40,7 @@ DiskFacts FreeDisk(const std::string& name = "naa.1", const std::string& serial 
 }
 
 DiskVerdict JudgeOne(const DiskFacts& disk) {
-  return JudgeDisks({disk}, kLimits).at(0);
+  return JudgeDisks({disk}, limits).at(0);
 }
 
 using Change = std::function<void(DiskFacts&)>;
@@ -54,8 +54,8 @@ struct Row {
 // Every trace of use and every unfitness, one at a time.
 std::vector<Row> Against() {
   using Texts = std::vector<std::string>;
-  constexpr auto kNotOurs = DiskReason::HasPartitions;
-  constexpr auto kUnfit = DiskReason::HasForeignPartitions;
+  constexpr auto notOurs = DiskReason::HasPartitions;
+  constexpr auto unfit = DiskReason::HasForeignPartitions;
   return {
       {[](DiskFacts& disk) {
          disk.connection = Connection{Attachment::Remote, "iscsi"};
@@ -65,12 +65,12 @@ std::vector<Row> Against() {
          disk.connection = Connection{Attachment::Remote, ""};
        },
        DiskReason::NonLocal, "not local"},
-      {[](DiskFacts& disk) { disk.partitionTable = std::string("gpt"); }, kNotOurs, "gpt partition table"},
-      {[](DiskFacts& disk) { disk.partitions = 1; }, kNotOurs, "1 partition"},
-      {[](DiskFacts& disk) { disk.signatures = Texts{"ext4 file system"}; }, kNotOurs, "ext4 file system"},
-      {[](DiskFacts& disk) { disk.mounts = Texts{"/data"}; }, kNotOurs, "mounted at /data"},
-      {[](DiskFacts& disk) { disk.holders = Texts{"another program"}; }, kNotOurs, "held by another program"},
-      {[](DiskFacts& disk) { disk.multipathMap = std::string("mpatha"); }, kNotOurs,
+      {[](DiskFacts& disk) { disk.partitionTable = std::string("gpt"); }, notOurs, "gpt partition table"},
+      {[](DiskFacts& disk) { disk.partitions = 1; }, notOurs, "1 partition"},
+      {[](DiskFacts& disk) { disk.signatures = Texts{"ext4 file system"}; }, notOurs, "ext4 file system"},
+      {[](DiskFacts& disk) { disk.mounts = Texts{"/data"}; }, notOurs, "mounted at /data"},
+      {[](DiskFacts& disk) { disk.holders = Texts{"another program"}; }, notOurs, "held by another program"},
+      {[](DiskFacts& disk) { disk.multipathMap = std::string("mpatha"); }, notOurs,
        "a path of the multipath device mpatha"},
       {[](DiskFacts& disk) {
          disk.connection = Connection{Attachment::Usb, "usb"};
@@ -79,25 +79,25 @@ std::vector<Row> Against() {
       {[](DiskFacts& disk) {
          disk.connection = Connection{Attachment::FireWire, "sbp"};
        },
-       kUnfit, "attached by FireWire"},
+       unfit, "attached by FireWire"},
       {[](DiskFacts& disk) {
          disk.connection = Connection{Attachment::MemoryCard, ""};
        },
-       kUnfit, "an SD or MMC device"},
+       unfit, "an SD or MMC device"},
       {[](DiskFacts& disk) {
          disk.connection = Connection{Attachment::Virtual, ""};
        },
-       kUnfit, "a virtual device"},
-      {[](DiskFacts& disk) { disk.isReadOnly = true; }, kUnfit, "read-only"},
-      {[](DiskFacts& disk) { disk.isRemovable = true; }, kUnfit, "removable"},
-      {[](DiskFacts& disk) { disk.isHotPlug = true; }, kUnfit, "hot-plug"},
-      {[](DiskFacts& disk) { disk.state = std::string("offline"); }, kUnfit, "not running: offline"},
-      {[](DiskFacts& disk) { disk.zones = std::string("host-managed"); }, kUnfit, "zoned: host-managed"},
+       unfit, "a virtual device"},
+      {[](DiskFacts& disk) { disk.isReadOnly = true; }, unfit, "read-only"},
+      {[](DiskFacts& disk) { disk.isRemovable = true; }, unfit, "removable"},
+      {[](DiskFacts& disk) { disk.isHotPlug = true; }, unfit, "hot-plug"},
+      {[](DiskFacts& disk) { disk.state = std::string("offline"); }, unfit, "not running: offline"},
+      {[](DiskFacts& disk) { disk.zones = std::string("host-managed"); }, unfit, "zoned: host-managed"},
       {[](DiskFacts& disk) {
          disk.identity = DiskIdentity{"", "LAB", "HDD", ""};
        },
-       kUnfit, "nobody knows: it has neither a world wide name nor a serial number to be told by"},
-      {[](DiskFacts& disk) { disk.bytes = kGibibyte - 1; }, DiskReason::TooSmall,
+       unfit, "nobody knows: it has neither a world wide name nor a serial number to be told by"},
+      {[](DiskFacts& disk) { disk.bytes = gibibyte - 1; }, DiskReason::TooSmall,
        "1073741823 bytes, smaller than 1 GiB"},
       {[](DiskFacts& disk) { disk.bytes = 64 << 20; }, DiskReason::TooSmall, "64 MiB, smaller than 1 GiB"},
       {[](DiskFacts& disk) { disk.bytes = 0; }, DiskReason::TooSmall, "without a medium"},
@@ -161,7 +161,7 @@ TEST(DiskJudge, WhatThereIsNoneOfDoesNotSpeakAgainstADisk) {
         Change([](DiskFacts& disk) { disk.state = std::string("live"); }),
         Change([](DiskFacts& disk) { disk.zones = std::string(); }),
         Change([](DiskFacts& disk) { disk.isFlash = true; }),
-        Change([](DiskFacts& disk) { disk.bytes = kGibibyte; }), Change([](DiskFacts& disk) {
+        Change([](DiskFacts& disk) { disk.bytes = gibibyte; }), Change([](DiskFacts& disk) {
           disk.identity = DiskIdentity{"", "", "", "S1"};
         }),
         Change([](DiskFacts& disk) {
@@ -213,7 +213,7 @@ TEST(DiskJudge, OfOneDiskByTwoPathsNeitherIsOfferedAndEachNamesTheOther) {
   DiskFacts second = FreeDisk();
   second.canonicalName = "naa.1.2";
   second.kernelName = "sdb";
-  const std::vector<DiskVerdict> verdicts = JudgeDisks({first, second, FreeDisk("naa.3", "S3")}, kLimits);
+  const std::vector<DiskVerdict> verdicts = JudgeDisks({first, second, FreeDisk("naa.3", "S3")}, limits);
   EXPECT_EQ(verdicts[0], (DiskVerdict{DiskState::Ineligible, DiskReason::HasForeignPartitions,
                                       "same disk as naa.1.2 (sdb): two paths"}));
   EXPECT_EQ(verdicts[1], (DiskVerdict{DiskState::Ineligible, DiskReason::HasForeignPartitions,
@@ -227,7 +227,7 @@ TEST(DiskJudge, WhereANameIsMissingModelAndSerialNumberTellTheDisk) {
     first.identity = one;
     DiskFacts second = FreeDisk("b");
     second.identity = other;
-    const std::vector<DiskVerdict> verdicts = JudgeDisks({first, second}, kLimits);
+    const std::vector<DiskVerdict> verdicts = JudgeDisks({first, second}, limits);
     EXPECT_EQ(verdicts[0].state, verdicts[1].state);
     return verdicts[0].state == DiskState::Eligible;
   };
@@ -244,7 +244,7 @@ TEST(DiskJudge, PathsOfAMultipathDeviceAreNotOfferedAndItIs) {
   path.multipathMap = std::string("mpatha");
   DiskFacts map = FreeDisk();
   map.kernelName = "mpatha";
-  const std::vector<DiskVerdict> verdicts = JudgeDisks({path, map, path}, kLimits);
+  const std::vector<DiskVerdict> verdicts = JudgeDisks({path, map, path}, limits);
   EXPECT_EQ(verdicts[0].detail, "a path of the multipath device mpatha");
   EXPECT_EQ(verdicts[1].state, DiskState::Eligible) << verdicts[1].detail;
   EXPECT_EQ(verdicts[2].detail, "a path of the multipath device mpatha");
@@ -255,7 +255,7 @@ TEST(DiskJudge, APathOutsideItsMultipathDeviceKeepsThatFromBeingOffered) {
   path.multipathMap = std::string("mpatha");
   DiskFacts map = FreeDisk();
   map.kernelName = "mpatha";
-  const std::vector<DiskVerdict> verdicts = JudgeDisks({path, map, FreeDisk()}, kLimits);
+  const std::vector<DiskVerdict> verdicts = JudgeDisks({path, map, FreeDisk()}, limits);
   EXPECT_EQ(verdicts[1].detail, "same disk as naa.1 (sd-naa.1): two paths");
   EXPECT_EQ(verdicts[2].detail, "same disk as naa.1 (sd-naa.1): two paths");
 }
@@ -263,13 +263,13 @@ TEST(DiskJudge, APathOutsideItsMultipathDeviceKeepsThatFromBeingOffered) {
 TEST(DiskJudge, ADiskThatNothingIdentifiesMayBeTheTwinOfAnyOther) {
   DiskFacts unknown = FreeDisk("naa.2", "S2");
   unknown.identity = Fact<DiskIdentity>::Unknown("why");
-  const std::vector<DiskVerdict> verdicts = JudgeDisks({FreeDisk(), unknown}, kLimits);
+  const std::vector<DiskVerdict> verdicts = JudgeDisks({FreeDisk(), unknown}, limits);
   EXPECT_EQ(verdicts[0].detail, "nobody knows whether it is the same disk as naa.2 (sd-naa.2)");
   EXPECT_EQ(verdicts[1].detail, "nobody knows: why");
 }
 
 TEST(DiskJudge, OfManyPathsAFewAreNamed) {
-  const std::vector<DiskVerdict> verdicts = JudgeDisks(std::vector<DiskFacts>(6, FreeDisk()), kLimits);
+  const std::vector<DiskVerdict> verdicts = JudgeDisks(std::vector<DiskFacts>(6, FreeDisk()), limits);
   EXPECT_EQ(verdicts[5].detail,
             "same disk as naa.1 (sd-naa.1), naa.1 (sd-naa.1), naa.1 (sd-naa.1), ...: 6 paths");
 }
@@ -295,14 +295,14 @@ TEST(DiskJudge, NoTraceAndNoGapEverMakesADiskEligible) {
       against[oneOf(against.size())].change(disks[oneOf(3)]);
     }
     const std::size_t changed = oneOf(3);
-    const std::vector<DiskVerdict> before = JudgeDisks(disks, kLimits);
+    const std::vector<DiskVerdict> before = JudgeDisks(disks, limits);
     std::vector<DiskFacts> after = disks;
     if (oneOf(2) == 0) {
       forgetting[oneOf(forgetting.size())](after[changed]);
     } else {
       traces[oneOf(traces.size())](after[changed]);
     }
-    const std::vector<DiskVerdict> verdicts = JudgeDisks(after, kLimits);
+    const std::vector<DiskVerdict> verdicts = JudgeDisks(after, limits);
     for (std::size_t disk = 0; disk < disks.size(); ++disk) {
       const bool isOffered = verdicts[disk].state == DiskState::Eligible;
       EXPECT_TRUE(!isOffered || before[disk].state == DiskState::Eligible) << "seed " << seed;
@@ -312,7 +312,7 @@ TEST(DiskJudge, NoTraceAndNoGapEverMakesADiskEligible) {
 }
 
 TEST(DiskJudge, ManyDisksOfOneNameTakeLinearTime) {
-  const std::vector<DiskVerdict> verdicts = JudgeDisks(std::vector<DiskFacts>(50'000, FreeDisk()), kLimits);
+  const std::vector<DiskVerdict> verdicts = JudgeDisks(std::vector<DiskFacts>(50'000, FreeDisk()), limits);
   EXPECT_EQ(verdicts.size(), 50'000U);
 }
 

@@ -5,7 +5,7 @@
 namespace OtxCtl::Disks {
 namespace {
 
-constexpr std::size_t kLongestName = 200;
+constexpr std::size_t longestName = 200;
 
 // Only letters, digits and a few marks; runs of anything else become one underscore.
 std::string NamePart(std::string_view text, bool toLower = false) {
@@ -23,7 +23,7 @@ std::string NamePart(std::string_view text, bool toLower = false) {
   while (!part.empty() && part.back() == '_') {
     part.pop_back();
   }
-  return part.substr(0, kLongestName);
+  return part.substr(0, longestName);
 }
 
 // Without a serial number two disks of one kind would get the same name.
@@ -37,7 +37,7 @@ std::string DescriptiveName(const DiskIdentity& identity) {
     const std::string part = NamePart(*text);
     name += part.empty() ? part : part + "_";
   }
-  return (name + serial).substr(0, kLongestName);
+  return (name + serial).substr(0, longestName);
 }
 
 }  // namespace

@@ -5,7 +5,7 @@
 namespace OtxCtl::Disks {
 namespace {
 
-constexpr std::size_t kMostNamed = 3;  // twins that are named; of more, the number is told
+constexpr std::size_t mostNamed = 3;  // twins that are named; of more, the number is told
 
 // A zero byte stands in neither text.
 std::string SerialKey(const DiskIdentity& identity) {
@@ -13,8 +13,8 @@ std::string SerialKey(const DiskIdentity& identity) {
 }
 
 std::string PathsInWords(std::size_t paths) {
-  constexpr std::array<const char*, 3> kWords = {"two", "three", "four"};
-  return (paths - 2 < kWords.size() ? kWords[paths - 2] : std::to_string(paths)) + std::string(" paths");
+  constexpr std::array<const char*, 3> words = {"two", "three", "four"};
+  return (paths - 2 < words.size() ? words[paths - 2] : std::to_string(paths)) + std::string(" paths");
 }
 
 }  // namespace
@@ -56,8 +56,8 @@ void DiskTwins::FindDevices() {
 // All paths of a device come to the same list, so to look at the last one is not enough, and at all of them
 // too much: a map is rarely far from its paths.
 void DiskTwins::Add(std::size_t index, Devices& devices) const {
-  constexpr std::size_t kLooked = 16;
-  const std::size_t first = devices.size() < kLooked ? 0 : devices.size() - kLooked;
+  constexpr std::size_t looked = 16;
+  const std::size_t first = devices.size() < looked ? 0 : devices.size() - looked;
   for (std::size_t i = first; i < devices.size(); ++i) {
     if (_deviceOf[devices[i]] == _deviceOf[index]) {
       return;
@@ -81,18 +81,18 @@ std::string DiskTwins::WordsFor(std::size_t index) const {
   }
   const DiskIdentity& identity = _disks[index].identity.Get();
   const bool isNamed = !identity.worldWideName.empty();
-  static const Devices kNone;
-  static const SameSerial kNoSerial;
-  const Devices& sameName = isNamed ? _byName.at(identity.worldWideName) : kNone;
-  const SameSerial& sameSerial = identity.serial.empty() ? kNoSerial : _bySerial.at(SerialKey(identity));
-  const Devices& named = isNamed ? kNone : sameSerial.named;
+  static const Devices none;
+  static const SameSerial noSerial;
+  const Devices& sameName = isNamed ? _byName.at(identity.worldWideName) : none;
+  const SameSerial& sameSerial = identity.serial.empty() ? noSerial : _bySerial.at(SerialKey(identity));
+  const Devices& named = isNamed ? none : sameSerial.named;
 
   std::string words;
   std::size_t told = 0;
   std::size_t others = 0;
   for (const Devices* const devices : {&sameName, &named, &sameSerial.unnamed}) {
     others += devices->size();
-    for (std::size_t i = 0; i < devices->size() && told < kMostNamed; ++i) {
+    for (std::size_t i = 0; i < devices->size() && told < mostNamed; ++i) {
       const std::size_t other = (*devices)[i];
       if (_deviceOf[other] != _deviceOf[index]) {
         words += (told++ == 0 ? "" : ", ") + NameOf(other);

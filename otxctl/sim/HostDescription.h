@@ -55,6 +55,7 @@ struct HostDisk {
   bool inInventory = true;  // the host agent lists it
   bool inKernel = true;     // the kernel knows it
   std::optional<HostVerdict> verdict;
+  std::string detail;  // why it is not eligible, in words for people
 
   friend bool operator==(const HostDisk&, const HostDisk&) = default;
 };

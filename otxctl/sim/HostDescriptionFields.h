@@ -92,6 +92,7 @@ void Describe(Table& fields, const HostDisk*) {
   fields.Optional("inInventory", &HostDisk::inInventory);
   fields.Optional("inKernel", &HostDisk::inKernel);
   fields.Optional("verdict", &HostDisk::verdict, OrNull());
+  fields.Optional("detail", &HostDisk::detail);
 }
 
 template <typename Table>

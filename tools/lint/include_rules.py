@@ -35,6 +35,7 @@ RULES = {
     "otxctl": ["kova/agentd/include"],
     "otxctl/provider": ["kova/agentd/include"],
     "otxctl/disks": ["kova/agentd/include/KovaRecords.h"],
+    "otxctl/linux": ["tessa/text", "otxctl", "otxctl/disks", "kova/agentd/include"],
     "otxctl/fault": ["otxctl/provider", "kova/agentd/include"],
     # Faults on demand are a part of a host's description; who records calls is nothing to it.
     "otxctl/sim": ["tessa/text", "orbis/Limits.h", "orbis/json/JsonEvents.h", "otxctl", "otxctl/disks",
@@ -73,7 +74,7 @@ LIBRARIES = {
     "dynamic loading": (r"dlfcn\.h", ["host", "tests/abi"]),
     "block devices": (r"(sys/ioctl|linux/.*|blkid/.*|libudev)\.h", ["otxctl/linux", "machines/linux"]),
     "system calls": (r"(unistd|fcntl|sys/.*|poll|pthread|netinet/.*|arpa/.*)(\.h)?",
-                     ["tessa", "otxctl/sim", "host", "machines", "agentd", "kovactl", "tests"]),
+                     ["tessa", "otxctl/linux", "otxctl/sim", "host", "machines", "agentd", "kovactl", "tests"]),
     "test framework": (r"(gtest|gmock)/.*", []),
     "benchmark framework": (r"benchmark/.*", ["bench"]),
 }

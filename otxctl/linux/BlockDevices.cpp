@@ -88,7 +88,17 @@ BlockDevices::BlockDevices(const SysfsReader& reader) {
   for (const std::string& name : sorted) {
     Read(reader, name);
   }
+  for (const Unreadable& unread : _notRead) {
+    // "sda1" may be of "sda", "s", ...
+    for (std::size_t size = 1; size < unread.name.size(); ++size) {
+      _withUnread.insert(unread.name.substr(0, size));
+    }
+  }
   Index();
+}
+
+bool BlockDevices::HasUnreadPartitions(const BlockDevice& disk) const {
+  return _withUnread.count(disk.name) > 0;
 }
 
 void BlockDevices::Read(const SysfsReader& reader, const std::string& name) {

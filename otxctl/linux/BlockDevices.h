@@ -10,6 +10,7 @@
 #include <optional>
 #include <string>
 #include <unordered_map>
+#include <unordered_set>
 #include <vector>
 
 #include "otxctl/disks/Fact.h"
@@ -62,7 +63,7 @@ class BlockDevices {
 
   // Whole devices and partitions, in the order of people: sda, sdb, ..., sdz, sdaa.
   const std::vector<BlockDevice>& All() const noexcept { return _all; }
-  // Set if not all of them could be found: then nothing is known about any.
+  // Set if nobody knows which there are: then none is told.
   const std::string& WhyIncomplete() const noexcept { return _whyIncomplete; }
   // Names that no device was read for, and why not.
   struct Unreadable {
@@ -76,6 +77,8 @@ class BlockDevices {
   // By the name that device-mapper knows it by.
   const BlockDevice* ByMapping(const std::string& name) const;
   const std::vector<const BlockDevice*>& PartitionsOf(const BlockDevice& disk) const;
+  // Whether one of the names that no device was read for may be a partition of this disk.
+  bool HasUnreadPartitions(const BlockDevice& disk) const;
 
  private:
   void Read(const SysfsReader& reader, const std::string& name);
@@ -91,6 +94,7 @@ class BlockDevices {
   std::unordered_map<std::string, const BlockDevice*> _byNumber;
   std::unordered_map<std::string, const BlockDevice*> _byMapping;
   std::unordered_map<std::string, std::vector<const BlockDevice*>> _partitions;
+  std::unordered_set<std::string> _withUnread;
 };
 
 // Why this is no longer the device it was: gone, or another one under the same name. Empty: it still is.

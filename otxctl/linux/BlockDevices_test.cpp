@@ -73,7 +73,7 @@ TEST_F(BlockDevicesTest, PartitionsMappingsAndRaidsAreToldApart) {
   _tree.AddMapping("dm-0", "vg0-data", "LVM-abc", {"sda1"});
   _tree.MakeFolder(_tree.AddVirtual("md0", 512) + "/md");
   const BlockDevices devices = Read();
-  EXPECT_THAT(NamesOf(devices.All()), ElementsAre("md0", "dm-0", "sda", "sda1"));
+  EXPECT_THAT(NamesOf(devices.All()), ElementsAre("dm-0", "md0", "sda", "sda1"));
   const BlockDevice& partition = *devices.ByName("sda1");
   EXPECT_EQ(partition.parent, "sda");
   EXPECT_THAT(partition.holders.Get(), ElementsAre("dm-0"));

@@ -5,7 +5,8 @@
 
 namespace OtxCtl::Linux {
 
-// Numbers by their value, other runs by length and then by the alphabet: sdb, sdz, sdaa; nvme2n1, nvme10n1.
+// Numbers by their value, letters by kind of device, then by length, then by the alphabet: nvme2n1, nvme10n1,
+// sdb, sdz, sdaa.
 // A strict order: of two different names one is before the other.
 bool IsNaturallyBefore(std::string_view name, std::string_view other);
 

@@ -52,40 +52,36 @@ Ref<ScsiDisk> AdmitDisk(const std::string& place, const ScsiDisk* disk, const Kn
   return copy;
 }
 
-Ref<DiskList> AdmitList(const std::string& place, const DiskList* disks, std::size_t most,
-                        const KnownDisks& known, Unknown unknown) {
-  const auto admitted = MakeRef<DiskList>();
-  const std::size_t count = disks == nullptr ? 0 : disks->Size();
-  CheckCount(place, count, most, "disks");
-  admitted->Reserve(count);
-  for (std::size_t i = 0; i < count; ++i) {
-    admitted->Append(AdmitDisk(Indexed(place, i), (*disks)[i], known, unknown, false));
+void AdmitEach(const std::string& place, DiskList& disks, std::size_t most, const KnownDisks& known,
+               Unknown unknown) {
+  CheckCount(place, disks.Size(), most, "disks");
+  for (std::size_t i = 0; i < disks.Size(); ++i) {
+    disks.Replace(i, AdmitDisk(Indexed(place, i), disks[i], known, unknown, false));
   }
-  return admitted;
 }
 
-Ref<DiskMapping> AdmitMapping(const std::string& place, const DiskMapping* mapping, const KnownDisks& known,
-                              Unknown unknown) {
+// How many disks it has.
+std::size_t AdmitMapping(const std::string& place, DiskMapping* mapping, const KnownDisks& known,
+                         Unknown unknown) {
   if (mapping == nullptr) {
     Refuse(place, "there is no disk group");
   }
-  const auto admitted = MakeRef<DiskMapping>();
-  admitted->SetSsd(AdmitDisk(place + ".ssd", mapping->GetSsd().Get(), known, unknown, true));
-  admitted->SetNonSsd(
-      AdmitList(place + ".nonSsd", mapping->GetNonSsd().Get(), mostDisksOfGroup, known, unknown));
-  return admitted;
+  mapping->SetSsd(AdmitDisk(place + ".ssd", mapping->GetSsd().Get(), known, unknown, true));
+  const Ref<DiskList> capacityDisks = mapping->GetNonSsd();
+  if (!capacityDisks) {
+    return 1;
+  }
+  AdmitEach(place + ".nonSsd", *capacityDisks, mostDisksOfGroup, known, unknown);
+  return 1 + capacityDisks->Size();
 }
 
-Ref<MappingList> AdmitMappings(const MappingList& mappings, const KnownDisks& known, Unknown unknown) {
+void AdmitMappings(const MappingList& mappings, const KnownDisks& known, Unknown unknown) {
   CheckCount("mappings", mappings.Size(), mostMappings, "disk groups");
-  const auto admitted = MakeRef<MappingList>();
   std::size_t disks = 0;
   for (std::size_t i = 0; i < mappings.Size(); ++i) {
-    admitted->Append(AdmitMapping(Indexed("mappings", i), mappings[i], known, unknown));
-    disks += 1 + (*admitted)[i]->GetNonSsd()->Size();
+    disks += AdmitMapping(Indexed("mappings", i), mappings[i], known, unknown);
     CheckCount("mappings", disks, mostNames, "disks");
   }
-  return admitted;
 }
 
 }  // namespace
@@ -128,20 +124,20 @@ void CheckNames(const std::string& property, const std::vector<std::string>& nam
   }
 }
 
-Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known) {
-  return AdmitList("disks", &disks, mostNames, known, Unknown::Refused);
+void AdmitDisks(DiskList& disks, const KnownDisks& known) {
+  AdmitEach("disks", disks, mostNames, known, Unknown::Refused);
 }
 
-Ref<MappingList> AdmitNewGroups(const MappingList& mappings, const KnownDisks& known) {
-  return AdmitMappings(mappings, known, Unknown::RefusedUnlessAbsent);
+void AdmitNewGroups(MappingList& mappings, const KnownDisks& known) {
+  AdmitMappings(mappings, known, Unknown::RefusedUnlessAbsent);
 }
 
-Ref<MappingList> AdmitGroups(const MappingList& mappings, const KnownDisks& known) {
-  return AdmitMappings(mappings, known, Unknown::LetIn);
+void AdmitGroups(MappingList& mappings, const KnownDisks& known) {
+  AdmitMappings(mappings, known, Unknown::LetIn);
 }
 
-Ref<DiskMapping> AdmitGroup(const DiskMapping* mapping, const KnownDisks& known) {
-  return AdmitMapping("mapping", mapping, known, Unknown::LetIn);
+void AdmitGroup(DiskMapping* mapping, const KnownDisks& known) {
+  AdmitMapping("mapping", mapping, known, Unknown::LetIn);
 }
 
 void CheckHostChange(const Simulation& simulation, std::string_view change) {

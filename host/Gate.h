@@ -2,8 +2,8 @@
 //
 // The plug-in takes a mistyped or half-filled request for impossible and ends the process over it. So every
 // request of a client passes here first. What is refused is thrown as an InvalidArgument, whose property is
-// the place ("disks[3]") and whose message says why; what is let in comes back with every disk that the
-// inventory knows replaced by the inventory's object: a client cannot call a hard disk flash.
+// the place ("disks[3]") and whose message says why; in what is let in, the inventory's object takes the
+// place of every disk that the inventory knows: a client cannot call a hard disk flash.
 //
 // Threads: any.
 #pragma once
@@ -49,16 +49,15 @@ void CheckOption(const std::string& property, const std::string& text);
 // The disks of an AddDisks. One that the inventory lacks is refused, whatever flag it brings: the kernel may
 // know it, but nobody has vouched for what it is.
 // Without an inventory nobody can tell: a SystemError, here and below.
-Tessa::Ref<DiskList> AdmitDisks(const DiskList& disks, const KnownDisks& known);
+void AdmitDisks(DiskList& disks, const KnownDisks& known);
 
 // Groups to be made: as AdmitDisks, but absent disks may be named too.
-Tessa::Ref<MappingList> AdmitNewGroups(const MappingList& mappings, const KnownDisks& known);
+void AdmitNewGroups(MappingList& mappings, const KnownDisks& known);
 
 // Groups that are there already, to be unmounted or removed. Their disks may be unknown to the inventory:
-// the plug-in compares names, and says itself when there is no such group.
-Tessa::Ref<MappingList> AdmitGroups(const MappingList& mappings, const KnownDisks& known);
-Tessa::Ref<Nox::Kova::Host::DiskMapping> AdmitGroup(const Nox::Kova::Host::DiskMapping* mapping,
-                                                    const KnownDisks& known);
+// the plug-in compares names, and says itself when there is no such group. A null is refused.
+void AdmitGroups(MappingList& mappings, const KnownDisks& known);
+void AdmitGroup(Nox::Kova::Host::DiskMapping* mapping, const KnownDisks& known);
 
 // Disks as AdmitDisks lets them in: a cache disk of a group that is not mounted brings its whole group along,
 // and the plug-in cannot bear a member that the inventory lacks. Refuses the disk and names the member. A

@@ -117,7 +117,9 @@ class GateWithHost : public testing::Test {
   std::string VerdictOnWholeGroups(const Names& names) {
     return VerdictOn([&] {
       const KnownDisks known = Known();
-      RequireWholeGroups(*AdmitDisks(*DisksNamed(names), known), known, *_host);
+      const Ref<DiskList> disks = DisksNamed(names);
+      AdmitDisks(*disks, known);
+      RequireWholeGroups(*disks, known, *_host);
     });
   }
 
@@ -129,7 +131,8 @@ TEST_F(GateWithHost, PutsTheInventorysDiskInThePlaceOfTheClients) {
   const auto claimed = ADisk("naa.2", true);  // a hard disk that calls itself flash
   claimed->SetVendor("ACME");
   const KnownDisks known = Known();
-  const Ref<DiskList> disks = AdmitDisks(*Disks({ADisk("naa.1"), claimed}), known);
+  const Ref<DiskList> disks = Disks({ADisk("naa.1"), claimed});
+  AdmitDisks(*disks, known);
   ASSERT_EQ(disks->Size(), 2u);
   EXPECT_EQ((*disks)[0], known.Find("naa.1").Get());
   EXPECT_EQ((*disks)[1], known.Find("naa.2").Get());
@@ -176,14 +179,16 @@ TEST_F(GateWithHost, LetsInTheMostDisksAndNoMore) {
 
 TEST_F(GateWithHost, PutsTheInventorysDisksInNewGroups) {
   const KnownDisks known = Known();
-  const auto groups = AdmitNewGroups(*Mappings({MappingOf("naa.1", {"naa.2", "naa.3"})}), known);
+  const auto groups = Mappings({MappingOf("naa.1", {"naa.2", "naa.3"})});
+  AdmitNewGroups(*groups, known);
   ASSERT_EQ(groups->Size(), 1u);
   EXPECT_EQ((*groups)[0]->GetSsd(), known.Find("naa.1").Get());
   EXPECT_EQ((*(*groups)[0]->GetNonSsd())[1], known.Find("naa.3").Get());
 }
 
 TEST_F(GateWithHost, GivesAbsentDisksOfNewGroupsTheFlagOfTheirPlace) {
-  const auto groups = AdmitNewGroups(*Mappings({MappingOf(absentName, {"naa.2", absentName})}), Known());
+  const auto groups = Mappings({MappingOf(absentName, {"naa.2", absentName})});
+  AdmitNewGroups(*groups, Known());
   EXPECT_EQ((*groups)[0]->GetSsd()->GetCanonicalName(), absentName);
   EXPECT_TRUE((*groups)[0]->GetSsd()->GetSsd());
   EXPECT_FALSE((*(*groups)[0]->GetNonSsd())[1]->GetSsd());
@@ -228,7 +233,8 @@ TEST_F(GateWithHost, LetsInTheMostDisksOfAGroupAndNoMore) {
 }
 
 TEST_F(GateWithHost, LetsGroupsThatAreThereNameDisksThatTheInventoryLacks) {
-  const auto group = AdmitGroup(MappingOf("naa.x", {"naa.2", "naa.y"}).Get(), Known());
+  const MappingRef group = MappingOf("naa.x", {"naa.2", "naa.y"});
+  AdmitGroup(group.Get(), Known());
   EXPECT_TRUE(group->GetSsd()->GetSsd());
   EXPECT_FALSE((*group->GetNonSsd())[1]->GetSsd());
   EXPECT_EQ(VerdictOn([&] { AdmitGroup(MappingOf("", {}).Get(), Known()); }),

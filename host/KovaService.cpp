@@ -63,11 +63,10 @@ Answer OrFailed(Answer answer, const char* reason) {
   return answer.result || answer.fault ? answer : FailedWith(reason);
 }
 
-// The items of a list that a request may leave out.
+// A list that a request may leave out.
 template <class List>
-const List& ItemsOf(const Ref<List>& list) {
-  static const List& none = *new List;
-  return list ? *list : none;
+Ref<List> OrEmpty(const Ref<List>& list) {
+  return list ? list : MakeRef<List>();
 }
 
 std::vector<std::string> NamesOf(const DiskList& disks) {
@@ -146,14 +145,15 @@ Answer GetConfigInfo(const PluginHooks& hooks, const Op::GetConfigInfo&) {
 
 Answer AddDisks(const PluginHooks& hooks, const Op::AddDisks& request) {
   const KnownDisks known = KnownDisks::Now();
-  const Ref<DiskList> admitted = Gate::AdmitDisks(ItemsOf(request.GetDisks()), known);
-  Gate::RequireWholeGroups(*admitted, known, *Kernel());
-  const Kovasvc::Texts texts = ToTexts(*admitted);
+  const Ref<DiskList> disks = OrEmpty(request.GetDisks());
+  Gate::AdmitDisks(*disks, known);
+  Gate::RequireWholeGroups(*disks, known, *Kernel());
+  const Kovasvc::Texts texts = ToTexts(*disks);
   Answer answer = Ask([&](std::string& faultText, std::string& resultText) {
     hooks.addDisks(texts, RequestTag(), faultText, resultText);
   });
   if (dynamic_cast<const Nox::Fault::InsufficientDisks*>(answer.fault.Get()) != nullptr) {
-    NameUnusableDisks(Guarded([&] { return QueryDisks(hooks, NamesOf(*admitted)); }), *answer.fault);
+    NameUnusableDisks(Guarded([&] { return QueryDisks(hooks, NamesOf(*disks)); }), *answer.fault);
   }
   return answer;
 }
@@ -165,8 +165,9 @@ Answer AddAllEligibleDisks(const PluginHooks& hooks, const Op::AddAllEligibleDis
 }
 
 Answer InitializeDisks(const PluginHooks& hooks, const Op::InitializeDisks& request) {
-  const Kovasvc::Texts texts =
-      ToTexts(*Gate::AdmitNewGroups(ItemsOf(request.GetMappings()), KnownDisks::Now()));
+  const Ref<MappingList> mappings = OrEmpty(request.GetMappings());
+  Gate::AdmitNewGroups(*mappings, KnownDisks::Now());
+  const Kovasvc::Texts texts = ToTexts(*mappings);
   Gate::RequireAnswers(*Kernel());
   return Ask([&](std::string& faultText, std::string& resultText) {
     hooks.initializeDisks(texts, RequestTag(), faultText, resultText);
@@ -174,7 +175,9 @@ Answer InitializeDisks(const PluginHooks& hooks, const Op::InitializeDisks& requ
 }
 
 Answer UnmountDiskMapping(const PluginHooks& hooks, const Op::UnmountDiskMapping& request) {
-  const Kovasvc::Texts texts = ToTexts(*Gate::AdmitGroups(ItemsOf(request.GetMappings()), KnownDisks::Now()));
+  const Ref<MappingList> mappings = OrEmpty(request.GetMappings());
+  Gate::AdmitGroups(*mappings, KnownDisks::Now());
+  const Kovasvc::Texts texts = ToTexts(*mappings);
   return Ask([&](std::string& faultText, std::string& resultText) {
     hooks.unmountDiskMapping(texts, RequestTag(), faultText, resultText);
   });
@@ -193,11 +196,12 @@ Answer RemoveDisk(const PluginHooks& hooks, const Op::RemoveDisk& request) {
 
 Answer RemoveDiskMapping(const PluginHooks& hooks, const Op::RemoveDiskMapping& request) {
   const Removal removal(request);
-  const Ref<DiskMapping> admitted = Gate::AdmitGroup(request.GetMapping().Get(), KnownDisks::Now());
+  const Ref<DiskMapping>& mapping = request.GetMapping();
+  Gate::AdmitGroup(mapping.Get(), KnownDisks::Now());
   const auto kernel = Kernel();
-  Gate::RequireGroupIfAbsent(*admitted, *kernel);
-  Gate::RequireOneIfAbsent("mapping.ssd", admitted->GetSsd()->GetCanonicalName(), *kernel);
-  const std::string text = ToText(*admitted);
+  Gate::RequireGroupIfAbsent(*mapping, *kernel);
+  Gate::RequireOneIfAbsent("mapping.ssd", mapping->GetSsd()->GetCanonicalName(), *kernel);
+  const std::string text = ToText(*mapping);
   return Ask([&](std::string& faultText, std::string&) {
     hooks.removeDiskMapping(text, removal.passThrough, removal.optionText, removal.optionFirst,
                             removal.optionSecond, faultText);
@@ -260,7 +264,7 @@ Answer KovaService::Query(const Op::Query& request) const {
   return AnswerTo(request, _hooks);
 }
 
-Answer KovaService::Change(const Op::Change& request) const {
+Answer KovaService::Change(Op::Change&& request) const {
   return AnswerTo(request, _hooks);
 }
 

@@ -28,7 +28,7 @@ class KovaService final : public ManagementApi {
       : _hooks(hooks), _simulation(simulation) {}
 
   Answer Query(const Nox::Operation::Query& request) const override;
-  Answer Change(const Nox::Operation::Change& request) const override;
+  Answer Change(Nox::Operation::Change&& request) const override;
   std::string DescribeHost() const override;
   void CheckHostChange(std::string_view change) const override;
   Answer ChangeHost(const std::string& change) const override;

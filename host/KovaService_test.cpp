@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <stdexcept>
+#include <utility>
 
 #include "host/testing/Requests.h"
 #include "nox/Kova.h"
@@ -128,7 +129,7 @@ TEST_F(KovaServiceTest, ServesEveryOperation) {
   const KovaService service(EveryHook());
   for (const Nox::OperationDescriptor& operation : Nox::Operations()) {
     const auto request = operation.request.create();
-    const Answer answer = operation.changes ? service.Change(dynamic_cast<const Op::Change&>(*request))
+    const Answer answer = operation.changes ? service.Change(std::move(dynamic_cast<Op::Change&>(*request)))
                                             : service.Query(dynamic_cast<const Op::Query&>(*request));
     EXPECT_THAT(ReasonOf(answer), testing::Not(HasSubstr("does not serve"))) << operation.name;
   }

@@ -31,7 +31,8 @@ class ManagementApi {
   virtual Answer Query(const Nox::Operation::Query& request) const = 0;
 
   // A fault beside a result tells what failed in all. Neither of them: there was nothing to do, or to say.
-  virtual Answer Change(const Nox::Operation::Change& request) const = 0;
+  // The request is given away, with all that it holds: the inventory's disks are put into it.
+  virtual Answer Change(Nox::Operation::Change&& request) const = 0;
 
   // Simulated hosts only. The host's description, as a file would hold it.
   virtual std::string DescribeHost() const = 0;

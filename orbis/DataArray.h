@@ -39,6 +39,8 @@ class TESSA_API DataArray final : public DataArrayBase {
   const TypeDescriptor& GetType() const override { return StaticType(); }
 
   void Append(Ref<T> element) { _items.push_back(std::move(element)); }
+  // Puts it in the place of another. No bounds are checked.
+  void Replace(std::size_t index, Ref<T> element) { _items[index] = std::move(element); }
 
   // The element, borrowed; the list keeps it. No bounds are checked.
   T* operator[](std::size_t index) const noexcept { return static_cast<T*>(_items[index].Get()); }

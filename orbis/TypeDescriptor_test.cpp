@@ -104,6 +104,20 @@ TEST(DataArray, HoldsItsElementsInOrderAndMayHoldNull) {
               ElementsAre(first.Get(), nullptr));
 }
 
+TEST(DataArray, PutsAnElementInThePlaceOfAnother) {
+  const Ref<DataArray<KeyAnyValue>> list = MakeRef<DataArray<KeyAnyValue>>();
+  const Ref<KeyAnyValue> first = MakeRef<KeyAnyValue>();
+  const Ref<KeyAnyValue> second = MakeRef<KeyAnyValue>();
+  list->Append(first);
+  list->Append(nullptr);
+  list->Replace(0, second);
+  list->Replace(1, first);
+  EXPECT_EQ((*list)[0], second.Get());
+  EXPECT_EQ((*list)[1], first.Get());
+  EXPECT_EQ(first->GetRefCount(), 2) << "its first place has let it go";
+  EXPECT_EQ(list->Size(), 2u);
+}
+
 TEST(DataArray, TakesObjectsOfItsElementTypeOnly) {
   const Ref<DataArray<ServiceFault>> list = MakeRef<DataArray<ServiceFault>>();
   list->AppendAny(MakeRef<Fault::SystemError>());

@@ -55,7 +55,7 @@ Answer AgentClient::Query(const Nox::Operation::Query& request) const {
   return Ask(request, queryPatience);
 }
 
-Answer AgentClient::Change(const Nox::Operation::Change& request) const {
+Answer AgentClient::Change(Nox::Operation::Change&& request) const {
   return Ask(request, changePatience);
 }
 

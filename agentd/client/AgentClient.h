@@ -37,7 +37,7 @@ class AgentClient final : public Host::ManagementApi {
 
   Host::Answer Query(const Nox::Operation::Query& request) const override;
   // Neither result nor fault where the request says not to wait.
-  Host::Answer Change(const Nox::Operation::Change& request) const override;
+  Host::Answer Change(Nox::Operation::Change&& request) const override;
   // Throws Host::HostError when the agent's host is not simulated.
   std::string DescribeHost() const override;
   Host::Answer ChangeHost(const std::string& change) const override;

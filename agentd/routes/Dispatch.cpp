@@ -52,7 +52,7 @@ void Submit(const Services& services, const OperationDescriptor& operation, cons
   }
   const Task task = services.tasks.Submit(
       std::string(operation.name), change.HasLabel() ? change.GetLabel() : "",
-      [api = services.api, request] { return api->Change(static_cast<const Change&>(*request)); },
+      [api = services.api, request] { return api->Change(std::move(static_cast<Change&>(*request))); },
       std::move(onEnded), Host::WeightOf(*request));
   if (!waits) {
     responder.Answer(encoding.takenOn(task));

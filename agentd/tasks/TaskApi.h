@@ -3,6 +3,8 @@
 // Threads: any. The host and the queue outlive it.
 #pragma once
 
+#include <utility>
+
 #include "host/ManagementApi.h"
 
 namespace Agentd {
@@ -14,7 +16,9 @@ class TaskApi final : public Host::ManagementApi {
   TaskApi(const Host::ManagementApi& host, const TaskQueue& tasks) : _host(host), _tasks(tasks) {}
 
   Host::Answer Query(const Nox::Operation::Query& request) const override;
-  Host::Answer Change(const Nox::Operation::Change& request) const override { return _host.Change(request); }
+  Host::Answer Change(Nox::Operation::Change&& request) const override {
+    return _host.Change(std::move(request));
+  }
   std::string DescribeHost() const override { return _host.DescribeHost(); }
   void CheckHostChange(std::string_view change) const override { _host.CheckHostChange(change); }
   Host::Answer ChangeHost(const std::string& change) const override { return _host.ChangeHost(change); }

@@ -37,7 +37,7 @@ class FakeApi final : public Host::ManagementApi {
     }
     return Note(Host::Testing::InALine(request));
   }
-  Host::Answer Change(const Nox::Operation::Change& request) const override {
+  Host::Answer Change(Nox::Operation::Change&& request) const override {
     return Changed(Host::Testing::InALine(request));
   }
   std::string DescribeHost() const override {

@@ -21,7 +21,7 @@ class FakeHost final : public Host::ManagementApi {
     const bool isGroups = dynamic_cast<const Nox::Operation::GetDiskGroups*>(&request) != nullptr;
     return isGroups ? NextGroups() : answer;
   }
-  Host::Answer Change(const Nox::Operation::Change& request) const override {
+  Host::Answer Change(Nox::Operation::Change&& request) const override {
     return Changed(Host::Testing::InALine(request));
   }
 

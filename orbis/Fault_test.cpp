@@ -28,13 +28,7 @@ Ref<LocalizableMessage> AMessage(const char* key) {
 }
 
 const Any* MessagesIfMade(const MethodFault& fault) {
-  for (const FieldDescriptor* field : fault.GetType().fields) {
-    if (field->name == "faultMessage") {
-      return field->get(fault);
-    }
-  }
-  ADD_FAILURE() << "no field faultMessage";
-  return nullptr;
+  return fault.GetType().FindField("faultMessage")->get(fault);
 }
 
 TEST(FaultMessage, IsMadeOnFirstAccess) {

@@ -113,6 +113,15 @@ bool TypeDescriptor::IsA(const TypeDescriptor& other) const noexcept {
   return false;
 }
 
+const FieldDescriptor* TypeDescriptor::FindField(std::string_view wanted) const noexcept {
+  for (const FieldDescriptor* field : fields) {
+    if (field->name == wanted) {
+      return field;
+    }
+  }
+  return nullptr;
+}
+
 const TypeDescriptor& Complete(TypeDescriptor description, Ref<DataArrayBase> (*createArray)()) {
   auto* const type = new TypeDescriptor(std::move(description));
   type->fields = type->base->fields;

@@ -79,6 +79,8 @@ struct TypeDescriptor {
   bool IsAbstract() const noexcept { return kind == TypeKind::DataObject && create == nullptr; }
   // Whether it is `other` or derives from it.
   bool IsA(const TypeDescriptor& other) const noexcept;
+  // The field of that name, its bases' among them; or null.
+  const FieldDescriptor* FindField(std::string_view wanted) const noexcept;
 };
 
 // A finished descriptor that lives for ever: takes over the fields of its base and makes the list type

@@ -72,6 +72,18 @@ TEST(TypeDescriptor, KnowsItsAncestors) {
   EXPECT_FALSE(DataArray<Fault::SystemError>::StaticType().IsA(type));
 }
 
+TEST(TypeDescriptor, FindsAFieldOfItsOwnOrOfABaseByName) {
+  const TypeDescriptor& type = Fault::SystemError::StaticType();
+  for (const FieldDescriptor* field : type.fields) {
+    EXPECT_EQ(type.FindField(field->name), field);
+  }
+  EXPECT_EQ(type.FindField("reason"), &type.ownFields[0]);
+  EXPECT_EQ(type.FindField("faultMessage"), MethodFault::StaticType().FindField("faultMessage"));
+  EXPECT_EQ(type.FindField("Reason"), nullptr);
+  EXPECT_EQ(type.FindField(""), nullptr);
+  EXPECT_EQ(DataArray<Fault::SystemError>::StaticType().FindField("reason"), nullptr);
+}
+
 TEST(TypeDescriptor, OfAnAbstractTypeMakesNothing) {
   EXPECT_EQ(MethodFault::StaticType().create, nullptr);
   EXPECT_FALSE(DataArray<MethodFault>::StaticType().IsAbstract()) << "a list of them can still be made";
@@ -80,14 +92,12 @@ TEST(TypeDescriptor, OfAnAbstractTypeMakesNothing) {
 
 TEST(FieldDescriptor, RefusesAnObjectOfAnotherType) {
   const Ref<LocalizableMessage> message = MakeRef<LocalizableMessage>();
-  for (const FieldDescriptor* field : LocalizableMessage::StaticType().fields) {
-    if (field->name == "arg") {
-      EXPECT_THROW(field->assign(*message, MakeRef<KeyAnyValue>()), Tessa::TypeMismatchException);
-      EXPECT_FALSE(message->GetArg());
-      field->assign(*message, MakeRef<DataArray<KeyAnyValue>>());
-      EXPECT_TRUE(message->GetArg());
-    }
-  }
+  const FieldDescriptor* const field = LocalizableMessage::StaticType().FindField("arg");
+  ASSERT_NE(field, nullptr);
+  EXPECT_THROW(field->assign(*message, MakeRef<KeyAnyValue>()), Tessa::TypeMismatchException);
+  EXPECT_FALSE(message->GetArg());
+  field->assign(*message, MakeRef<DataArray<KeyAnyValue>>());
+  EXPECT_TRUE(message->GetArg());
 }
 
 TEST(DataArray, HoldsItsElementsInOrderAndMayHoldNull) {

@@ -16,7 +16,6 @@ namespace {
 using Nox::OperationDescriptor;
 using Orbis::EnvelopeException;
 using Orbis::FieldDescriptor;
-using Orbis::FieldKind;
 using Orbis::Presence;
 using Orbis::Json::Kind;
 using Orbis::Json::Value;
@@ -24,15 +23,6 @@ using Orbis::Json::Value;
 // A key of the client's, in a place: '' for one without a letter.
 std::string Named(std::string_view key) {
   return key.empty() ? "''" : Tessa::Escape(key);
-}
-
-const FieldDescriptor* FindParameter(const OperationDescriptor& operation, std::string_view name) {
-  for (const FieldDescriptor* field : operation.request.fields) {
-    if (field->name == name) {
-      return field;
-    }
-  }
-  return nullptr;
 }
 
 std::string ParametersOf(const OperationDescriptor& operation) {
@@ -51,7 +41,7 @@ bool IsRequired(const OperationDescriptor& operation, const FieldDescriptor& par
 
 void CheckParameters(const OperationDescriptor& operation, const Value& root) {
   for (const auto& [key, value] : root.members) {
-    if (FindParameter(operation, key) == nullptr) {
+    if (operation.request.FindField(key) == nullptr) {
       throw Orbis::ParseException(
           Named(key), value.line,
           "unknown parameter; " + std::string(operation.name) + " takes " + ParametersOf(operation));

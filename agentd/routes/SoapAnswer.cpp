@@ -25,15 +25,6 @@ HttpAnswer Xml(unsigned status) {
   return http;
 }
 
-const Orbis::FieldDescriptor* FindField(const Orbis::TypeDescriptor& type, std::string_view name) {
-  for (const Orbis::FieldDescriptor* field : type.fields) {
-    if (field->name == name) {
-      return field;
-    }
-  }
-  return nullptr;
-}
-
 // The operation's response object. Throws Tessa::TypeMismatchException for a result of another type than the
 // operation's.
 Ref<Orbis::DataObject> ResponseOf(const OperationDescriptor& operation, const Host::Answer& answer,
@@ -41,11 +32,11 @@ Ref<Orbis::DataObject> ResponseOf(const OperationDescriptor& operation, const Ho
   const Ref<Orbis::Any> made = operation.response.create();
   auto& response = static_cast<Orbis::DataObject&>(*made);
   if (answer.result && operation.result != nullptr) {
-    FindField(operation.response, "result")->assign(response, Ref<Orbis::Any>(answer.result.Get()));
+    operation.response.FindField("result")->assign(response, Ref<Orbis::Any>(answer.result.Get()));
   }
-  FindField(operation.response, "fault")->assign(response, answer.fault);
+  operation.response.FindField("fault")->assign(response, answer.fault);
   if (!task.empty()) {
-    *static_cast<std::string*>(FindField(operation.response, "task")->write(response)) = task;
+    *static_cast<std::string*>(operation.response.FindField("task")->write(response)) = task;
   }
   return Ref<Orbis::DataObject>(&response);
 }

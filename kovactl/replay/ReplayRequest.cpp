@@ -87,9 +87,7 @@ bool ReadArgument(const std::string& key, const Value& value, HookArguments& arg
 
 // A parameter that the log may give: label and wait are the agent's.
 bool Takes(const Nox::OperationDescriptor& operation, std::string_view key) {
-  const auto isOfThatName = [key](const FieldDescriptor* field) { return field->name == key; };
-  const auto& fields = operation.request.fields;
-  return key != "label" && key != "wait" && std::any_of(fields.begin(), fields.end(), isOfThatName);
+  return key != "label" && key != "wait" && operation.request.FindField(key) != nullptr;
 }
 
 Tessa::Ref<Orbis::DataObject> MakeNamed(const Orbis::TypeDescriptor&, const std::string& name) {

@@ -124,11 +124,7 @@ class JsonReader {
 
   [[noreturn]] static void RefuseUnknown(const Value& value, const TypeDescriptor& type, const Place& place) {
     for (const auto& [key, member] : value.members) {
-      bool known = key == typeKey;
-      for (const FieldDescriptor* field : type.fields) {
-        known = known || field->name == key;
-      }
-      if (!known) {
+      if (key != typeKey && type.FindField(key) == nullptr) {
         Refuse(member, Place{&place, key}, "unknown field; " + type.name + " has none of that name");
       }
     }

@@ -140,15 +140,19 @@ void WriteJsonResult(const Result& result, std::string& out) {
   }
 }
 
+void WriteJsonFault(const Orbis::MethodFault* fault, std::string& out) {
+  if (fault == nullptr) {
+    out += "null";
+  } else {
+    Orbis::WriteJson(*fault, out);
+  }
+}
+
 void WriteJsonAnswer(const Answer& answer, std::string& out) {
   out += "{\"result\":";
   WriteJsonResult(answer.result, out);
   out += ",\"fault\":";
-  if (answer.fault) {
-    Orbis::WriteJson(*answer.fault, out);
-  } else {
-    out += "null";
-  }
+  WriteJsonFault(answer.fault.Get(), out);
   out += "}";
 }
 

@@ -76,8 +76,9 @@ Answer ReadJsonAnswer(std::string_view text, const Orbis::TypeDescriptor* result
 
 // And back, appended: from the text of the result, if it is one. Throws as Result::Get.
 void WriteJsonAnswer(const Answer& answer, std::string& out);
-// The result alone; null for none.
+// The result alone, and the fault; null for none.
 void WriteJsonResult(const Result& result, std::string& out);
+void WriteJsonFault(const Orbis::MethodFault* fault, std::string& out);
 
 // An answer that is only a SystemError with that reason.
 Answer FailedWith(const std::string& reason);

@@ -2,7 +2,6 @@
 
 #include <array>
 
-#include "orbis/Json.h"
 #include "orbis/Scalar.h"
 #include "orbis/json/JsonText.h"
 
@@ -60,11 +59,7 @@ void WriteJson(const Task& task, bool withResult, std::string& out) {
       out += ",\"resultForgotten\":true";
     }
     out += ",\"fault\":";
-    if (task.answer.fault) {
-      Orbis::WriteJson(*task.answer.fault, out);
-    } else {
-      out += "null";
-    }
+    Host::WriteJsonFault(task.answer.fault.Get(), out);
   }
   out += "}";
 }

@@ -19,7 +19,6 @@
 #include "kovactl/replay/ReplayRequest.h"
 #include "kovactl/replay/ReplayTexts.h"
 #include "nox/Host.h"
-#include "orbis/Json.h"
 #include "orbis/ParseException.h"
 #include "orbis/json/JsonText.h"
 #include "otxctl/fault/CallRecorder.h"
@@ -45,15 +44,6 @@ std::string TypeName(const std::type_info& type) {
     }
   }
   return name.substr(0, name.find('<'));
-}
-
-template <class T>
-void AppendOrNull(const Ref<T>& value, std::string& out) {
-  if (value) {
-    Orbis::WriteJson(*value, out);
-  } else {
-    out += "null";
-  }
 }
 
 void AppendLog(const std::vector<CapturedLine>& lines, std::string& out) {
@@ -150,7 +140,7 @@ class Replay {
     std::string line = "{\"operation\":";
     Orbis::Json::AppendString(_operation, line);
     line += ",\"fault\":";
-    AppendOrNull(answer.fault, line);
+    Host::WriteJsonFault(answer.fault.Get(), line);
     line += ",\"result\":";
     Host::WriteJsonResult(answer.result, line);
     line += ",\"ended\":";

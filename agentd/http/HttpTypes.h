@@ -8,8 +8,6 @@
 #include <string>
 #include <string_view>
 
-#include "host/Outcome.h"
-
 namespace Agentd {
 
 // What a client may ask for. Each role includes those before it.
@@ -46,8 +44,6 @@ struct HttpAnswer {
   std::string body;
   int retryAfterSeconds = 0;  // 0: the header is not sent
   std::string allow = {};     // with 405: the methods that are served there, "GET, HEAD"
-  // Of what was asked for, where the status does not tell; not sent.
-  Host::Outcome outcome = Host::Outcome::Done;
 };
 
 // What becomes of a request of which only the header is known.

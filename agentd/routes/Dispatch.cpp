@@ -3,7 +3,6 @@
 #include <string>
 #include <utility>
 
-#include "agentd/routes/JsonAnswers.h"
 #include "agentd/tasks/QueryQueue.h"
 #include "agentd/tasks/TaskQueue.h"
 #include "host/ManagementApi.h"
@@ -31,10 +30,13 @@ HttpAnswer Answered(const Encoding& encoding, const Make& make) {
 void Ask(const Services& services, const OperationDescriptor& operation, const RequestRef& request,
          const Encoding& encoding, const HttpResponder& responder) {
   services.queries.Run([api = services.api, &operation, request, encoding, responder] {
+    Host::Outcome outcome = Host::Outcome::Failed;  // of what comes to no answer that can be made
     HttpAnswer made = Answered(encoding, [&] {
-      return encoding.answer(operation, api->Query(static_cast<const Query&>(*request)));
+      const Host::Answer answer = api->Query(static_cast<const Query&>(*request));
+      HttpAnswer http = encoding.answer(operation, answer);
+      outcome = Host::OutcomeOfQuery(answer);
+      return http;
     });
-    const Host::Outcome outcome = OutcomeOf(made);
     responder.Answer(std::move(made));
     return outcome;
   });

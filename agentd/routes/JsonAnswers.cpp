@@ -41,10 +41,9 @@ unsigned StatusOf(const Answer& answer) {
   return faultOfTheHost;
 }
 
-HttpAnswer WithStatusOf(const Answer& answer, Host::Outcome outcome) {
+HttpAnswer WithStatusOf(const Answer& answer) {
   HttpAnswer http;
   http.status = StatusOf(answer);
-  http.outcome = outcome;
   if (const auto* const busy = dynamic_cast<const Nox::Fault::Busy*>(answer.fault.Get())) {
     http.retryAfterSeconds = busy->GetRetryAfterSeconds();
   }
@@ -57,20 +56,15 @@ HttpAnswer PlainText(unsigned status, const std::string& text) {
   return {status, "text/plain; charset=utf-8", text + "\n"};
 }
 
-Host::Outcome OutcomeOf(const HttpAnswer& http) {
-  constexpr unsigned firstOfFailures = 400;
-  return http.status < firstOfFailures ? http.outcome : Host::Outcome::Failed;
-}
-
 HttpAnswer ToHttp(const Answer& answer) {
-  HttpAnswer http = WithStatusOf(answer, Host::OutcomeOfQuery(answer));
+  HttpAnswer http = WithStatusOf(answer);
   WriteJsonAnswer(answer, http.body);
   http.body += "\n";
   return http;
 }
 
 HttpAnswer ToHttp(const Task& ended) {
-  HttpAnswer http = WithStatusOf(ended.answer, OutcomeIn(ended.state));
+  HttpAnswer http = WithStatusOf(ended.answer);
   std::string answer;
   WriteJsonAnswer(ended.answer, answer);
   http.body = "{\"task\":";

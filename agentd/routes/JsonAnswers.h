@@ -13,9 +13,6 @@ namespace Agentd {
 
 HttpAnswer PlainText(unsigned status, const std::string& text);
 
-// What the request came to: Failed with every status that says so, otherwise as the answer has it.
-Host::Outcome OutcomeOf(const HttpAnswer& http);
-
 // To a query, {"result": .., "fault": ..}. A fault alone, or beside an empty list, has the status of its
 // kind; everything else has 200.
 HttpAnswer ToHttp(const Host::Answer& answer);

@@ -53,18 +53,11 @@ TEST(JsonAnswers, AFaultBesideAnEmptyListIsAFailureAndStillShowsTheList) {
   EXPECT_EQ(http.body, "{\"result\":[],\"fault\":{\"@type\":\"InsufficientDisks\",\"device\":\"naa.1\"}}\n");
 }
 
-TEST(JsonAnswers, AFaultBesideAResultIs200AndCountsAsAPart) {
+TEST(JsonAnswers, AFaultBesideAResultIs200) {
   const auto texts = MakeRef<Orbis::TextList>(std::vector<std::string>{"a"});
   const HttpAnswer http =
       ToHttp(Host::Answer{.result = texts, .fault = MakeRef<Orbis::Fault::SystemError>("no")});
   EXPECT_EQ(http.status, 200u);
-  EXPECT_EQ(OutcomeOf(http), Host::Outcome::Partly);
-}
-
-TEST(JsonAnswers, AnythingWithAStatusThatSaysSoHasFailed) {
-  EXPECT_EQ(OutcomeOf(PlainText(399, "odd")), Host::Outcome::Done);
-  EXPECT_EQ(OutcomeOf(PlainText(400, "no")), Host::Outcome::Failed);
-  EXPECT_EQ(OutcomeOf(ToHttp(Host::FailedWith("no"))), Host::Outcome::Failed);
 }
 
 TEST(JsonAnswers, ALineOfTextNamesItsCharset) {

@@ -186,6 +186,13 @@ TEST_F(MetricsRoute, CountsQueriesByWhatBecameOfThemWhicheverDoorTheyCameThrough
                                HasSubstr("queries_total{outcome=\"failed\"} 2\n")));
 }
 
+TEST_F(MetricsRoute, CountsQueriesWithoutAnAnswerAsFailed) {
+  _api.onQuery = [] { throw std::runtime_error("no"); };
+  EXPECT_EQ(Ask({"GET", "/api/v1/groups", "", ""}).status, 500u);
+  EXPECT_THAT(Metrics(), AllOf(HasSubstr("queries_total{outcome=\"done\"} 0\n"),
+                               HasSubstr("queries_total{outcome=\"failed\"} 1\n")));
+}
+
 TEST_F(MetricsRoute, TellsOfTheHostWhatItWasToldWhenItWasLastAsked) {
   _host.Tell({"inUse", "eligible", "eligible"}, {true});
   EXPECT_THAT(Metrics(), Not(HasSubstr("kova_disks"))) << "the first answer waits for no host";

@@ -67,13 +67,11 @@ HttpAnswer TypedFault(const MethodFault& fault, std::string_view task = {}) {
 }
 
 // `task`: the id of the change; empty for a query.
-HttpAnswer Respond(const OperationDescriptor& operation, const Host::Answer& answer, Host::Outcome outcome,
-                   std::string_view task) {
+HttpAnswer Respond(const OperationDescriptor& operation, const Host::Answer& answer, std::string_view task) {
   if (Host::IsFaultAlone(answer)) {
     return TypedFault(*answer.fault, task);
   }
   HttpAnswer http = Xml(200);
-  http.outcome = outcome;
   const Ref<Orbis::DataObject> response = ResponseOf(operation, answer, task);
   Orbis::AppendSoapMessage(response->GetType().name, *response, http.body);
   return http;
@@ -91,13 +89,11 @@ bool AppendAsItIs(const OperationDescriptor& operation, const Host::Answer& answ
 
 HttpAnswer ToSoap(const OperationDescriptor& operation, const Host::Answer& answer) {
   HttpAnswer http = Xml(200);
-  return AppendAsItIs(operation, answer, http.body)
-             ? http
-             : Respond(operation, answer, Host::OutcomeOfQuery(answer), {});
+  return AppendAsItIs(operation, answer, http.body) ? http : Respond(operation, answer, {});
 }
 
 HttpAnswer ToSoap(const Task& ended) {
-  return Respond(*Nox::FindOperation(ended.operation), ended.answer, OutcomeIn(ended.state), ended.id);
+  return Respond(*Nox::FindOperation(ended.operation), ended.answer, ended.id);
 }
 
 HttpAnswer ToSoapFault(const Host::Answer& answer) {
@@ -124,8 +120,7 @@ const Encoding& SoapEncoding() {
       .answer = [](const OperationDescriptor& operation,
                    const Host::Answer& answer) { return ToSoap(operation, answer); },
       .ended = [](const Task& task) { return ToSoap(task); },
-      .takenOn =
-          [](const Task& task) { return Respond(*Nox::FindOperation(task.operation), {}, {}, task.id); },
+      .takenOn = [](const Task& task) { return Respond(*Nox::FindOperation(task.operation), {}, task.id); },
       .fault = &ToSoapFault,
   };
   return encoding;

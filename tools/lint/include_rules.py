@@ -45,7 +45,7 @@ RULES = {
     "machines": ["tessa", "orbis", "nox", "host", "otxctl/sim", "kova/agentd/include"],
     "agentd": ["tessa", "host", "machines/Machines.h", "otxctl/fault", "agentd/http", "agentd/routes",
                "agentd/tasks"],
-    "agentd/http": ["tessa/Logger.h", "tessa/text", "host/Outcome.h"],
+    "agentd/http": ["tessa/Logger.h", "tessa/text"],
     "agentd/client": ["tessa", "orbis", "orbis/json", "nox", "host", "agentd/http"],
     "agentd/tasks": ["tessa", "orbis", "orbis/json", "nox", "host", "otxctl/TaskScope.h"],
     "agentd/routes": ["tessa", "orbis", "orbis/json", "nox", "host", "agentd/http", "agentd/tasks"],

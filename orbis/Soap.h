@@ -23,11 +23,6 @@ namespace Orbis {
 
 class Version;
 
-inline constexpr std::string_view apiNamespace = "urn:nox";
-inline constexpr std::string_view schemaNamespace = "http://www.w3.org/2001/XMLSchema";
-inline constexpr std::string_view envelopeNamespace = "http://schemas.xmlsoap.org/soap/envelope/";
-inline constexpr std::string_view instanceNamespace = "http://www.w3.org/2001/XMLSchema-instance";
-
 // Appends the text of the value; what `out` held stays in front, and is all it holds when this throws.
 // With a version, types and fields newer than it are left out: a newer type is written as its nearest
 // ancestor that the version has. Null: everything is written.

@@ -4,8 +4,8 @@
 
 #include "orbis/Envelope.h"
 #include "orbis/Json.h"
+#include "orbis/Namespaces.h"
 #include "orbis/ParseException.h"
-#include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/json/JsonText.h"
 #include "tessa/text/Escape.h"

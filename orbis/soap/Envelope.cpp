@@ -4,7 +4,7 @@
 
 #include "orbis/DataObject.h"
 #include "orbis/GrowingText.h"
-#include "orbis/Soap.h"
+#include "orbis/Namespaces.h"
 #include "orbis/TypeDescriptor.h"
 #include "orbis/Types.h"
 #include "orbis/WrittenSoap.h"

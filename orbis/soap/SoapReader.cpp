@@ -2,6 +2,7 @@
 #include <string>
 #include <vector>
 
+#include "orbis/Namespaces.h"
 #include "orbis/ParseException.h"
 #include "orbis/Scalar.h"
 #include "orbis/Soap.h"

@@ -1,5 +1,6 @@
 #include <string>
 
+#include "orbis/Namespaces.h"
 #include "orbis/Scalar.h"
 #include "orbis/Soap.h"
 #include "orbis/TypeDescriptor.h"

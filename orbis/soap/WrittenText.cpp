@@ -2,7 +2,7 @@
 
 #include <utility>
 
-#include "orbis/Soap.h"
+#include "orbis/Namespaces.h"
 
 namespace Orbis::Soap {
 namespace {

@@ -5,14 +5,13 @@
 #include <new>
 #include <type_traits>
 
-#include "orbis/Soap.h"
+#include "orbis/Namespaces.h"
 
 namespace Orbis::Xml {
 
 namespace {
 
 constexpr std::string_view kXmlNamespace = "http://www.w3.org/XML/1998/namespace";
-constexpr std::string_view kXsiNamespace = "http://www.w3.org/2001/XMLSchema-instance";
 // The actor that everybody is who gets a message.
 constexpr std::string_view kNextActor = "http://schemas.xmlsoap.org/soap/actor/next";
 
@@ -191,7 +190,7 @@ void TreeBuilder::AddAttribute(const Name& name, std::string_view value) {
            Counted(_limits.textBytes, "bytes"));
   }
   Element& element = *_open.back().element;
-  const bool xsi = name.nameSpace == kXsiNamespace;
+  const bool xsi = name.nameSpace == instanceNamespace;
   if (xsi && name.local == "type") {
     element.type = ResolveType(value);
   } else if (xsi && name.local == "nil") {

@@ -15,7 +15,7 @@ RULES = {
     "tessa": [],
     "orbis": ["tessa"],
     "orbis/json": ["tessa", "orbis"],
-    "orbis/xml": ["tessa/text", "orbis/Limits.h", "orbis/ParseException.h", "orbis/Soap.h"],
+    "orbis/xml": ["tessa/text", "orbis/Limits.h", "orbis/Namespaces.h", "orbis/ParseException.h"],
     "orbis/soap": ["tessa", "orbis", "orbis/json", "orbis/xml"],
     "nox": ["tessa", "orbis"],
     "kova/agentd/include": [],

@@ -46,7 +46,7 @@ RULES = {
     "agentd": ["tessa", "host", "machines/Machines.h", "otxctl/fault", "agentd/http", "agentd/routes",
                "agentd/tasks"],
     "agentd/http": ["tessa/Logger.h", "tessa/text"],
-    "agentd/client": ["tessa", "orbis", "orbis/json", "nox", "host", "agentd/http"],
+    "agentd/client": ["tessa", "orbis", "nox", "host", "agentd/http"],
     "agentd/tasks": ["tessa", "orbis", "orbis/json", "nox", "host", "otxctl/TaskScope.h"],
     "agentd/routes": ["tessa", "orbis", "orbis/json", "nox", "host", "agentd/http", "agentd/tasks"],
     "kovactl": ["tessa", "orbis", "orbis/json", "nox", "host", "machines/Machines.h", "agentd/client",

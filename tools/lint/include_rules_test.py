@@ -56,6 +56,12 @@ class IncludeRules(unittest.TestCase):
         self.assertEqual(len(reasons("orbis/Engine.cpp", '#include "orbis/soap/SoapWriter.h"')), 1)
         self.assertEqual(reasons("kovactl/change/Change.cpp", '#include "kovactl/Words.h"'), [])
 
+    def test_what_carries_texts_does_not_know_what_they_say(self):
+        self.assertEqual(len(reasons("orbis/xml/XmlReader.cpp", '#include "orbis/Soap.h"')), 1)
+        self.assertEqual(reasons("orbis/xml/TreeBuilder.cpp", '#include "orbis/Namespaces.h"'), [])
+        self.assertEqual(len(reasons("agentd/http/HttpTypes.h", '#include "host/Outcome.h"')), 1)
+        self.assertEqual(len(reasons("agentd/client/AgentClient.cpp", '#include "orbis/json/JsonText.h"')), 1)
+
     def test_only_machines_know_the_simulator(self):
         for path in ["host/HostRuntime.cpp", "agentd/main.cpp", "kovactl/Connection.cpp", "kovactl/replay/ReplayRunner.cpp",
                      "kova/agentd/KovaManagerImpl.cpp"]:

@@ -15,6 +15,8 @@ namespace Host::Gate {
 
 using Orbis::Fault::SystemError;
 using Tessa::MakeRef;
+using DiskRecord = HostCtl::Kova::DiskResult;
+using GroupRecord = HostCtl::Kova::DiskMapping;
 
 namespace {
 
@@ -32,10 +34,10 @@ Positions CacheDisksUnmounted(const DiskList& disks, HostCtl::Kova::KovaInfo& ke
   if (names.empty()) {
     return {};  // a query without names would answer for every disk of the host
   }
-  std::vector<HostCtl::Kova::DiskResult> records;
+  std::vector<DiskRecord> records;
   kernel.QueryDisks(names, records, true);
   Positions unmounted;
-  for (const HostCtl::Kova::DiskResult& record : records) {
+  for (const DiskRecord& record : records) {
     const auto at = flash.find(record.name);
     if (record.isSsd && record.reason == HostCtl::Kova::DiskReason::GroupNotMounted && at != flash.end()) {
       unmounted.insert(*at);
@@ -53,7 +55,7 @@ std::string NameIfMissing(const HostCtl::Kova::DiskName& disk, const KnownDisks&
 }
 
 // The first of the group's disks that the inventory lacks; empty when all are there.
-std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDisks& known) {
+std::string MissingMember(const GroupRecord& group, const KnownDisks& known) {
   std::string missing = NameIfMissing(group.ssd, known);
   for (auto disk = group.capacityDisks.begin(); missing.empty() && disk != group.capacityDisks.end();
        ++disk) {
@@ -68,11 +70,11 @@ std::string MissingMember(const HostCtl::Kova::DiskMapping& group, const KnownDi
                     "'; bring that disk back, or remove it from the group first");
 }
 
-bool IsCalled(const HostCtl::Kova::DiskResult& record, const std::string& name) {
+bool IsCalled(const DiskRecord& record, const std::string& name) {
   return record.name.empty() && AbsentName(record.kovaUuid) == name;
 }
 
-bool IsInGroup(const HostCtl::Kova::DiskResult& record) {
+bool IsInGroup(const DiskRecord& record) {
   return record.state == HostCtl::Kova::DiskState::InUse ||
          record.reason == HostCtl::Kova::DiskReason::GroupNotMounted;
 }
@@ -83,12 +85,12 @@ bool IsCalled(const HostCtl::Kova::DiskName& disk, const std::string& name) {
 
 // How many absent disks are called that. Groups may hold disks that are not among the records, so whichever
 // way finds more of them counts.
-std::ptrdiff_t CountCalled(const std::string& name, const std::vector<HostCtl::Kova::DiskResult>& records,
-                           const std::vector<HostCtl::Kova::DiskMapping>& groups) {
+std::ptrdiff_t CountCalled(const std::string& name, const std::vector<DiskRecord>& records,
+                           const std::vector<GroupRecord>& groups) {
   const auto isCalled = [&name](const auto& disk) { return IsCalled(disk, name); };
   const auto isLoose = [&name](const auto& record) { return IsCalled(record, name) && !IsInGroup(record); };
   std::ptrdiff_t ofGroups = std::count_if(records.begin(), records.end(), isLoose);
-  for (const HostCtl::Kova::DiskMapping& group : groups) {
+  for (const GroupRecord& group : groups) {
     ofGroups += isCalled(group.ssd) ? 1 : 0;
     ofGroups += std::count_if(group.capacityDisks.begin(), group.capacityDisks.end(), isCalled);
   }
@@ -113,9 +115,9 @@ void RequireWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl:
     if (unmounted.empty()) {
       return;
     }
-    std::vector<HostCtl::Kova::DiskMapping> groups;
+    std::vector<GroupRecord> groups;
     kernel.GetDiskMappings(groups, true);
-    for (const HostCtl::Kova::DiskMapping& group : groups) {
+    for (const GroupRecord& group : groups) {
       const auto at = unmounted.find(group.ssd.deviceName);
       const std::string missing = at == unmounted.end() ? std::string() : MissingMember(group, known);
       if (!missing.empty()) {
@@ -128,7 +130,7 @@ void RequireWholeGroups(const DiskList& disks, const KnownDisks& known, HostCtl:
 void RequireAnswers(HostCtl::Kova::KovaInfo& kernel) {
   AskOrFail("Nothing is formatted, for the kernel could not be asked about its disks: ", [&] {
     kernel.RefreshKovaInfo();
-    std::vector<HostCtl::Kova::DiskResult> records;
+    std::vector<DiskRecord> records;
     kernel.QueryDisks({}, records, true);
   });
 }
@@ -139,11 +141,9 @@ void RequireGroupIfAbsent(const Nox::Kova::Host::DiskMapping& mapping, HostCtl::
     return;
   }
   AskOrFail("The disk groups of the host could not be found out: ", [&] {
-    std::vector<HostCtl::Kova::DiskMapping> groups;
+    std::vector<GroupRecord> groups;
     kernel.GetDiskMappings(groups, true);
-    const auto isHead = [&name](const HostCtl::Kova::DiskMapping& group) {
-      return IsCalled(group.ssd, name);
-    };
+    const auto isHead = [&name](const GroupRecord& group) { return IsCalled(group.ssd, name); };
     if (std::none_of(groups.begin(), groups.end(), isHead)) {
       Refuse("mapping.ssd", "no disk group of this host has the absent cache disk '" + name + "'");
     }
@@ -155,9 +155,9 @@ void RequireOneIfAbsent(const std::string& place, const std::string& name, HostC
     return;
   }
   AskOrFail("Which disks have left the host could not be found out: ", [&] {
-    std::vector<HostCtl::Kova::DiskResult> records;
+    std::vector<DiskRecord> records;
     kernel.QueryDisks({}, records, true);
-    std::vector<HostCtl::Kova::DiskMapping> groups;
+    std::vector<GroupRecord> groups;
     kernel.GetDiskMappings(groups, true);
     if (CountCalled(name, records, groups) > 1) {
       Refuse(place, "more than one disk that has left this host is called '" + name +

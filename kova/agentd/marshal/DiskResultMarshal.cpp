@@ -24,6 +24,7 @@ using Tessa::Ref;
 using Tessa::Service::Logger;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
+using DiskRecord = HostCtl::Kova::DiskResult;
 
 namespace {
 
@@ -46,7 +47,7 @@ constexpr std::array<ReasonFault, 5> reasonFaults = {{
 }};
 
 // The inventory's disk, or a stand-in; null when there is neither.
-Ref<ScsiDisk> DiskOf(const HostCtl::Kova::DiskResult& record, const DiskInventory& inventory) {
+Ref<ScsiDisk> DiskOf(const DiskRecord& record, const DiskInventory& inventory) {
   Ref<ScsiDisk> disk;
   if (!record.isPdl) {
     GetScsiDiskFromArray(record.name, inventory, disk);
@@ -57,8 +58,7 @@ Ref<ScsiDisk> DiskOf(const HostCtl::Kova::DiskResult& record, const DiskInventor
 }
 
 // A copy of the disk, as results show it.
-Ref<ScsiDisk> CopyForResult(const Ref<ScsiDisk>& disk, const HostCtl::Kova::DiskResult& record,
-                            bool queryMode) {
+Ref<ScsiDisk> CopyForResult(const Ref<ScsiDisk>& disk, const DiskRecord& record, bool queryMode) {
   const Ref<ScsiDisk> copy = Orbis::Clone(disk);
   CleanUnusedDiskFileds(*copy);
   if (record.capacityFlash && !queryMode) {
@@ -99,8 +99,8 @@ void CleanUnusedDiskFileds(ScsiDisk& disk) {
   disk.SetStandardInquiry(nullptr);
 }
 
-void MarshalHostCtlDiskResult(Logger&, const HostCtl::Kova::DiskResult& record,
-                              const DiskInventory& inventory, Ref<DiskResult>& result, bool queryMode) {
+void MarshalHostCtlDiskResult(Logger&, const DiskRecord& record, const DiskInventory& inventory,
+                              Ref<DiskResult>& result, bool queryMode) {
   const Ref<ScsiDisk> disk = DiskOf(record, inventory);
   if (!disk) {
     return;
@@ -124,7 +124,7 @@ void MarshalHostCtlDiskResult(Logger&, const HostCtl::Kova::DiskResult& record,
   result = marshalled;
 }
 
-void MarshalHostCtlDiskResults(Logger& logger, const std::vector<HostCtl::Kova::DiskResult>& records,
+void MarshalHostCtlDiskResults(Logger& logger, const std::vector<DiskRecord>& records,
                                Ref<DataArray<DiskResult>>& results, bool queryMode) {
   const Ref<DataArray<DiskResult>> marshalled = MakeRef<DataArray<DiskResult>>();
   Ref<DataArray<ScsiDisk>> disks;
@@ -136,7 +136,7 @@ void MarshalHostCtlDiskResults(Logger& logger, const std::vector<HostCtl::Kova::
   }
   NameList names(NamesOfRecords(records));
   const DiskInventory inventory(disks, names);
-  for (const HostCtl::Kova::DiskResult& record : records) {
+  for (const DiskRecord& record : records) {
     Ref<DiskResult> result;
     MarshalHostCtlDiskResult(logger, record, inventory, result, queryMode);
     if (result) {
@@ -153,7 +153,7 @@ void MarshalHostCtlDiskResults(Logger& logger, const std::vector<HostCtl::Kova::
 Ref<DataArray<DiskResult>> MarshalCachedDisks(Logger& logger, const DiskCache::Locked& cache,
                                               const std::vector<std::string>& names,
                                               const DiskQueryLimit& limit) {
-  std::vector<HostCtl::Kova::DiskResult> records;
+  std::vector<DiskRecord> records;
   LimitQueryDisksForKova(logger, names, limit, cache.Records(), records);
   Ref<DataArray<DiskResult>> results;
   MarshalHostCtlDiskResults(logger, records, results, false);

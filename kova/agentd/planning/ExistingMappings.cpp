@@ -27,6 +27,7 @@ using Tessa::MakeRef;
 using Tessa::Ref;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
+using GroupRecord = HostCtl::Kova::DiskMapping;
 
 namespace {
 
@@ -37,7 +38,7 @@ std::string RequestNameOf(const DiskName& disk) {
 
 // Whether the kernel's group is the requested one: as many disks, and each of the kernel's among the
 // requested.
-bool IsRequested(const HostCtl::Kova::DiskMapping& group, const std::string& ssd,
+bool IsRequested(const GroupRecord& group, const std::string& ssd,
                  const std::unordered_set<std::string_view>& requested, std::size_t requestedCount) {
   return group.ssd.deviceName == ssd && group.capacityDisks.size() == requestedCount &&
          std::all_of(group.capacityDisks.begin(), group.capacityDisks.end(),
@@ -49,7 +50,7 @@ bool IsUnmountedSsd(const DiskResult& record) {
 }
 
 // The group with the inventory's disks; null where the inventory has none.
-Ref<DiskMapping> FromInventory(const HostCtl::Kova::DiskMapping& group, const DiskInventory& inventory) {
+Ref<DiskMapping> FromInventory(const GroupRecord& group, const DiskInventory& inventory) {
   const auto mapping = MakeRef<DiskMapping>();
   Ref<ScsiDisk> ssd;
   GetScsiDiskFromArray(group.ssd.deviceName, inventory, ssd);
@@ -73,10 +74,10 @@ bool KovaManagerImpl::DiskMappingExists(Ref<DiskMapping> mapping) {
     return false;
   }
   try {
-    std::vector<HostCtl::Kova::DiskMapping> groups;
+    std::vector<GroupRecord> groups;
     _provider->GetDiskMappings(groups, false);
     const std::unordered_set<std::string_view> requested(names.begin(), names.end());
-    return std::any_of(groups.begin(), groups.end(), [&](const HostCtl::Kova::DiskMapping& group) {
+    return std::any_of(groups.begin(), groups.end(), [&](const GroupRecord& group) {
       return IsRequested(group, ssd, requested, names.size());
     });
   } catch (const HostCtl::Lib::HostCtlException& exception) {
@@ -108,13 +109,13 @@ void KovaManagerImpl::ComputeNotMountedDiskMappings(DataArray<ScsiDisk>* candida
   if (notMounted.IsEmpty()) {
     return;
   }
-  const std::vector<HostCtl::Kova::DiskMapping> groups = KernelGroupsOrNone(*_logger, *_provider);
+  const std::vector<GroupRecord> groups = KernelGroupsOrNone(*_logger, *_provider);
   const Ref<DataArray<ScsiDisk>> disks = Util::InventoryOrNone(*_logger);
   if (!disks) {
     return;
   }
   const DiskInventory inventory(disks);
-  for (const HostCtl::Kova::DiskMapping& group : groups) {
+  for (const GroupRecord& group : groups) {
     if (notMounted.Contains(group.ssd.deviceName)) {
       mappings->Append(FromInventory(group, inventory));
     }

@@ -21,6 +21,7 @@ using Nox::Kova::Host::DiskMapping;
 using Orbis::DataArray;
 using Tessa::MakeRef;
 using Tessa::Ref;
+using GroupRecord = HostCtl::Kova::DiskMapping;
 
 namespace {
 
@@ -55,10 +56,10 @@ std::vector<Planning::Candidate> CandidatesOf(const DataArray<ScsiDisk>& disks) 
 }
 
 // The names stay the kernel's groups'.
-std::vector<Planning::HostGroup> HostGroupsOf(const std::vector<HostCtl::Kova::DiskMapping>& kernelGroups) {
+std::vector<Planning::HostGroup> HostGroupsOf(const std::vector<GroupRecord>& kernelGroups) {
   std::vector<Planning::HostGroup> groups;
   groups.reserve(kernelGroups.size());
-  for (const HostCtl::Kova::DiskMapping& group : kernelGroups) {
+  for (const GroupRecord& group : kernelGroups) {
     groups.push_back({.allFlash = group.allFlash,
                       .heldBack = group.thirdFlag,
                       .capacityDisks = group.capacityDisks.size(),
@@ -108,7 +109,7 @@ Ref<DataArray<DiskMapping>> ToMappings(const std::vector<Planning::GroupPlan::Gr
 
 void KovaManagerImpl::ComputeDiskMappings(DataArray<ScsiDisk>* candidates, bool allFlash,
                                           Ref<DataArray<DiskMapping>>& mappings, bool& limitReached) {
-  const std::vector<HostCtl::Kova::DiskMapping> kernelGroups = KernelGroupsOrNone(*_logger, *_provider);
+  const std::vector<GroupRecord> kernelGroups = KernelGroupsOrNone(*_logger, *_provider);
   const auto noDisks = MakeRef<DataArray<ScsiDisk>>();
   const DataArray<ScsiDisk>& disks = candidates != nullptr ? *candidates : *noDisks;
   const std::vector<Planning::Candidate> plannedFrom = CandidatesOf(disks);

@@ -29,6 +29,7 @@ using Tessa::Ref;
 using Tessa::Service::Logger;
 using Tessa::Service::LogInternal;
 using Tessa::Service::LogLevel;
+using GroupRecord = HostCtl::Kova::DiskMapping;
 
 namespace {
 
@@ -53,8 +54,7 @@ Ref<ScsiDisk> DescribeDisk(const DiskName& name, bool ssd, const DiskInventory& 
 }
 
 // The group; null when its cache disk or all its capacity disks are unknown to the inventory.
-Ref<DiskMapping> DescribeGroup(Logger& logger, const HostCtl::Kova::DiskMapping& group,
-                               const DiskInventory& inventory) {
+Ref<DiskMapping> DescribeGroup(Logger& logger, const GroupRecord& group, const DiskInventory& inventory) {
   const Ref<ScsiDisk> ssd = DescribeDisk(group.ssd, true, inventory);
   if (!ssd) {
     return nullptr;
@@ -91,10 +91,9 @@ bool IsMounted(Logger& logger, HostCtl::Kova::KovaInfo& provider, const std::str
 
 // The kernel's mounted groups, and whether it claims disks on its own; a failing kernel is a warning and no
 // groups.
-std::vector<HostCtl::Kova::DiskMapping> ReadStorage(KovaManagerImpl& manager, Logger& logger,
-                                                    HostCtl::Kova::KovaInfo& provider,
-                                                    std::optional<bool>& autoClaim) {
-  std::vector<HostCtl::Kova::DiskMapping> groups;
+std::vector<GroupRecord> ReadStorage(KovaManagerImpl& manager, Logger& logger,
+                                     HostCtl::Kova::KovaInfo& provider, std::optional<bool>& autoClaim) {
+  std::vector<GroupRecord> groups;
   try {
     provider.RefreshKovaInfo();
     autoClaim = provider.IsAutoModeEnabled();
@@ -113,12 +112,12 @@ void KovaManagerImpl::GetStorageInfo(std::string& resultText) {
   const auto mappings = MakeRef<DataArray<DiskMapping>>();
   const auto mapInfos = MakeRef<DataArray<DiskMapInfo>>();
   std::optional<bool> autoClaim;
-  const std::vector<HostCtl::Kova::DiskMapping> groups = ReadStorage(*this, *_logger, *_provider, autoClaim);
+  const std::vector<GroupRecord> groups = ReadStorage(*this, *_logger, *_provider, autoClaim);
   info->SetAutoClaim(autoClaim);
   const Ref<DataArray<ScsiDisk>> disks = groups.empty() ? nullptr : Util::InventoryOrNone(*_logger);
   if (disks) {
     const DiskInventory inventory(disks);
-    for (const HostCtl::Kova::DiskMapping& group : groups) {
+    for (const GroupRecord& group : groups) {
       const Ref<DiskMapping> mapping = DescribeGroup(*_logger, group, inventory);
       if (!mapping) {
         continue;

@@ -116,7 +116,7 @@ TEST(UnmountedGroups, ShowTheInventorysDisksWithTheirKovaUuid) {
   const StorageInfo info = InfoAbout(FourDisks().WithUnmountedGroup("naa.1", {"naa.2"}));
   const auto ssd = (*info.GetDiskMapInfo())[0]->GetMapping()->GetSsd();
   EXPECT_TRUE(ssd->GetSsd());
-  EXPECT_EQ(ssd->GetCapacity()->GetBlock(), HostBuilder::kDiskBytes / 512);
+  EXPECT_EQ(ssd->GetCapacity()->GetBlock(), HostBuilder::diskBytes / 512);
   EXPECT_EQ(ssd->GetKovaDiskInfo()->GetKovaUuid(), "uuid-of-naa.1");
 }
 

@@ -79,7 +79,7 @@ void AddSet(CLI::App& sim, CommandLine& line) {
 void AddFault(CLI::App& sim, CommandLine& line) {
   const auto fault = std::make_shared<Json>();
   auto* const command = sim.add_subcommand("fault", "Let calls of the kernel provider fail or wait");
-  const auto& names = OtxCtl::Provider::kOperationNames;
+  const auto& names = OtxCtl::Provider::operationNames;
   AddValue<std::string>(*command, fault, "OPERATION", "/operation", "Operation of the provider")
       ->required()
       ->check(CLI::IsMember(std::vector<std::string>(names.begin(), names.end())));

@@ -5,7 +5,7 @@ namespace Orbis::Xml {
 namespace {
 
 // Room for the longest delimiters round a comment, a declaration or a reference.
-constexpr std::size_t kDelimiterBytes = 16;
+constexpr std::size_t delimiterBytes = 16;
 
 bool IsTag(std::string_view token) {
   return token.size() > 1 && token[0] == '<' && token[1] != '!' && token[1] != '?';
@@ -31,8 +31,8 @@ std::string_view PendingToken::Examine(std::string_view text, std::size_t start)
   if (IsTag(token)) {
     return ExamineTag(text);
   }
-  if (IsOtherMarkup(token) && token.size() > kDelimiterBytes &&
-      token.size() - kDelimiterBytes > _limits.textBytes) {
+  if (IsOtherMarkup(token) && token.size() > delimiterBytes &&
+      token.size() - delimiterBytes > _limits.textBytes) {
     return "a comment, declaration or reference is too long";
   }
   return {};

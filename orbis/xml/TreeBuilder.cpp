@@ -11,9 +11,9 @@ namespace Orbis::Xml {
 
 namespace {
 
-constexpr std::string_view kXmlNamespace = "http://www.w3.org/XML/1998/namespace";
+constexpr std::string_view xmlNamespace = "http://www.w3.org/XML/1998/namespace";
 // The actor that everybody is who gets a message.
-constexpr std::string_view kNextActor = "http://schemas.xmlsoap.org/soap/actor/next";
+constexpr std::string_view nextActor = "http://schemas.xmlsoap.org/soap/actor/next";
 
 bool IsBlankCharacter(char c) {
   return c == ' ' || c == '\n' || c == '\t' || c == '\r';
@@ -107,7 +107,7 @@ void NamespaceScope::BackTo(Mark mark) noexcept {
 
 std::optional<std::string_view> NamespaceScope::Find(std::string_view prefix) const {
   if (prefix == "xml") {
-    return kXmlNamespace;
+    return xmlNamespace;
   }
   if (const auto entry = _uris.find(prefix); entry != _uris.end() && entry->second) {
     return entry->second;
@@ -202,7 +202,7 @@ void TreeBuilder::AddAttribute(const Name& name, std::string_view value) {
   } else if (name.nameSpace == envelopeNamespace && name.local == "mustUnderstand") {
     element.mustUnderstand = value == "1" || value == "true";
   } else if (name.nameSpace == envelopeNamespace && name.local == "actor") {
-    element.forAnother = !value.empty() && value != kNextActor;
+    element.forAnother = !value.empty() && value != nextActor;
   }
 }
 

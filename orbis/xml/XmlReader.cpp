@@ -15,14 +15,14 @@ namespace Orbis::Xml {
 namespace {
 
 // Cannot stand in a name, and a namespace that holds one is refused.
-constexpr char kSeparator = '\n';
+constexpr char nameSeparator = '\n';
 
-constexpr std::size_t kChunkBytes = 64u << 10;
-constexpr std::size_t kLargestChunkBytes = 256u << 20;
+constexpr std::size_t chunkBytes = 64u << 10;
+constexpr std::size_t largestChunkBytes = 256u << 20;
 
-constexpr std::size_t kSmallestArenaBytes = 1u << 10;
-constexpr std::size_t kLargestFirstArenaBytes = 1u << 20;
-constexpr std::size_t kTreeBytesPerTextByte = 4;
+constexpr std::size_t smallestArenaBytes = 1u << 10;
+constexpr std::size_t largestFirstArenaBytes = 1u << 20;
+constexpr std::size_t treeBytesPerTextByte = 4;
 
 struct FreeParser {
   void operator()(XML_Parser parser) const noexcept { XML_ParserFree(parser); }
@@ -35,7 +35,7 @@ std::string_view OrEmpty(const XML_Char* text) {
 
 Name NameFrom(const XML_Char* qualified) {
   const std::string_view text(qualified);
-  const std::size_t separator = text.find(kSeparator);
+  const std::size_t separator = text.find(nameSeparator);
   if (separator == std::string_view::npos) {
     return {{}, text};
   }
@@ -43,8 +43,8 @@ Name NameFrom(const XML_Char* qualified) {
 }
 
 bool IsUtf8(std::string_view encoding) {
-  constexpr std::string_view kName = "utf-8";
-  return std::equal(encoding.begin(), encoding.end(), kName.begin(), kName.end(), [](char c, char lower) {
+  constexpr std::string_view utf8 = "utf-8";
+  return std::equal(encoding.begin(), encoding.end(), utf8.begin(), utf8.end(), [](char c, char lower) {
     return c == lower || (c >= 'A' && c <= 'Z' && c + 32 == lower);
   });
 }
@@ -99,7 +99,7 @@ void Parse::Run() {
   do {
     // Each attempt at an unfinished token starts at its beginning. A chunk as long as what is pending
     // doubles the token each time, so that all attempts together stay linear.
-    const std::size_t chunk = std::clamp(fed - tokenStart, kChunkBytes, kLargestChunkBytes);
+    const std::size_t chunk = std::clamp(fed - tokenStart, chunkBytes, largestChunkBytes);
     const std::size_t end = fed + std::min(chunk, _text.size() - fed);
     Feed(fed, end);
     fed = end;
@@ -132,7 +132,7 @@ void Parse::CheckBytes() const {
 }
 
 void Parse::OpenParser() {
-  _parser.reset(XML_ParserCreateNS("UTF-8", kSeparator));
+  _parser.reset(XML_ParserCreateNS("UTF-8", nameSeparator));
   if (!_parser) {
     throw std::bad_alloc();
   }
@@ -250,8 +250,8 @@ void Parse::OnCdataEnd(void* self) {
 }
 
 std::size_t FirstArenaBytes(std::size_t textBytes) {
-  return std::clamp(std::min(textBytes, kLargestFirstArenaBytes) * kTreeBytesPerTextByte, kSmallestArenaBytes,
-                    kLargestFirstArenaBytes);
+  return std::clamp(std::min(textBytes, largestFirstArenaBytes) * treeBytesPerTextByte, smallestArenaBytes,
+                    largestFirstArenaBytes);
 }
 
 }  // namespace

@@ -20,7 +20,7 @@ using ::testing::HasSubstr;
 using ::testing::StartsWith;
 using ::testing::ThrowsMessage;
 
-constexpr Limits kUntrusted = Limits::Untrusted();
+constexpr Limits untrusted = Limits::Untrusted();
 
 // Bounds so large that only the one under test can be met.
 Limits Roomy() {
@@ -41,19 +41,19 @@ std::string Repeat(std::string_view piece, std::size_t times) {
   return text;
 }
 
-Document Read(std::string_view text, const Limits& limits = kUntrusted,
+Document Read(std::string_view text, const Limits& limits = untrusted,
               Attributes attributes = Attributes::Refuse) {
   return Document(text, limits, attributes);
 }
 
-void ExpectRefused(std::string_view text, std::string_view reason, const Limits& limits = kUntrusted,
+void ExpectRefused(std::string_view text, std::string_view reason, const Limits& limits = untrusted,
                    Attributes attributes = Attributes::Refuse) {
   EXPECT_THAT([&] { Read(text, limits, attributes); },
               ThrowsMessage<ParseException>(HasSubstr(std::string(reason))))
       << text.substr(0, 200);
 }
 
-void ExpectAccepted(std::string_view text, const Limits& limits = kUntrusted,
+void ExpectAccepted(std::string_view text, const Limits& limits = untrusted,
                     Attributes attributes = Attributes::Refuse) {
   EXPECT_NO_THROW(Read(text, limits, attributes)) << text.substr(0, 200);
 }
@@ -62,15 +62,15 @@ std::string TextOf(std::string_view text) {
   return std::string(Read(text).Root().text);
 }
 
-constexpr std::string_view kXsi = "xmlns:xsi='http://www.w3.org/2001/XMLSchema-instance'";
+constexpr std::string_view xsiBinding = "xmlns:xsi='http://www.w3.org/2001/XMLSchema-instance'";
 
 std::string WithXsi(std::string_view attributes, std::string_view content = "") {
-  return "<a xmlns='urn:d' xmlns:p='urn:p' " + std::string(kXsi) + ' ' + std::string(attributes) + '>' +
+  return "<a xmlns='urn:d' xmlns:p='urn:p' " + std::string(xsiBinding) + ' ' + std::string(attributes) + '>' +
          std::string(content) + "</a>";
 }
 
 // A document that uses every construct the reader accepts.
-constexpr std::string_view kEverything =
+constexpr std::string_view everything =
     "\xEF\xBB\xBF<?xml version=\"1.0\" encoding=\"UTF-8\" standalone='yes'?>\n"
     "<!-- before -->\n"
     "<object xmlns='urn:nox' xmlns:i=\"http://www.w3.org/2001/XMLSchema-instance\" i:type='Thing'>\n"
@@ -106,7 +106,7 @@ TEST(XmlReader, KeepsNamesTextsAndOrderOfElements) {
 }
 
 TEST(XmlReader, AcceptsEveryConstructOfAnHonestDocument) {
-  const Document document = Read(kEverything);
+  const Document document = Read(everything);
   const Element& name = *document.Root().firstChild;
   EXPECT_EQ(name.text, "a&b << \xC3\xA9\xE2\x82\xAC\xF0\x9F\x98\x80");
   const Element& value = *name.nextSibling;
@@ -291,23 +291,23 @@ TEST(XmlReader, RefusesWhatIsNotWellFormed) {
       "<a><?xml version='1.0'?></a>",
   };
   for (const std::string& text : texts) {
-    EXPECT_THROW(Read(text, kUntrusted, Attributes::RefuseOnData), ParseException) << text;
+    EXPECT_THROW(Read(text, untrusted, Attributes::RefuseOnData), ParseException) << text;
   }
 }
 
 TEST(XmlReader, RefusesADocumentCutOffAtAnyOffset) {
-  const std::size_t end = kEverything.find("</object>") + std::string_view("</object>").size();
+  const std::size_t end = everything.find("</object>") + std::string_view("</object>").size();
   for (std::size_t size = 0; size < end; ++size) {
-    EXPECT_THROW(Read(kEverything.substr(0, size)), ParseException) << "cut to " << size << " bytes";
+    EXPECT_THROW(Read(everything.substr(0, size)), ParseException) << "cut to " << size << " bytes";
   }
-  ExpectAccepted(kEverything.substr(0, end));
+  ExpectAccepted(everything.substr(0, end));
 }
 
 TEST(XmlReader, SurvivesAnyDamageToAByte) {
   const TestSupport::Seed seed;
   std::mt19937 random(seed.Value());
   for (int round = 0; round < 20'000; ++round) {
-    std::string text(kEverything);
+    std::string text(everything);
     for (std::uint32_t changes = 1 + random() % 3; changes > 0; --changes) {
       text[random() % text.size()] = static_cast<char>(random() % 256);
     }
@@ -346,7 +346,7 @@ TEST(XmlReader, RefusesReferencesToWhatIsNoCharacter) {
   for (const char* reference : {"&#0;", "&#x0;", "&#x1;", "&#xD800;", "&#xDFFF;", "&#xFFFE;", "&#xFFFF;",
                                 "&#x110000;", "&#99999999999;", "&#;", "&#x;", "&#-1;"}) {
     EXPECT_THROW(Read("<a>" + std::string(reference) + "</a>"), ParseException) << reference;
-    EXPECT_THROW(Read("<a b='" + std::string(reference) + "'/>", kUntrusted, Attributes::RefuseOnData),
+    EXPECT_THROW(Read("<a b='" + std::string(reference) + "'/>", untrusted, Attributes::RefuseOnData),
                  ParseException)
         << reference;
   }
@@ -380,7 +380,7 @@ TEST(XmlReader, RefusesBrokenUtf8WhereverItStands) {
          {"<a>" + bytes + "</a>", "<a>" + bytes + " x</a>", "<a><![CDATA[" + bytes + "]]></a>",
           "<a><!--" + bytes + "--></a>", "<a b='" + bytes + "'/>", "<a xmlns='" + bytes + "'/>",
           "<a" + bytes + "/>", "<a/><!--" + bytes + "-->", "<a/>" + bytes, bytes + "<a/>"}) {
-      EXPECT_THROW(Read(text, kUntrusted, Attributes::RefuseOnData), ParseException)
+      EXPECT_THROW(Read(text, untrusted, Attributes::RefuseOnData), ParseException)
           << testing::PrintToString(text);
     }
   }
@@ -480,17 +480,17 @@ TEST(XmlReader, BoundsTextsAsTheyAddUp) {
 }
 
 TEST(XmlReader, MeetsTheExactBoundsOfUntrustedTexts) {
-  const std::size_t text = kUntrusted.textBytes;
+  const std::size_t text = untrusted.textBytes;
   ExpectAccepted("<a>" + std::string(text, 'x') + "</a>");
   ExpectRefused("<a>" + std::string(text + 1, 'x') + "</a>", "the text is longer");
-  ExpectAccepted("<a b='" + std::string(text, 'x') + "'/>", kUntrusted, Attributes::RefuseOnData);
-  ExpectRefused("<a b='" + std::string(text + 1, 'x') + "'/>", "is longer", kUntrusted,
+  ExpectAccepted("<a b='" + std::string(text, 'x') + "'/>", untrusted, Attributes::RefuseOnData);
+  ExpectRefused("<a b='" + std::string(text + 1, 'x') + "'/>", "is longer", untrusted,
                 Attributes::RefuseOnData);
-  ExpectAccepted("<a>" + Repeat("<i/>", kUntrusted.elements - 1) + "</a>");
-  ExpectRefused("<a>" + Repeat("<i/>", kUntrusted.elements) + "</a>", "elements");
+  ExpectAccepted("<a>" + Repeat("<i/>", untrusted.elements - 1) + "</a>");
+  ExpectRefused("<a>" + Repeat("<i/>", untrusted.elements) + "</a>", "elements");
   const std::string unclosed = "<a>" + Repeat("<i></i>", 10);
-  ExpectAccepted(unclosed + std::string(kUntrusted.documentBytes - unclosed.size() - 4, ' ') + "</a>");
-  ExpectRefused(unclosed + std::string(kUntrusted.documentBytes - unclosed.size() - 3, ' ') + "</a>",
+  ExpectAccepted(unclosed + std::string(untrusted.documentBytes - unclosed.size() - 4, ' ') + "</a>");
+  ExpectRefused(unclosed + std::string(untrusted.documentBytes - unclosed.size() - 3, ' ') + "</a>",
                 "the document is longer");
 }
 
@@ -520,17 +520,17 @@ TEST(XmlReader, RefusesGiantsWithoutReadingThemToTheEnd) {
   const auto refused = [&](const std::string& text, std::string_view reason) {
     ExpectRefused(text, reason, limits, Attributes::RefuseOnData);
   };
-  constexpr std::size_t kFifty = 50u << 20;
-  refused("<a b='" + std::string(kFifty, 'x'), "the value of an attribute is too long");
-  refused("<a b=\"" + Repeat("&amp;", kFifty / 5), "the value of an attribute is too long");
-  refused("<a b='>' c='" + std::string(kFifty, 'x'), "the value of an attribute is too long");
+  constexpr std::size_t fifty = 50u << 20;
+  refused("<a b='" + std::string(fifty, 'x'), "the value of an attribute is too long");
+  refused("<a b=\"" + Repeat("&amp;", fifty / 5), "the value of an attribute is too long");
+  refused("<a b='>' c='" + std::string(fifty, 'x'), "the value of an attribute is too long");
   refused("<" + std::string(5u << 20, 'n'), "a name is too long");
   refused("<a></" + std::string(5u << 20, 'n'), "a name is too long");
   refused("<a " + std::string(5u << 20, 'n'), "a name is too long");
-  refused("<a>" + std::string(kFifty, 'x'), "the text is longer");
-  refused("<a><![CDATA[" + std::string(kFifty, 'x'), "the text is longer");
-  refused("<a><!--" + std::string(kFifty, 'x'), "a comment, declaration or reference is too long");
-  refused("<a>&" + std::string(kFifty, 'x'), "a comment, declaration or reference is too long");
+  refused("<a>" + std::string(fifty, 'x'), "the text is longer");
+  refused("<a><![CDATA[" + std::string(fifty, 'x'), "the text is longer");
+  refused("<a><!--" + std::string(fifty, 'x'), "a comment, declaration or reference is too long");
+  refused("<a>&" + std::string(fifty, 'x'), "a comment, declaration or reference is too long");
   refused(Repeat("<a>", 200'000), "nested deeper than 64");
   std::string many = "<a";
   std::string declarations = "<a";
@@ -543,14 +543,14 @@ TEST(XmlReader, RefusesGiantsWithoutReadingThemToTheEnd) {
 }
 
 TEST(XmlReader, ReadsDeepDocumentsWithoutRecursion) {
-  constexpr std::size_t kDepth = 200'000;
-  const Document document = Read(Repeat("<a>", kDepth) + Repeat("</a>", kDepth), Roomy());
+  constexpr std::size_t levels = 200'000;
+  const Document document = Read(Repeat("<a>", levels) + Repeat("</a>", levels), Roomy());
   std::size_t depth = 0;
   for (const Element* at = &document.Root(); at != nullptr; at = at->firstChild) {
     ++depth;
   }
-  EXPECT_EQ(depth, kDepth);
-  ExpectRefused(Repeat("<a>", kDepth), "no element found", Roomy());
+  EXPECT_EQ(depth, levels);
+  ExpectRefused(Repeat("<a>", levels), "no element found", Roomy());
 }
 
 TEST(XmlReader, GiantTokensWithinTheBoundsCostNoMoreThanTheirSize) {
@@ -582,7 +582,7 @@ TEST(XmlReader, ResolvesTypesByNamespaceNotByPrefix) {
 }
 
 TEST(XmlReader, TypesWithoutAnyDefaultNamespaceAreInNone) {
-  const Document document = Read("<a " + std::string(kXsi) + " xsi:type='T'/>");
+  const Document document = Read("<a " + std::string(xsiBinding) + " xsi:type='T'/>");
   EXPECT_EQ(document.Root().type.nameSpace, "");
   EXPECT_EQ(document.Root().type.name, "T");
 }
@@ -602,7 +602,7 @@ TEST(XmlReader, RefusesTypesThatAreNoQualifiedName) {
 TEST(XmlReader, AReboundXsiPrefixIsNoXsi) {
   ExpectRefused("<a xmlns:xsi='urn:other' xsi:type='T'/>", "attribute \"type\" is not known here");
   EXPECT_EQ(
-      Read("<a xmlns:xsi='urn:other' xsi:type='T'/>", kUntrusted, Attributes::RefuseOnData).Root().type.name,
+      Read("<a xmlns:xsi='urn:other' xsi:type='T'/>", untrusted, Attributes::RefuseOnData).Root().type.name,
       "");
 }
 
@@ -630,7 +630,7 @@ TEST(XmlReader, RefusesOrIgnoresEveryOtherAttributeAsTold) {
                                 "xsi:noNamespaceSchemaLocation='x.xsd'", "xsi:other='1'"}) {
     const std::string text = WithXsi(attribute);
     ExpectRefused(text, "is not known here");
-    EXPECT_EQ(Read(text, kUntrusted, Attributes::RefuseOnData).Root().type.name, "");
+    EXPECT_EQ(Read(text, untrusted, Attributes::RefuseOnData).Root().type.name, "");
   }
 }
 

@@ -35,8 +35,8 @@ constexpr Escapes AttributeEscapes() {
   return escapes;
 }
 
-constexpr Escapes kTextEscapes = TextEscapes();
-constexpr Escapes kAttributeEscapes = AttributeEscapes();
+constexpr Escapes textEscapes = TextEscapes();
+constexpr Escapes attributeEscapes = AttributeEscapes();
 
 void Append(std::string& out, std::string_view text, const Escapes& escapes) {
   std::size_t copied = 0;  // everything before is in `out`
@@ -66,11 +66,11 @@ void Append(std::string& out, std::string_view text, const Escapes& escapes) {
 }  // namespace
 
 void AppendText(std::string& out, std::string_view text) {
-  Append(out, text, kTextEscapes);
+  Append(out, text, textEscapes);
 }
 
 void AppendAttributeValue(std::string& out, std::string_view text) {
-  Append(out, text, kAttributeEscapes);
+  Append(out, text, attributeEscapes);
 }
 
 }  // namespace Orbis::Xml

@@ -19,7 +19,7 @@
 namespace Orbis::Xml {
 namespace {
 
-const std::string kReplaced = "\xEF\xBF\xBD";
+const std::string replaced = "\xEF\xBF\xBD";
 
 std::string Text(std::string_view text) {
   std::string out;
@@ -65,7 +65,7 @@ struct CodePointRange {
   std::uint32_t last;
 };
 
-constexpr CodePointRange kCodePointsOfSize[] = {
+constexpr CodePointRange codePointsOfSize[] = {
     {1, 0}, {0, 0x7F}, {0x80, 0x7FF}, {0x800, 0xFFFF}, {0x10000, 0x10FFFF}};
 
 std::size_t SizeSaidBy(unsigned char lead) {
@@ -87,8 +87,8 @@ std::optional<Piece> BeginningOfACharacter(std::string_view bytes) {
     low = (low << 6) | (byte & 0x3Fu);
     high = (high << 6) | (i < bytes.size() ? byte & 0x3Fu : 0x3Fu);
   }
-  low = std::max(low, kCodePointsOfSize[size].first);
-  high = std::min(high, kCodePointsOfSize[size].last);
+  low = std::max(low, codePointsOfSize[size].first);
+  high = std::min(high, codePointsOfSize[size].last);
   const bool onlySurrogates = low >= 0xD800 && high <= 0xDFFF;
   if (low > high || onlySurrogates) {
     return std::nullopt;
@@ -114,7 +114,7 @@ std::string Cleaned(std::string_view text) {
   while (!text.empty()) {
     const Piece piece = NextPiece(text);
     clean +=
-        piece.whole && IsXmlCharacter(piece.character) ? std::string(text.substr(0, piece.size)) : kReplaced;
+        piece.whole && IsXmlCharacter(piece.character) ? std::string(text.substr(0, piece.size)) : replaced;
     text.remove_prefix(piece.size);
   }
   return clean;
@@ -179,7 +179,7 @@ TEST(XmlWriter, ReplacesWhatXmlCannotHold) {
   for (const Replacement& replacement : replacements) {
     std::string expected = "x";
     for (std::size_t i = 0; i < replacement.count; ++i) {
-      expected += kReplaced;
+      expected += replaced;
     }
     expected += "y";
     const std::string text = "x" + replacement.text + "y";
@@ -211,10 +211,11 @@ TEST(XmlWriter, EveryCodePointComesBack) {
 
 // Bytes that make broken and whole characters, markup and line ends likely beside each other.
 std::string AnyText(std::mt19937& random) {
-  constexpr std::string_view kLikely = "\xC2\xE0\xED\xEF\xF0\xF4\x80\x90\x9F\xA0\xBE\xBF<>&'\"]\r\n\t a;#";
+  constexpr std::string_view likelyBytes =
+      "\xC2\xE0\xED\xEF\xF0\xF4\x80\x90\x9F\xA0\xBE\xBF<>&'\"]\r\n\t a;#";
   std::string text(random() % 40, '\0');
   for (char& c : text) {
-    c = random() % 4 == 0 ? static_cast<char>(random() % 256) : kLikely[random() % kLikely.size()];
+    c = random() % 4 == 0 ? static_cast<char>(random() % 256) : likelyBytes[random() % likelyBytes.size()];
   }
   return text;
 }

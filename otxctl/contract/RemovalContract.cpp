@@ -17,7 +17,7 @@ using Sim::HostDescription;
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-const RemovalOptions kOptions = {"option", 1, 2};
+const RemovalOptions removalOptions = {"option", 1, 2};
 
 HostBuilder ThreeDisks() {
   return AHost().WithSsd("naa.1").WithHdds({"naa.2", "naa.3"});
@@ -26,7 +26,7 @@ HostBuilder ThreeDisks() {
 TEST_P(ProviderContract, ARemovedCapacityDiskLeavesItsGroupAndIsFreeAgain) {
   Start(ThreeDisks());
   Format("naa.1", {"naa.2", "naa.3"});
-  Provider().RemoveDisk("naa.2", "pass", kOptions);
+  Provider().RemoveDisk("naa.2", "pass", removalOptions);
   ASSERT_EQ(Groups().size(), 1U);
   EXPECT_THAT(NamesOf(Groups()[0]), ElementsAre("naa.1", "naa.3"));
   EXPECT_EQ(RecordOf("naa.2").state, DiskState::Eligible);
@@ -37,7 +37,7 @@ TEST_P(ProviderContract, ARemovedCapacityDiskLeavesItsGroupAndIsFreeAgain) {
 TEST_P(ProviderContract, ARemovedDiskCanBeUsedAgain) {
   Start(ThreeDisks());
   Format("naa.1", {"naa.2", "naa.3"});
-  Provider().RemoveDisk("naa.2", "", kOptions);
+  Provider().RemoveDisk("naa.2", "", removalOptions);
   Format("naa.1", {"naa.2"});
   EXPECT_THAT(NamesOf(Groups().at(0)), ElementsAre("naa.1", "naa.3", "naa.2"));
 }
@@ -45,7 +45,7 @@ TEST_P(ProviderContract, ARemovedDiskCanBeUsedAgain) {
 TEST_P(ProviderContract, RemovingTheCacheDiskRemovesItsGroup) {
   Start(ThreeDisks());
   Format("naa.1", {"naa.2", "naa.3"});
-  Provider().RemoveDisk("naa.1", "", kOptions);
+  Provider().RemoveDisk("naa.1", "", removalOptions);
   EXPECT_THAT(Groups(), IsEmpty());
   for (const std::string name : {"naa.1", "naa.2", "naa.3"}) {
     EXPECT_EQ(RecordOf(name).state, DiskState::Eligible) << name;
@@ -58,7 +58,7 @@ TEST_P(ProviderContract, RemovingAMappingRemovesTheGroupAndLeavesTheOthersInOrde
   Format("naa.1", {"naa.4"});
   Format("naa.2", {"naa.5"});
   Format("naa.3", {"naa.6"});
-  Provider().RemoveDiskMapping("naa.2", "", kOptions);
+  Provider().RemoveDiskMapping("naa.2", "", removalOptions);
   ASSERT_EQ(Groups().size(), 2U);
   EXPECT_THAT(NamesOf(Groups()[0]), ElementsAre("naa.1", "naa.4"));
   EXPECT_THAT(NamesOf(Groups()[1]), ElementsAre("naa.3", "naa.6"));
@@ -70,7 +70,7 @@ TEST_P(ProviderContract, TheLastCapacityDiskCannotBeRemovedAlone) {
   Start(ThreeDisks());
   Format("naa.1", {"naa.2"});
   const auto refusal =
-      Refused<KovaExceptionLastRemainingHDD>([&] { Provider().RemoveDisk("naa.2", "", kOptions); });
+      Refused<KovaExceptionLastRemainingHDD>([&] { Provider().RemoveDisk("naa.2", "", removalOptions); });
   EXPECT_EQ(refusal.GetDiskName(), "naa.2");
 }
 
@@ -79,7 +79,8 @@ TEST_P(ProviderContract, OnlyDisksOfGroupsCanBeRemoved) {
   Format("naa.1", {"naa.2"});
   for (const std::string name : {"naa.3", "naa.nowhere", ""}) {
     SCOPED_TRACE(name);
-    const auto refusal = Refused<KovaStorageException>([&] { Provider().RemoveDisk(name, "", kOptions); });
+    const auto refusal =
+        Refused<KovaStorageException>([&] { Provider().RemoveDisk(name, "", removalOptions); });
     EXPECT_EQ(refusal.GetDiskName(), name);
   }
 }
@@ -101,7 +102,7 @@ TEST_P(ProviderContract, AnAbsentDiskIsNotRemovedByItsOldName) {
     GTEST_SKIP() << "disks of this host cannot leave";
   }
   Start(ThreeDisks().WithGroup("naa.1", {"naa.2", "naa.3"}).Without("naa.2"));
-  Refused<KovaStorageException>([&] { Provider().RemoveDisk("naa.2", "", kOptions); });
+  Refused<KovaStorageException>([&] { Provider().RemoveDisk("naa.2", "", removalOptions); });
 }
 
 TEST_P(ProviderContract, OnlyTheCacheDiskOfAGroupNamesAMappingToRemove) {
@@ -110,7 +111,7 @@ TEST_P(ProviderContract, OnlyTheCacheDiskOfAGroupNamesAMappingToRemove) {
   for (const std::string name : {"naa.2", "naa.3", "naa.nowhere", ""}) {
     SCOPED_TRACE(name);
     const auto refusal =
-        Refused<KovaStorageException>([&] { Provider().RemoveDiskMapping(name, "", kOptions); });
+        Refused<KovaStorageException>([&] { Provider().RemoveDiskMapping(name, "", removalOptions); });
     EXPECT_EQ(refusal.GetDiskName(), name);
   }
 }
@@ -121,8 +122,8 @@ TEST_P(ProviderContract, RemovalWorksOnUnmountedGroupsToo) {
   Format("naa.2", {"naa.5"});
   Provider().UnmountDiskMapping("naa.1");
   Provider().UnmountDiskMapping("naa.2");
-  Provider().RemoveDisk("naa.3", "", kOptions);
-  Provider().RemoveDiskMapping("naa.2", "", kOptions);
+  Provider().RemoveDisk("naa.3", "", removalOptions);
+  Provider().RemoveDiskMapping("naa.2", "", removalOptions);
   ASSERT_EQ(Groups().size(), 1U);
   EXPECT_THAT(NamesOf(Groups()[0]), ElementsAre("naa.1", "naa.4"));
   EXPECT_THAT(Groups(false), IsEmpty());
@@ -138,11 +139,11 @@ TEST_P(ProviderContract, NothingIsRemovedWhileDisksAreClaimedAutomatically) {
   EXPECT_TRUE(Provider().IsAutoModeEnabled());
   for (const std::string name : {"naa.2", "naa.1", "naa.nowhere"}) {
     SCOPED_TRACE(name);
-    const auto disk =
-        Refused<KovaExceptionRemoveDiskAutoModeEnabled>([&] { Provider().RemoveDisk(name, "", kOptions); });
+    const auto disk = Refused<KovaExceptionRemoveDiskAutoModeEnabled>(
+        [&] { Provider().RemoveDisk(name, "", removalOptions); });
     EXPECT_EQ(disk.GetDiskName(), name);
     const auto mapping = Refused<KovaExceptionRemoveMappingAutoModeEnabled>(
-        [&] { Provider().RemoveDiskMapping(name, "", kOptions); });
+        [&] { Provider().RemoveDiskMapping(name, "", removalOptions); });
     EXPECT_EQ(mapping.GetDiskName(), name);
   }
 }

@@ -51,7 +51,7 @@ TEST_P(ProviderContract, StrangeNamesAreRefusedByTheOneFamilyOfExceptions) {
 }
 
 // Four makers, each with cache and capacity disks of its own.
-constexpr int kMakers = 4;
+constexpr int makerCount = 4;
 
 std::string SsdOf(int maker) {
   return "naa.ssd" + std::to_string(maker);
@@ -87,7 +87,7 @@ bool NoDiskStandsInTwoGroups(KovaInfo& provider) {
 
 TEST_P(ProviderContract, ConcurrentCallsDoNotDisturbEachOther) {
   HostBuilder host = AHost();
-  for (int maker = 0; maker < kMakers; ++maker) {
+  for (int maker = 0; maker < makerCount; ++maker) {
     host.WithSsd(SsdOf(maker)).WithHdds({HddOf(maker, 0), HddOf(maker, 1)});
   }
   Start(host);
@@ -98,12 +98,12 @@ TEST_P(ProviderContract, ConcurrentCallsDoNotDisturbEachOther) {
     while (!isDone) {
       std::vector<HostCtl::Kova::DiskResult> records;
       provider->QueryDisks({}, records, true);
-      strange += records.size() == kMakers * 3 && NoDiskStandsInTwoGroups(*provider) ? 0 : 1;
+      strange += records.size() == makerCount * 3 && NoDiskStandsInTwoGroups(*provider) ? 0 : 1;
       provider->RefreshKovaInfo();
     }
   });
   std::vector<std::thread> makers;
-  for (int maker = 0; maker < kMakers; ++maker) {
+  for (int maker = 0; maker < makerCount; ++maker) {
     makers.emplace_back([&, maker] {
       try {
         MakeAndBreak(Provider(), maker);
@@ -125,15 +125,15 @@ TEST_P(ProviderContract, ConcurrentCallsDoNotDisturbEachOther) {
 }
 
 TEST_P(ProviderContract, OfManyWhoWantTheSameDiskOneGetsIt) {
-  constexpr int kRivals = 4;
+  constexpr int rivalCount = 4;
   HostBuilder host = AHost().WithHdd("naa.prize");
-  for (int rival = 0; rival < kRivals; ++rival) {
+  for (int rival = 0; rival < rivalCount; ++rival) {
     host.WithSsd(SsdOf(rival));
   }
   Start(host);
   std::atomic<int> winners = 0;
   std::vector<std::thread> rivals;
-  for (int rival = 0; rival < kRivals; ++rival) {
+  for (int rival = 0; rival < rivalCount; ++rival) {
     rivals.emplace_back([&, rival] {
       try {
         Provider().FormatDiskMapping(SsdOf(rival), {"naa.prize"}, {"", 1, 0});

@@ -81,9 +81,9 @@ TEST_F(RecordingProviderTest, WritesTheInputsOfEveryOperationAsAList) {
       json::array(),
   };
   const std::vector<RecordedCall> calls = _recorder->Calls();
-  ASSERT_EQ(calls.size(), Provider::kOperationNames.size());
+  ASSERT_EQ(calls.size(), Provider::operationNames.size());
   for (std::size_t index = 0; index < calls.size(); ++index) {
-    EXPECT_EQ(calls[index].operation, Provider::kOperationNames[index]);
+    EXPECT_EQ(calls[index].operation, Provider::operationNames[index]);
     EXPECT_EQ(calls[index].arguments, arguments[index]) << calls[index].operation;
     EXPECT_EQ(calls[index].outcome, "ok") << calls[index].operation;
   }

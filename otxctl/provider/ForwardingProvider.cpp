@@ -16,7 +16,7 @@ using HostCtl::Kova::RemovalOptions;
 
 // A name that the table lacks does not compile.
 consteval std::string_view Named(std::string_view operation) {
-  return IsOperationName(operation) ? operation : throw "kOperationNames has no such operation";
+  return IsOperationName(operation) ? operation : throw "operationNames has no such operation";
 }
 
 }  // namespace

@@ -88,7 +88,7 @@ TEST(ForwardingProvider, HandsEveryOperationToTheSameOneOfItsTarget) {
   for (const Operation& operation : AllOperations()) {
     operation.call(provider);
   }
-  EXPECT_EQ(given.size(), kOperationNames.size());
+  EXPECT_EQ(given.size(), operationNames.size());
   EXPECT_EQ(forwarded, given);
 }
 

@@ -35,7 +35,7 @@ constexpr NamedClass PlainClass(std::string_view name) {
 }
 
 // A derived class stands before its base, so that the first match is the nearest.
-constexpr std::array kClasses = {
+constexpr std::array classes = {
     DiskClass<KovaExceptionHasPartition>("KovaExceptionHasPartition"),
     DiskClass<KovaExceptionLastRemainingHDD>("KovaExceptionLastRemainingHDD"),
     DiskClass<KovaExceptionRescanError>("KovaExceptionRescanError"),
@@ -48,9 +48,9 @@ constexpr std::array kClasses = {
 };
 
 const NamedClass* Find(std::string_view name) noexcept {
-  const auto* const found = std::find_if(kClasses.begin(), kClasses.end(),
+  const auto* const found = std::find_if(classes.begin(), classes.end(),
                                          [name](const NamedClass& one) { return one.name == name; });
-  return found == kClasses.end() ? nullptr : found;
+  return found == classes.end() ? nullptr : found;
 }
 
 }  // namespace
@@ -67,10 +67,9 @@ void ThrowNamed(std::string_view name, const std::string& message, const std::st
 }
 
 std::string_view ExceptionName(const std::exception& exception) noexcept {
-  const auto* const found =
-      std::find_if(kClasses.begin(), kClasses.end(),
-                   [&exception](const NamedClass& one) { return one.matches(exception); });
-  return found == kClasses.end() ? "std::exception" : found->name;
+  const auto* const found = std::find_if(
+      classes.begin(), classes.end(), [&exception](const NamedClass& one) { return one.matches(exception); });
+  return found == classes.end() ? "std::exception" : found->name;
 }
 
 }  // namespace OtxCtl::Provider

@@ -8,7 +8,7 @@
 namespace OtxCtl::Provider {
 
 // In the order of HostCtl::Kova::KovaInfo.
-inline constexpr std::array<std::string_view, 16> kOperationNames = {
+inline constexpr std::array<std::string_view, 16> operationNames = {
     "QueryDisks",
     "GetDiskMappings",
     "FormatDiskMapping",
@@ -28,7 +28,7 @@ inline constexpr std::array<std::string_view, 16> kOperationNames = {
 };
 
 constexpr bool IsOperationName(std::string_view name) noexcept {
-  return std::find(kOperationNames.begin(), kOperationNames.end(), name) != kOperationNames.end();
+  return std::find(operationNames.begin(), operationNames.end(), name) != operationNames.end();
 }
 
 }  // namespace OtxCtl::Provider

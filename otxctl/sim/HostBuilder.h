@@ -15,14 +15,14 @@ namespace OtxCtl::Sim {
 
 class HostBuilder {
  public:
-  static constexpr std::int64_t kDiskBytes = std::int64_t{1} << 40;
+  static constexpr std::int64_t diskBytes = std::int64_t{1} << 40;
 
   // A disk that is eligible unless `edit` makes it something else.
   HostBuilder& WithDisk(const std::string& name, bool ssd, const std::function<void(HostDisk&)>& edit = {}) {
     HostDisk& disk = _host.disks.emplace_back();
     disk.name = name;
     disk.ssd = ssd;
-    disk.bytes = kDiskBytes;
+    disk.bytes = diskBytes;
     if (edit) {
       edit(disk);
     }

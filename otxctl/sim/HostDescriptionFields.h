@@ -25,7 +25,7 @@ struct Rule {
 
 constexpr std::int32_t kLargest32 = std::numeric_limits<std::int32_t>::max();
 constexpr std::int32_t kSmallest32 = std::numeric_limits<std::int32_t>::min();
-constexpr std::int64_t kLongestDelayMs = 10 * 60 * 1000;  // also of all faults of one operation together
+constexpr std::int64_t longestDelayMs = 10 * 60 * 1000;  // also of all faults of one operation together
 
 constexpr Rule Between(std::int64_t least, std::int64_t most) {
   Rule rule;
@@ -128,7 +128,7 @@ void Describe(Table& fields, const Fault::FaultRule*) {
   fields.Optional("exception", &FaultRule::exception, Known(&Provider::IsExceptionName, "exception", true));
   fields.Optional("message", &FaultRule::message);
   fields.Optional("disk", &FaultRule::disk);
-  fields.Optional("delayMs", &FaultRule::delayMs, Between(0, kLongestDelayMs));
+  fields.Optional("delayMs", &FaultRule::delayMs, Between(0, longestDelayMs));
 }
 
 template <typename Table>

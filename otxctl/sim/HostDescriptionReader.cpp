@@ -17,7 +17,7 @@ namespace {
 using Fields::Rule;
 using nlohmann::json;
 
-constexpr std::size_t kLongestText = 64 * 1024;
+constexpr std::size_t longestText = 64 * 1024;
 
 // Where a value stands. Lives on the stack along the way down, and becomes a text only for an error.
 struct Place {
@@ -75,8 +75,8 @@ void Read(const json& value, const Place& place, const Rule& rule, std::string& 
   if (read.empty() && !rule.mayBeEmpty) {
     Refuse(place, "must not be empty");
   }
-  if (read.size() > kLongestText) {
-    Refuse(place, "must not be longer than " + std::to_string(kLongestText) + " bytes");
+  if (read.size() > longestText) {
+    Refuse(place, "must not be longer than " + std::to_string(longestText) + " bytes");
   }
   if (!Tessa::IsPrintable(read)) {
     Refuse(place, "must be UTF-8 without control characters");
@@ -249,12 +249,12 @@ void CheckDelays(const std::vector<Fault::FaultRule>& faults) {
   for (std::size_t index = 0; index < faults.size(); ++index) {
     std::int64_t& total = totals[faults[index].operation];
     total += faults[index].delayMs;
-    if (total > Fields::kLongestDelayMs) {
+    if (total > Fields::longestDelayMs) {
       const Place root;
       const Place list{&root, "faults"};
       const Place fault{&list, {}, index};
       Refuse(Place{&fault, "delayMs"}, "the delays of " + faults[index].operation + " are longer than " +
-                                           std::to_string(Fields::kLongestDelayMs) + " together");
+                                           std::to_string(Fields::longestDelayMs) + " together");
     }
   }
 }

@@ -63,8 +63,8 @@ class FieldWriter {
 
   template <typename Value>
   void Optional(const char* key, Value Struct::*member, const Fields::Rule& = {}) {
-    static const Struct kDefaults{};
-    if (_object.*member != kDefaults.*member) {
+    static const Struct defaults{};
+    if (_object.*member != defaults.*member) {
       _result[key] = ToJson(_object.*member);
     }
   }

@@ -25,7 +25,7 @@ std::string ErrorOf(std::string_view text) {
 }
 
 // A description in which every key has a value that is not its default.
-const char* const kEverything = R"({
+const char* const everything = R"({
   "name": "host-a", "autoMode": true, "minimumDiskBytes": 1073741824, "storageSystem": "missing",
   "cluster": {"enabled": true, "clusterUuid": "c", "nodeUuid": "n"},
   "faultDomain": "rack-1",
@@ -47,7 +47,7 @@ const char* const kEverything = R"({
 })";
 
 TEST(HostDescription, ReadsEveryKey) {
-  const HostDescription host = ParseHostDescription(kEverything);
+  const HostDescription host = ParseHostDescription(everything);
   EXPECT_EQ(host.name, "host-a");
   EXPECT_TRUE(host.autoMode);
   EXPECT_EQ(host.minimumDiskBytes, 1073741824);
@@ -62,7 +62,7 @@ TEST(HostDescription, ReadsEveryKey) {
 }
 
 TEST(HostDescription, ReadsEveryKeyOfADisk) {
-  const HostDisk disk = ParseHostDescription(kEverything).disks.at(0);
+  const HostDisk disk = ParseHostDescription(everything).disks.at(0);
   EXPECT_EQ(disk.name, "naa.1");
   EXPECT_TRUE(disk.ssd);
   EXPECT_TRUE(disk.capacityFlash);
@@ -108,7 +108,7 @@ TEST(HostDescription, AnEmptyObjectIsAHostWithoutAnything) {
 }
 
 TEST(HostDescription, WrittenAndReadAgainIsTheSame) {
-  const HostDescription host = ParseHostDescription(kEverything);
+  const HostDescription host = ParseHostDescription(everything);
   EXPECT_EQ(ParseHostDescription(WriteHostDescription(host)), host);
   EXPECT_EQ(ParseHostDescription(WriteHostDescription(HostDescription())), HostDescription());
 }
@@ -197,7 +197,7 @@ TEST_P(BadHostDescription, IsRefusedWithItsPath) {
   EXPECT_THAT(ErrorOf(GetParam().text), StartsWith(std::string(GetParam().start) + ": "));
 }
 
-const BadRow kBadRows[] = {
+const BadRow badRows[] = {
     {"NotAnObject", "[]", "document"},
     {"EmptyText", "", "line 1, column 1"},
     {"CutOff", R"({"name": "a)", "line 1, column 12"},
@@ -274,7 +274,7 @@ const BadRow kBadRows[] = {
     {"DeepNesting", std::string(100000, '['), "[0][0][0][0][0][0][0][0][0][0][0][0][0][0][0][0]"},
 };
 
-INSTANTIATE_TEST_SUITE_P(Each, BadHostDescription, testing::ValuesIn(kBadRows),
+INSTANTIATE_TEST_SUITE_P(Each, BadHostDescription, testing::ValuesIn(badRows),
                          [](const auto& row) { return std::string(row.param.title); });
 
 TEST(HostDescription, ADiskNameThatIsTakenNamesBothDisks) {
@@ -312,14 +312,14 @@ TEST(HostDescription, LongTextsAreBounded) {
 }
 
 TEST(HostDescription, AFileCutOffAnywhereIsRefused) {
-  const std::string whole = kEverything;
+  const std::string whole = everything;
   for (std::size_t length = 0; length < whole.size(); ++length) {
     ASSERT_NE(ErrorOf(std::string_view(whole).substr(0, length)), "accepted") << length;
   }
 }
 
 TEST(HostDescription, AFileWithOneByteChangedNeverDoesWorseThanAnError) {
-  const std::string whole = kEverything;
+  const std::string whole = everything;
   for (std::size_t position = 0; position < whole.size(); ++position) {
     for (const char byte : {'\0', '"', '{', ']', '\xFF', '9'}) {
       std::string changed = whole;

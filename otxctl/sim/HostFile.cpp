@@ -17,7 +17,7 @@
 namespace OtxCtl::Sim {
 namespace {
 
-constexpr mode_t kNewFileMode = 0644;
+constexpr mode_t newFileMode = 0644;
 
 std::string ErrorText(const std::string& path, const std::string& what, int error) {
   return path + ": " + what + ": " + std::system_category().message(error);
@@ -91,7 +91,7 @@ class NewFile {
 
   void Place() {
     struct stat old {};
-    const mode_t mode = stat(_target.c_str(), &old) == 0 ? old.st_mode & 07777U : kNewFileMode;
+    const mode_t mode = stat(_target.c_str(), &old) == 0 ? old.st_mode & 07777U : newFileMode;
     const bool isDurable = fchmod(_file.Get(), mode) == 0 && fsync(_file.Get()) == 0 && _file.Close();
     if (!isDurable || rename(_name.c_str(), _target.c_str()) != 0) {
       Fail(_target, "cannot be saved", errno);
@@ -167,7 +167,7 @@ HostFileWriter::HostFileWriter(const std::string& path, FolderSync syncFolder)
     : _path(WithoutLinks(path)), _syncFolder(syncFolder) {
   // A lock on the file itself would go with the old file at the first save.
   const std::string lockPath = _path + ".lock";
-  _lock = Open(lockPath, O_RDWR | O_CREAT | O_NOFOLLOW, kNewFileMode, "cannot be opened");
+  _lock = Open(lockPath, O_RDWR | O_CREAT | O_NOFOLLOW, newFileMode, "cannot be opened");
   if (Uninterrupted([&] { return flock(_lock.Get(), LOCK_EX | LOCK_NB); }) == 0) {
     return;
   }

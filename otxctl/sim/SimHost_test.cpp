@@ -227,15 +227,16 @@ TEST(SimHostProgress, SurvivesStrangeCounts) {
 
 TEST(SimHost, ManyDisksAreFormattedInReasonableTime) {
   HostBuilder builder;
-  constexpr int kGroups = 2000;
-  for (int group = 0; group < kGroups; ++group) {
+  constexpr int groupCount = 2000;
+  for (int group = 0; group < groupCount; ++group) {
     builder.WithSsd("s" + std::to_string(group)).WithHdd("h" + std::to_string(group));
   }
   SimHost host(builder.Build());
-  for (int group = 0; group < kGroups; ++group) {
-    host.FormatDiskMapping("s" + std::to_string(group), {"h" + std::to_string(group)}, {"", kGroups, group});
+  for (int group = 0; group < groupCount; ++group) {
+    host.FormatDiskMapping("s" + std::to_string(group), {"h" + std::to_string(group)},
+                           {"", groupCount, group});
   }
-  EXPECT_EQ(host.Snapshot().groups.size(), std::size_t{kGroups});
+  EXPECT_EQ(host.Snapshot().groups.size(), std::size_t{groupCount});
 }
 
 }  // namespace

@@ -19,7 +19,7 @@ using HostCtl::Kova::DiskReason;
 using HostCtl::Kova::DiskResult;
 using HostCtl::Kova::DiskState;
 
-constexpr std::string_view kSpeaker = "simulated kernel: ";
+constexpr std::string_view speaker = "simulated kernel: ";
 
 HostVerdict Verdict(DiskState state, DiskReason reason) {
   return {static_cast<std::int32_t>(state), static_cast<std::int32_t>(reason)};
@@ -30,7 +30,7 @@ struct ReasonRule {
   DiskReason reason;
   bool (*holds)(const HostDescription& host, const HostDisk& disk, const HostGroup* group);
 };
-constexpr std::array<ReasonRule, 6> kReasons = {{
+constexpr std::array<ReasonRule, 6> reasonRules = {{
     {DiskReason::None, [](const HostDescription&, const HostDisk& disk,
                           const HostGroup* group) { return disk.absent && group == nullptr; }},
     {DiskReason::NonLocal,
@@ -48,7 +48,7 @@ constexpr std::array<ReasonRule, 6> kReasons = {{
 template <typename Exception>
 [[noreturn]] void Refuse(const std::string& disk, const std::string& why) {
   // The name comes from a request and may hold anything; the message must not.
-  throw Exception(std::string(kSpeaker) + "disk " + Tessa::Quote(Tessa::Sanitize(disk)) + " " + why, disk);
+  throw Exception(std::string(speaker) + "disk " + Tessa::Quote(Tessa::Sanitize(disk)) + " " + why, disk);
 }
 
 DiskName NameOf(const HostDisk& disk) {
@@ -86,7 +86,7 @@ HostVerdict VerdictOn(const HostDescription& host, const HostDisk& disk, const H
   if (group != nullptr && group->mounted) {
     return Verdict(DiskState::InUse, DiskReason::None);
   }
-  for (const ReasonRule& rule : kReasons) {
+  for (const ReasonRule& rule : reasonRules) {
     if (rule.holds(host, disk, group)) {
       return Verdict(DiskState::Ineligible, rule.reason);
     }
@@ -144,7 +144,7 @@ bool SimRules::FormatDiskMapping(const std::string& ssd, const std::vector<std::
   } else {
     group.ssd = ssd;
     group.allFlash = IsAllFlash(capacityDisks);
-    group.formatVersion = kNewGroupFormatVersion;
+    group.formatVersion = newGroupFormatVersion;
   }
   group.capacity.insert(group.capacity.end(), capacityDisks.begin(), capacityDisks.end());
 
@@ -191,11 +191,11 @@ void SimRules::CheckFormat(const std::string& ssd, const std::vector<std::string
 
 void SimRules::CheckRoom(std::size_t present, std::size_t added) const {
   if (added == 0) {
-    throw HostCtlException(std::string(kSpeaker) + "a disk group needs a capacity disk");
+    throw HostCtlException(std::string(speaker) + "a disk group needs a capacity disk");
   }
-  if (present + added > kMostCapacityDisks) {
-    throw HostCtlException(std::string(kSpeaker) + "a disk group holds at most " +
-                           std::to_string(kMostCapacityDisks) + " capacity disks");
+  if (present + added > mostCapacityDisks) {
+    throw HostCtlException(std::string(speaker) + "a disk group holds at most " +
+                           std::to_string(mostCapacityDisks) + " capacity disks");
   }
 }
 

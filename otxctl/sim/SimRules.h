@@ -17,8 +17,8 @@
 
 namespace OtxCtl::Sim {
 
-constexpr std::size_t kMostCapacityDisks = 7;  // of one group
-constexpr std::uint8_t kNewGroupFormatVersion = 3;
+constexpr std::size_t mostCapacityDisks = 7;  // of one group
+constexpr std::uint8_t newGroupFormatVersion = 3;
 
 // What the kernel says of a disk: its verdict if it has one, otherwise derived. `group` is the disk's group,
 // or null.

@@ -20,8 +20,8 @@ HostDisk Disk(const std::function<void(HostDisk&)>& edit) {
   return AHost().WithDisk("naa.1", false, edit).Build().disks.at(0);
 }
 
-const HostGroup kMounted = {"naa.0", {"naa.1"}, false, true, 3, false};
-const HostGroup kUnmounted = {"naa.0", {"naa.1"}, false, false, 3, false};
+const HostGroup mounted = {"naa.0", {"naa.1"}, false, true, 3, false};
+const HostGroup unmounted = {"naa.0", {"naa.1"}, false, false, 3, false};
 
 struct VerdictRow {
   const char* title;
@@ -53,12 +53,12 @@ INSTANTIATE_TEST_SUITE_P(
     Each, Verdicts,
     testing::Values(
         VerdictRow{"Free", [](HostDisk&) {}, nullptr, {1, 0}},
-        VerdictRow{"Mounted", [](HostDisk&) {}, &kMounted, {0, 0}},
-        VerdictRow{"MountedWhateverElse", Everything, &kMounted, {0, 0}},
-        VerdictRow{"MountedAndAbsent", [](HostDisk& disk) { disk.absent = true; }, &kMounted, {0, 0}},
-        VerdictRow{"Unmounted", [](HostDisk&) {}, &kUnmounted, {2, 6}},
-        VerdictRow{"UnmountedAndAbsent", [](HostDisk& disk) { disk.absent = true; }, &kUnmounted, {2, 6}},
-        VerdictRow{"UnmountedAndSmall", [](HostDisk& disk) { disk.bytes = 1; }, &kUnmounted, {2, 5}},
+        VerdictRow{"Mounted", [](HostDisk&) {}, &mounted, {0, 0}},
+        VerdictRow{"MountedWhateverElse", Everything, &mounted, {0, 0}},
+        VerdictRow{"MountedAndAbsent", [](HostDisk& disk) { disk.absent = true; }, &mounted, {0, 0}},
+        VerdictRow{"Unmounted", [](HostDisk&) {}, &unmounted, {2, 6}},
+        VerdictRow{"UnmountedAndAbsent", [](HostDisk& disk) { disk.absent = true; }, &unmounted, {2, 6}},
+        VerdictRow{"UnmountedAndSmall", [](HostDisk& disk) { disk.bytes = 1; }, &unmounted, {2, 5}},
         VerdictRow{"Absent", [](HostDisk& disk) { disk.absent = true; }, nullptr, {2, 0}},
         VerdictRow{"AbsentAndPartitioned",
                    [](HostDisk& disk) {
@@ -78,7 +78,7 @@ INSTANTIATE_TEST_SUITE_P(
                    [](HostDisk& disk) {
                      disk.verdict = HostVerdict{7, -3};
                    },
-                   &kMounted,
+                   &mounted,
                    {7, -3}}),
     [](const auto& row) { return std::string(row.param.title); });
 

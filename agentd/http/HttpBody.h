@@ -20,6 +20,8 @@ namespace Agentd {
 struct HttpBody {
   using Error = boost::system::error_code;
 
+  // NOLINTBEGIN(readability-identifier-naming): the library asks for these names
+
   struct value_type {
     std::string text = {};
     std::optional<BodyBudget::Share> share = std::nullopt;  // there before the first byte is read
@@ -60,6 +62,8 @@ struct HttpBody {
     }
 
     static void finish(Error& error) { error = {}; }
+
+    // NOLINTEND(readability-identifier-naming)
 
    private:
     void MakeRoom(std::size_t bytes, Error& error) {

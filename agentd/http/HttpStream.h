@@ -17,6 +17,7 @@ namespace Agentd {
 // just been completed, and is about to go on, cannot be cancelled.
 class TimedSocket {
  public:
+  // NOLINTBEGIN(readability-identifier-naming): what the library asks of a stream, here and below
   using Socket = boost::asio::generic::stream_protocol::socket;
   using lowest_layer_type = Socket::lowest_layer_type;
   using executor_type = Socket::executor_type;
@@ -100,6 +101,7 @@ class HttpStream {
     _tls ? _tls->async_write_some(buffers, std::forward<Handler>(handler))
          : _socket.async_write_some(buffers, std::forward<Handler>(handler));
   }
+  // NOLINTEND(readability-identifier-naming)
 
  private:
   TimedSocket _socket;

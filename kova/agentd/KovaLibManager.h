@@ -15,6 +15,7 @@ inline constexpr const char* sourcePath = "kova/agentd/KovaLibManager";
 
 // The manager behind all hooks; null until InitKovaPlugin has made it. Not guarded: it is written before
 // the first hook is called. A test may put a manager of its own here.
+// NOLINTNEXTLINE(readability-identifier-naming): panics name it so
 extern Tessa::Ref<KovaManagerImpl> _kovaManagerImpl;
 
 // Makes the manager; panics when there is one already. Throws what its construction throws, and there is

@@ -21,11 +21,13 @@ struct Progress {
 // be said to stand on the next.
 class LineCounter {
  public:
+  // NOLINTBEGIN(readability-identifier-naming): what the library's algorithms ask for
   using value_type = char;
   using difference_type = std::ptrdiff_t;
   using pointer = const char*;
   using reference = const char&;
   using iterator_category = std::forward_iterator_tag;
+  // NOLINTEND(readability-identifier-naming)
 
   LineCounter(const char* at, Progress* progress) : _at(at), _progress(progress) {}
   reference operator*() const { return *_at; }

@@ -12,6 +12,7 @@
 #include "otxctl/linux/DevicePlace.h"
 #include "otxctl/linux/DeviceStack.h"
 #include "otxctl/linux/MountTable.h"
+#include "otxctl/linux/NaturalOrder.h"
 #include "otxctl/linux/SysfsReader.h"
 
 namespace OtxCtl::Linux {
@@ -188,20 +189,26 @@ void Scan::DropThoseGone() {
 // Multipath devices first: theirs is the name of the disk, and not their paths'.
 void Scan::NameAll() {
   Disks::UniqueNames names;
-  for (const bool isMapsTurn : {true, false}) {
-    for (Candidate& candidate : _candidates) {
-      if (IsMultipathMap(*candidate.device) != isMapsTurn) {
-        continue;
-      }
-      DiskFacts& facts = candidate.disk.facts;
-      const bool isKnown = facts.identity.IsKnown();
-      const Disks::DiskIdentity identity = isKnown ? facts.identity.Get() : Disks::DiskIdentity();
-      const std::string name = Disks::CanonicalName(identity, PlaceOf(_reader, *candidate.device));
-      facts.canonicalName = names.Take(name);
-      candidate.disk.displayName = Disks::DisplayName(identity, facts.kernelName);
-      candidate.disk.hasStableName = facts.canonicalName == name && name.compare(0, 5, "path.") != 0;
-    }
+  std::unordered_map<std::string, int> owners;  // paths aside
+  const auto isMap = [](const Candidate& candidate) { return IsMultipathMap(*candidate.device); };
+  std::stable_partition(_candidates.begin(), _candidates.end(), isMap);
+  for (Candidate& candidate : _candidates) {
+    DiskFacts& facts = candidate.disk.facts;
+    const bool isKnown = facts.identity.IsKnown();
+    const Disks::DiskIdentity identity = isKnown ? facts.identity.Get() : Disks::DiskIdentity();
+    const std::string name = Disks::CanonicalName(identity, PlaceOf(_reader, *candidate.device));
+    facts.canonicalName = names.Take(name);
+    candidate.disk.displayName = Disks::DisplayName(identity, facts.kernelName);
+    candidate.disk.hasStableName = facts.canonicalName == name && name.compare(0, 5, "path.") != 0;
+    owners[name] += facts.multipathMap.Is({}) ? 1 : 0;
   }
+  for (Candidate& candidate : _candidates) {
+    candidate.disk.hasStableName =
+        candidate.disk.hasStableName && owners[candidate.disk.facts.canonicalName] == 1;
+  }
+  std::sort(_candidates.begin(), _candidates.end(), [](const Candidate& one, const Candidate& other) {
+    return IsNaturallyBefore(one.disk.facts.kernelName, other.disk.facts.kernelName);
+  });
 }
 
 }  // namespace

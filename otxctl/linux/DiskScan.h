@@ -26,7 +26,8 @@ struct ScannedDisk {
   std::string deviceNode;    // "/dev/sda"
   std::string deviceNumber;  // "8:0"
   std::int32_t blockSize = 512;
-  // The canonical name is the disk's own, not that of its place nor told apart from another one by counting.
+  // The canonical name is the disk's own, and no other disk's: neither that of its place, nor told apart from
+  // another one by counting.
   bool hasStableName = false;
 };
 

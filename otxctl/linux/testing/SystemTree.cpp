@@ -19,6 +19,25 @@ std::string OrElse(const std::string& text, const std::string& otherwise) {
   return text.empty() ? otherwise : text;
 }
 
+// What stands for bytes that are no letters.
+std::string Unescape(const std::string& text) {
+  std::string bytes;
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    if (text[i] != '\\') {
+      bytes += text[i];
+      continue;
+    }
+    const char kind = text.at(++i);
+    if (kind == 'x') {
+      bytes += static_cast<char>(std::stoi(text.substr(i + 1, 2), nullptr, 16));
+      i += 2;
+    } else {
+      bytes += kind == 'n' ? '\n' : kind;
+    }
+  }
+  return bytes;
+}
+
 }  // namespace
 
 SystemTree::SystemTree() {
@@ -67,6 +86,35 @@ void SystemTree::Link(const std::string& path, const std::string& target) {
 
 void SystemTree::Remove(const std::string& path) {
   fs::remove_all(Full(path));
+}
+
+void SystemTree::Load(const std::string& recording) {
+  std::ifstream file(recording);
+  std::string line;
+  std::size_t entries = 0;
+  while (std::getline(file, line)) {
+    if (line.empty() || line.front() == '#') {
+      continue;
+    }
+    const std::size_t first = line.find(' ');
+    const std::size_t second = std::min(line.find(' ', first + 1), line.size());
+    const std::string kind = line.substr(0, first);
+    const std::string path = line.substr(first + 1, second - first - 1);
+    const std::string rest = line.substr(std::min(second + 1, line.size()));
+    ++entries;
+    if (kind == "file") {
+      Write(path, Unescape(rest));
+    } else if (kind == "link") {
+      Link(path, rest);
+    } else if (kind == "dir") {
+      MakeFolder(path);
+    } else {
+      throw std::runtime_error(recording + ": no entry of a tree: " + line);
+    }
+  }
+  if (entries == 0) {
+    throw std::runtime_error(recording + ": cannot be read, or is empty");
+  }
 }
 
 // With the links that lead from each device to what it hangs on.

@@ -44,6 +44,10 @@ class SystemTree {
   void MakeFolder(const std::string& path);
   std::filesystem::path Full(const std::string& path) const;
 
+  // What a machine's kernel told, recorded: a line for each "file PATH CONTENT", "link PATH TARGET" and "dir
+  // PATH"; in contents, "\\n", "\\\\" and "\\xNN" are bytes. Throws over anything else.
+  void Load(const std::string& recording);
+
   // Each has a device path like
   // "/devices/pci0000:00/0000:00:05.0/virtio0/host0/target0:0:1/0:0:1:0/block/sda", which is handed back with
   // "sys" in front.

@@ -12,7 +12,7 @@ namespace {
 using Disks::Fact;
 using Names = std::vector<std::string>;
 
-constexpr std::string_view kDevices = "/devices";
+constexpr std::string_view rootOfDevices = "/devices";
 
 std::string FolderOf(const std::string& name) {
   return "/class/block/" + name;
@@ -28,19 +28,19 @@ Fact<Names> NamesIn(const SysfsReader& reader, const std::string& path) {
 }
 
 Fact<std::int64_t> Bytes(const SysfsReader& reader, const std::string& path) {
-  constexpr std::int64_t kSector = 512;  // in this attribute, whatever the disk's own are
-  constexpr std::int64_t kMostSectors = std::int64_t{1} << 53;
+  constexpr std::int64_t sectorSize = 512;  // in this attribute, whatever the disk's own are
+  constexpr std::int64_t mostSectors = std::int64_t{1} << 53;
   const Fact<std::int64_t> sectors = reader.RequiredNumber(path);
-  if (sectors.IsKnown() && sectors.Get() > kMostSectors) {
+  if (sectors.IsKnown() && sectors.Get() > mostSectors) {
     return Fact<std::int64_t>::Unknown(reader.Shown(path) + ": larger than any disk");
   }
-  return sectors.IsKnown() ? Fact<std::int64_t>(sectors.Get() * kSector) : sectors;
+  return sectors.IsKnown() ? Fact<std::int64_t>(sectors.Get() * sectorSize) : sectors;
 }
 
 Fact<std::int64_t> BlockSize(const SysfsReader& reader, const std::string& path) {
-  constexpr std::int64_t kLargest = std::int64_t{1} << 30;
+  constexpr std::int64_t largest = std::int64_t{1} << 30;
   const Fact<std::int64_t> size = reader.RequiredNumber(path);
-  const bool isOne = size.IsKnown() && size.Get() > 0 && size.Get() <= kLargest;
+  const bool isOne = size.IsKnown() && size.Get() > 0 && size.Get() <= largest;
   return !size.IsKnown() || isOne ? size
                                   : Fact<std::int64_t>::Unknown(reader.Shown(path) + ": no size of blocks");
 }
@@ -134,7 +134,7 @@ void BlockDevices::Read(const SysfsReader& reader, const std::string& name) {
 
 Fact<std::vector<Ancestor>> BlockDevices::ReadChain(const SysfsReader& reader, const std::string& path) {
   std::vector<Ancestor> chain;
-  for (std::string_view at = path; at.size() > kDevices.size(); at = ParentPath(at)) {
+  for (std::string_view at = path; at.size() > rootOfDevices.size(); at = ParentPath(at)) {
     auto [known, isNew] = _subsystems.try_emplace(std::string(at));
     if (isNew) {
       known->second = TextOrEmpty(reader.LinkName(known->first + "/subsystem"));
@@ -178,9 +178,9 @@ const BlockDevice* BlockDevices::ByMapping(const std::string& name) const {
 }
 
 const std::vector<const BlockDevice*>& BlockDevices::PartitionsOf(const BlockDevice& disk) const {
-  static const std::vector<const BlockDevice*> kNone;
+  static const std::vector<const BlockDevice*> none;
   const auto found = _partitions.find(disk.name);
-  return found == _partitions.end() ? kNone : found->second;
+  return found == _partitions.end() ? none : found->second;
 }
 
 std::string WhyGone(const SysfsReader& reader, const BlockDevice& device) {

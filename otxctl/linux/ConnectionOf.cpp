@@ -18,35 +18,35 @@ using Disks::Fact;
 using Chain = std::vector<Ancestor>;
 using Link = Fact<Connection>;
 
-// A list of names in a table.
-template <std::size_t Size>
-bool IsIn(const std::array<std::string_view, Size>& names, std::string_view name) {
+// Whether a table lists the name.
+template <std::size_t size>
+bool IsIn(const std::array<std::string_view, size>& names, std::string_view name) {
   return std::find(names.begin(), names.end(), name) != names.end();
 }
 
 // Buses of machines.
-constexpr std::array<std::string_view, 19> kBuses = {
+constexpr std::array<std::string_view, 19> buses = {
     "pci",      "pci_express", "platform", "acpi",          "virtio", "vmbus", "xen",
     "ccw",      "css",         "vio",      "mmc_host",      "mmc",    "usb",   "amba",
     "firewire", "ieee1394",    "memstick", "memstick_host", "pcmcia"};
 // What stands between a disk and the bus.
-constexpr std::array<std::string_view, 3> kBetween = {"block", "scsi", "nvme"};
-constexpr std::array<std::string_view, 6> kPluggable = {"usb",    "firewire", "ieee1394",
-                                                        "pcmcia", "mmc",      "memstick"};
+constexpr std::array<std::string_view, 3> betweenBusAndDisk = {"block", "scsi", "nvme"};
+constexpr std::array<std::string_view, 6> pluggableBuses = {"usb",    "firewire", "ieee1394",
+                                                            "pcmcia", "mmc",      "memstick"};
 
 // Beginnings of names of devices without hardware here that reach hardware elsewhere.
-constexpr std::array<std::string_view, 5> kNetworkDisks = {"nbd", "rbd", "drbd", "etherd!", "rnbd"};
+constexpr std::array<std::string_view, 5> networkDisks = {"nbd", "rbd", "drbd", "etherd!", "rnbd"};
 
 struct ScsiTransport {
   std::string_view folder;  // below a host whose disks come by it
   std::string_view name;
   Attachment attachment;
 };
-constexpr std::array<ScsiTransport, 5> kScsiTransports = {{{"iscsi_host", "iscsi", Attachment::Remote},
-                                                           {"fc_host", "fc", Attachment::Remote},
-                                                           {"srp_host", "srp", Attachment::Remote},
-                                                           {"sas_host", "sas", Attachment::Machine},
-                                                           {"spi_host", "spi", Attachment::Machine}}};
+constexpr std::array<ScsiTransport, 5> scsiTransports = {{{"iscsi_host", "iscsi", Attachment::Remote},
+                                                          {"fc_host", "fc", Attachment::Remote},
+                                                          {"srp_host", "srp", Attachment::Remote},
+                                                          {"sas_host", "sas", Attachment::Machine},
+                                                          {"spi_host", "spi", Attachment::Machine}}};
 
 bool HasSubsystem(const Chain& chain, std::string_view subsystem) {
   return std::any_of(chain.begin(), chain.end(),
@@ -141,7 +141,7 @@ Link VirtualConnection(const SysfsReader& reader, const BlockDevice& device, con
                  : link;
     }
   }
-  for (const std::string_view name : kNetworkDisks) {
+  for (const std::string_view name : networkDisks) {
     if (BeginsWith(device.name, name)) {
       return {Connection{Attachment::Remote, std::string(name.substr(0, name.find('!')))}};
     }
@@ -151,7 +151,7 @@ Link VirtualConnection(const SysfsReader& reader, const BlockDevice& device, con
 
 // How a SCSI host reaches its disks, if it says so.
 Link ScsiConnection(const SysfsReader& reader, const std::string& host) {
-  for (const ScsiTransport& transport : kScsiTransports) {
+  for (const ScsiTransport& transport : scsiTransports) {
     const Fact<bool> exists = reader.Exists(host + "/" + std::string(transport.folder));
     if (!exists.IsKnown()) {
       return Link::Unknown(exists.WhyUnknown());
@@ -192,9 +192,9 @@ Link ControllerConnection(const SysfsReader& reader, const Chain& chain) {
 
 // A positive rule: a bus must be there, and nothing that is not understood.
 Link BusConnection(const BlockDevice& device, const Chain& chain, const Link& controller) {
-  const auto isBus = [](const Ancestor& ancestor) { return IsIn(kBuses, ancestor.subsystem); };
+  const auto isBus = [](const Ancestor& ancestor) { return IsIn(buses, ancestor.subsystem); };
   const auto isUnderstood = [&](const Ancestor& ancestor) {
-    return isBus(ancestor) || IsIn(kBetween, ancestor.subsystem);
+    return isBus(ancestor) || IsIn(betweenBusAndDisk, ancestor.subsystem);
   };
   const bool isHardware =
       std::any_of(chain.begin(), chain.end(), isBus) && std::all_of(chain.begin(), chain.end(), isUnderstood);
@@ -235,7 +235,7 @@ Fact<bool> IsHotPlug(const SysfsReader& reader, const BlockDevice& device) {
     return Fact<bool>::Unknown(device.chain.WhyUnknown());
   }
   for (const Ancestor& ancestor : device.chain.Get()) {
-    if (IsIn(kPluggable, ancestor.subsystem)) {
+    if (IsIn(pluggableBuses, ancestor.subsystem)) {
       return {true};
     }
     if (ancestor.subsystem == "pci") {

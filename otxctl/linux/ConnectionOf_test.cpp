@@ -21,9 +21,9 @@ class ConnectionOfTest : public testing::Test {
     if (!connection.IsKnown()) {
       return "unknown: " + connection.WhyUnknown();
     }
-    static const char* const kWords[] = {"machine", "usb", "firewire", "card", "remote", "virtual"};
+    static const char* const words[] = {"machine", "usb", "firewire", "card", "remote", "virtual"};
     const std::string& transport = connection.Get().transport;
-    return std::string(kWords[static_cast<int>(connection.Get().attachment)]) +
+    return std::string(words[static_cast<int>(connection.Get().attachment)]) +
            (transport.empty() ? "" : " ") + transport;
   }
   bool IsPluggable(const std::string& name = "sda") const {
@@ -44,7 +44,7 @@ class ConnectionOfTest : public testing::Test {
   SystemTree _tree;
 };
 
-const std::string kPci = "pci0000:00/0000:00:1f.2";
+const std::string pci = "pci0000:00/0000:00:1f.2";
 
 TEST_F(ConnectionOfTest, DisksOnBusesOfTheMachineAreAttachedToIt) {
   _tree.AddScsiDisk("sda", {});
@@ -58,24 +58,24 @@ TEST_F(ConnectionOfTest, DisksOnBusesOfTheMachineAreAttachedToIt) {
 }
 
 TEST_F(ConnectionOfTest, AHostTellsItsTransport) {
-  AddAt(kPci + "/host1", {{kPci, "pci"}});
+  AddAt(pci + "/host1", {{pci, "pci"}});
   EXPECT_EQ(Told(), "machine");
-  _tree.MakeFolder("sys/devices/" + kPci + "/host1/spi_host/host1");
+  _tree.MakeFolder("sys/devices/" + pci + "/host1/spi_host/host1");
   EXPECT_EQ(Told(), "machine spi");
-  _tree.MakeFolder("sys/devices/" + kPci + "/host1/sas_host/host1");
+  _tree.MakeFolder("sys/devices/" + pci + "/host1/sas_host/host1");
   EXPECT_EQ(Told(), "machine sas");
-  _tree.MakeFolder("sys/devices/" + kPci + "/host1/srp_host/host1");
+  _tree.MakeFolder("sys/devices/" + pci + "/host1/srp_host/host1");
   EXPECT_EQ(Told(), "remote srp");
-  _tree.MakeFolder("sys/devices/" + kPci + "/host1/fc_host/host1");
+  _tree.MakeFolder("sys/devices/" + pci + "/host1/fc_host/host1");
   EXPECT_EQ(Told(), "remote fc");
-  _tree.MakeFolder("sys/devices/" + kPci + "/host1/iscsi_host/host1");
+  _tree.MakeFolder("sys/devices/" + pci + "/host1/iscsi_host/host1");
   EXPECT_EQ(Told(), "remote iscsi");
 }
 
 TEST_F(ConnectionOfTest, AtaIsToldFromItsFolderAndDriver) {
-  AddAt(kPci + "/ata1/host1", {{kPci, "pci"}});
+  AddAt(pci + "/ata1/host1", {{pci, "pci"}});
   EXPECT_EQ(Told(), "machine ata");
-  _tree.Write("sys/devices/" + kPci + "/ata1/host1/scsi_host/host1/proc_name", "ahci\n");
+  _tree.Write("sys/devices/" + pci + "/ata1/host1/scsi_host/host1/proc_name", "ahci\n");
   EXPECT_EQ(Told(), "machine sata");
 }
 
@@ -92,9 +92,9 @@ TEST_F(ConnectionOfTest, UsbAnywhereInTheChainIsUsb) {
 }
 
 TEST_F(ConnectionOfTest, FireWireAndMemoryCardsAreTheirOwn) {
-  AddAt(kPci + "/fw0/fw0.0/host1", {{kPci, "pci"}, {kPci + "/fw0", "firewire"}});
+  AddAt(pci + "/fw0/fw0.0/host1", {{pci, "pci"}, {pci + "/fw0", "firewire"}});
   EXPECT_EQ(Told(), "firewire sbp");
-  _tree.Link("sys/devices/" + kPci + "/fw0/subsystem", "../bus/mmc");
+  _tree.Link("sys/devices/" + pci + "/fw0/subsystem", "../bus/mmc");
   EXPECT_EQ(Told(), "card mmc");
   EXPECT_TRUE(IsPluggable());
 }
@@ -180,10 +180,10 @@ TEST_F(ConnectionOfTest, AControllerThatCannotBeReadIsUnknown) {
 }
 
 TEST_F(ConnectionOfTest, APortOutsideOfTheMachineMakesItPluggable) {
-  AddAt(kPci + "/host1", {{kPci, "pci"}});
-  _tree.Write("sys/devices/" + kPci + "/removable", "fixed\n");
+  AddAt(pci + "/host1", {{pci, "pci"}});
+  _tree.Write("sys/devices/" + pci + "/removable", "fixed\n");
   EXPECT_FALSE(IsPluggable());
-  _tree.Write("sys/devices/" + kPci + "/removable", "removable\n");
+  _tree.Write("sys/devices/" + pci + "/removable", "removable\n");
   EXPECT_TRUE(IsPluggable());
 }
 

@@ -72,7 +72,7 @@ Text ReadModel(const SysfsReader& reader, const BlockDevice& device, const std::
 
 // SCSI's kinds of devices, by number.
 std::string KindInWords(std::int64_t type) {
-  constexpr std::array<std::pair<std::int64_t, const char*>, 7> kKinds = {
+  constexpr std::array<std::pair<std::int64_t, const char*>, 7> kinds = {
       {{1, "a tape drive"},
        {4, "a write-once device"},
        {5, "an optical drive"},
@@ -81,24 +81,24 @@ std::string KindInWords(std::int64_t type) {
        {14, "a simple disk of another kind"},
        {20, "a zoned disk"}}};
   const auto* const kind =
-      std::find_if(kKinds.begin(), kKinds.end(), [&](const auto& one) { return one.first == type; });
-  return kind == kKinds.end() ? "a SCSI device of kind " + std::to_string(type) : kind->second;
+      std::find_if(kinds.begin(), kinds.end(), [&](const auto& one) { return one.first == type; });
+  return kind == kinds.end() ? "a SCSI device of kind " + std::to_string(type) : kind->second;
 }
 
 }  // namespace
 
 std::optional<std::string> ParseSerialPage(std::string_view page) {
-  constexpr std::size_t kHeader = 4;
-  constexpr char kSerialNumber = '\x80';
+  constexpr std::size_t headerSize = 4;
+  constexpr char serialNumberPage = '\x80';
   const auto byteAt = [&](std::size_t index) { return static_cast<unsigned char>(page[index]); };
-  if (page.size() < kHeader || page[1] != kSerialNumber) {
+  if (page.size() < headerSize || page[1] != serialNumberPage) {
     return std::nullopt;
   }
   const std::size_t length = std::size_t{byteAt(2)} << 8U | byteAt(3);
-  if (length > page.size() - kHeader) {
+  if (length > page.size() - headerSize) {
     return std::nullopt;
   }
-  return Tessa::Sanitize(page.substr(kHeader, length));
+  return Tessa::Sanitize(page.substr(headerSize, length));
 }
 
 Fact<DiskIdentity> IdentityOf(const SysfsReader& reader, const BlockDevice& device) {

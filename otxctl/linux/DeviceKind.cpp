@@ -16,21 +16,21 @@ struct Word {
 };
 
 // By the beginning of a mapping's UUID.
-constexpr std::array<Word, 6> kMappers = {{{"LVM-", "LVM"},
-                                           {"CRYPT-", "encryption"},
-                                           {"mpath-", "multipath"},
-                                           {"DMRAID-", "RAID"},
-                                           {"part", "partition"},
-                                           {"VERITY-", "integrity"}}};
+constexpr std::array<Word, 6> mappers = {{{"LVM-", "LVM"},
+                                          {"CRYPT-", "encryption"},
+                                          {"mpath-", "multipath"},
+                                          {"DMRAID-", "RAID"},
+                                          {"part", "partition"},
+                                          {"VERITY-", "integrity"}}};
 
 // By the beginning of a name, which a number follows.
-constexpr std::array<Word, 7> kNoDisks = {{{"loop", "a loop device"},
-                                           {"ram", "memory"},
-                                           {"zram", "memory"},
-                                           {"md", "a RAID array"},
-                                           {"bcache", "a cached device"},
-                                           {"fd", "a floppy drive"},
-                                           {"sr", "an optical drive"}}};
+constexpr std::array<Word, 7> noDisks = {{{"loop", "a loop device"},
+                                          {"ram", "memory"},
+                                          {"zram", "memory"},
+                                          {"md", "a RAID array"},
+                                          {"bcache", "a cached device"},
+                                          {"fd", "a floppy drive"},
+                                          {"sr", "an optical drive"}}};
 
 bool BeginsWith(std::string_view text, std::string_view beginning) {
   return text.substr(0, beginning.size()) == beginning;
@@ -40,24 +40,24 @@ std::string MapperInWords(const BlockDevice& device) {
   if (!device.mapping->uuid.IsKnown()) {
     return "device-mapper";
   }
-  const auto* const found = std::find_if(kMappers.begin(), kMappers.end(), [&](const Word& mapper) {
+  const auto* const found = std::find_if(mappers.begin(), mappers.end(), [&](const Word& mapper) {
     return BeginsWith(device.mapping->uuid.Get(), mapper.beginning);
   });
-  return found == kMappers.end() ? "device-mapper" : std::string(found->word);
+  return found == mappers.end() ? "device-mapper" : std::string(found->word);
 }
 
 // The areas beside the user's own of a soldered memory card: "mmcblk0boot0", "mmcblk0rpmb".
 bool IsCardArea(std::string_view name) {
-  constexpr std::string_view kCard = "mmcblk";
-  if (!BeginsWith(name, kCard)) {
+  constexpr std::string_view card = "mmcblk";
+  if (!BeginsWith(name, card)) {
     return false;
   }
-  const std::string_view rest = name.substr(kCard.size());
+  const std::string_view rest = name.substr(card.size());
   return rest.find_first_not_of("0123456789") != std::string_view::npos;
 }
 
 std::string WhyByName(const std::string& name) {
-  for (const Word& kind : kNoDisks) {
+  for (const Word& kind : noDisks) {
     if (BeginsWith(name, kind.beginning) &&
         ParseNumber(std::string_view(name).substr(kind.beginning.size()))) {
       return std::string(kind.word);

@@ -9,11 +9,12 @@
 namespace OtxCtl::Linux {
 namespace {
 
-constexpr std::array<std::string_view, 6> kBuses = {"platform", "acpi", "vmbus", "xen", "ccw", "vio"};
-constexpr std::string_view kHost = "host";
+constexpr std::array<std::string_view, 6> buses = {"platform", "acpi", "vmbus", "xen", "ccw", "vio"};
+constexpr std::string_view hostWord = "host";
 
 std::optional<std::int64_t> HostNumber(std::string_view name) {
-  return name.substr(0, kHost.size()) == kHost ? ParseNumber(name.substr(kHost.size())) : std::nullopt;
+  return name.substr(0, hostWord.size()) == hostWord ? ParseNumber(name.substr(hostWord.size()))
+                                                     : std::nullopt;
 }
 
 // "0" of the first host of a controller, whatever number it has in the machine.
@@ -72,7 +73,7 @@ std::string PlaceOf(const SysfsReader& reader, const BlockDevice& device) {
     const std::string_view name = LastName(at->path);
     const std::string& subsystem = at->subsystem;
     if (subsystem == "pci" ||
-        (place.empty() && std::find(kBuses.begin(), kBuses.end(), subsystem) != kBuses.end())) {
+        (place.empty() && std::find(buses.begin(), buses.end(), subsystem) != buses.end())) {
       place = subsystem + "-" + std::string(name);
     } else if (subsystem == "usb" && name.find(':') != std::string_view::npos) {
       place += UsbPlace(name);

@@ -13,8 +13,8 @@ namespace {
 using Disks::Fact;
 using Texts = DeviceStack::Texts;
 
-constexpr std::size_t kMostTexts = 8;     // that are told of one disk
-constexpr std::size_t kMostDevices = 64;  // that are looked at for mounts: one is enough to rule a disk out
+constexpr std::size_t mostTexts = 8;     // that are told of one disk
+constexpr std::size_t mostDevices = 64;  // that are looked at for mounts: one is enough to rule a disk out
 
 }  // namespace
 
@@ -33,7 +33,7 @@ Fact<Texts> DeviceStack::HoldersOf(const BlockDevice& device) const {
     if (holder != nullptr && (holder == map || IsMappedPartition(*holder))) {
       continue;
     }
-    if (words.size() == kMostTexts) {
+    if (words.size() == mostTexts) {
       ++more;
       continue;
     }
@@ -50,7 +50,7 @@ std::vector<const BlockDevice*> DeviceStack::DirectlyOn(const BlockDevice& devic
   if (device.holders.IsKnown()) {
     for (const std::string& name : device.holders.Get()) {
       const BlockDevice* const holder = _devices.ByName(name);
-      if (holder != nullptr && above.size() < kMostDevices) {
+      if (holder != nullptr && above.size() < mostDevices) {
         above.push_back(holder);
       }
     }
@@ -67,7 +67,7 @@ Fact<Texts> DeviceStack::MountsOn(const BlockDevice& device) const {
   std::vector<const BlockDevice*> above = {&device};
   std::unordered_set<const BlockDevice*> seen = {
       &device};  // a device may stand on itself, if the tree says so
-  for (std::size_t i = 0; i < above.size() && i < kMostDevices; ++i) {
+  for (std::size_t i = 0; i < above.size() && i < mostDevices; ++i) {
     for (const BlockDevice* const next : DirectlyOn(*above[i])) {
       if (!seen.insert(next).second) {
         continue;
@@ -79,7 +79,7 @@ Fact<Texts> DeviceStack::MountsOn(const BlockDevice& device) const {
       }
       const bool isNamed = next->mapping && next->mapping->name.IsKnown();
       for (const std::string& place : places.Get()) {
-        if (mounts.size() < kMostTexts) {
+        if (mounts.size() < mostTexts) {
           mounts.push_back(place + " (" + (isNamed ? next->mapping->name.Get() : next->name) + ")");
         }
       }

@@ -17,8 +17,8 @@ class DiskScanMultipath : public testing::Test {
  protected:
   // Two paths to one disk, joined.
   DiskScanMultipath() {
-    _sda = _tree.AddScsiDisk("sda", kDisk);
-    _sdb = _tree.AddScsiDisk("sdb", kDisk);
+    _sda = _tree.AddScsiDisk("sda", sameDisk);
+    _sdb = _tree.AddScsiDisk("sdb", sameDisk);
     _map = _tree.AddMapping("dm-0", "mpatha", "mpath-3600", {"sda", "sdb"});
     for (const char* const name : {"sda", "sdb"}) {
       _probe.results[name] = EmptyDisk();
@@ -29,7 +29,7 @@ class DiskScanMultipath : public testing::Test {
   DiskScan Run() { return ScanDisks(_tree.Paths(), _probe); }
   std::map<std::string, std::string> Verdicts() { return Judged(Run()); }
 
-  static inline const TestDisk kDisk = {.worldWideName = "naa.1", .serial = "S1"};
+  static inline const TestDisk sameDisk = {.worldWideName = "naa.1", .serial = "S1"};
   SystemTree _tree;
   FakeProbe _probe;
   std::string _sda;
@@ -122,7 +122,7 @@ TEST_F(DiskScanMultipath, AMapOnSomethingElseThanDisksIsNotFree) {
 }
 
 TEST_F(DiskScanMultipath, AMapWithTheNameOfADiskDoesNotHideIt) {
-  _tree.AddScsiDisk("sdz", kDisk);
+  _tree.AddScsiDisk("sdz", sameDisk);
   _tree.Write(_map + "/dm/name", "sdz\n");
   const auto verdicts = Verdicts();
   EXPECT_THAT(verdicts.at("dm-0"), HasSubstr("same disk as "));
@@ -131,7 +131,7 @@ TEST_F(DiskScanMultipath, AMapWithTheNameOfADiskDoesNotHideIt) {
 }
 
 TEST_F(DiskScanMultipath, AThirdPathThatWasNotJoinedIsToldToBeTheSameDisk) {
-  _tree.AddScsiDisk("sdc", kDisk);
+  _tree.AddScsiDisk("sdc", sameDisk);
   const auto verdicts = Verdicts();
   EXPECT_THAT(verdicts.at("sdc"), HasSubstr("same disk as "));
   EXPECT_THAT(verdicts.at("mpatha"), HasSubstr("same disk as "));

@@ -16,8 +16,8 @@ namespace {
 using Disks::Fact;
 using Text = Fact<std::string>;
 
-constexpr std::size_t kLongestTable = std::size_t{64} << 20U;
-constexpr std::string_view kDev = "/dev/";
+constexpr std::size_t longestTable = std::size_t{64} << 20U;
+constexpr std::string_view devFolder = "/dev/";
 
 // File systems on disks that have numbers of their own instead of their disk's.
 bool IsOnDisksByName(const std::string& type) {
@@ -25,7 +25,7 @@ bool IsOnDisksByName(const std::string& type) {
 }
 
 bool IsDevicePath(std::string_view source) {
-  return source.substr(0, kDev.size()) == kDev;
+  return source.substr(0, devFolder.size()) == devFolder;
 }
 
 // Zero is the major number of what is no device.
@@ -35,10 +35,11 @@ bool IsAnonymous(std::string_view number) {
 
 // The kernel's mark of a name that was taken away while the device is in use.
 std::string WithoutMark(const std::string& source) {
-  constexpr std::string_view kDeleted = " (deleted)";
-  const bool isMarked = source.size() > kDeleted.size() &&
-                        source.compare(source.size() - kDeleted.size(), kDeleted.size(), kDeleted) == 0;
-  return isMarked ? source.substr(0, source.size() - kDeleted.size()) : source;
+  constexpr std::string_view deletedMark = " (deleted)";
+  const bool isMarked =
+      source.size() > deletedMark.size() &&
+      source.compare(source.size() - deletedMark.size(), deletedMark.size(), deletedMark) == 0;
+  return isMarked ? source.substr(0, source.size() - deletedMark.size()) : source;
 }
 
 // Whether both see the same file systems, as far as anybody can tell.
@@ -50,7 +51,7 @@ bool IsSameView(const std::string& proc) {
 }
 
 Text Required(const std::string& path) {
-  const auto text = ReadWhole(path, kLongestTable);
+  const auto text = ReadWhole(path, longestTable);
   if (!text.IsKnown()) {
     return Text::Unknown(text.WhyUnknown());
   }
@@ -100,7 +101,7 @@ void MountTable::Add(const MountEntry& entry) {
 
 // A kernel without swapping has no such file.
 void MountTable::ReadSwaps(const std::string& path) {
-  const auto text = ReadWhole(path, kLongestTable);
+  const auto text = ReadWhole(path, longestTable);
   const auto entries = text.IsKnown() ? ParseSwaps(text.Get().value_or(std::string()))
                                       : Fact<std::vector<SwapEntry>>::Unknown(text.WhyUnknown());
   if (!entries.IsKnown()) {
@@ -122,10 +123,10 @@ void MountTable::ReadSwaps(const std::string& path) {
 }
 
 void MountTable::AddPlace(const std::string& number, const std::string& place) {
-  constexpr std::size_t kEnough = 8;  // containers mount one disk thousands of times
+  constexpr std::size_t enough = 8;  // containers mount one disk thousands of times
   Places& places = _places[number];
   std::string cleaned = Tessa::Sanitize(place);
-  if (places.size() < kEnough && std::find(places.begin(), places.end(), cleaned) == places.end()) {
+  if (places.size() < enough && std::find(places.begin(), places.end(), cleaned) == places.end()) {
     places.push_back(std::move(cleaned));
   }
 }
@@ -134,7 +135,7 @@ const BlockDevice* MountTable::Resolve(const std::string& node) const {
   if (!IsDevicePath(node)) {
     return nullptr;
   }
-  const std::string name = node.substr(kDev.size());
+  const std::string name = node.substr(devFolder.size());
   std::error_code error;
   const std::filesystem::path folder = std::filesystem::weakly_canonical(_paths.dev, error);
   const std::filesystem::path real = std::filesystem::weakly_canonical(_paths.dev + "/" + name, error);
@@ -144,9 +145,10 @@ const BlockDevice* MountTable::Resolve(const std::string& node) const {
   if (const BlockDevice* const device = _devices.ByName(kernelName)) {
     return device;
   }
-  constexpr std::string_view kMapper = "mapper/";
-  return name.compare(0, kMapper.size(), kMapper) == 0 ? _devices.ByMapping(name.substr(kMapper.size()))
-                                                       : nullptr;
+  constexpr std::string_view mapperFolder = "mapper/";
+  return name.compare(0, mapperFolder.size(), mapperFolder) == 0
+             ? _devices.ByMapping(name.substr(mapperFolder.size()))
+             : nullptr;
 }
 
 // One source may name several devices: "/dev/sda:/dev/sdb". All of them, or none if one leads nowhere.

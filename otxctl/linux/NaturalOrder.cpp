@@ -30,8 +30,8 @@ int Compare(std::string_view run, std::string_view other) {
     run.remove_prefix(std::min(run.find_first_not_of('0'), run.size()));
     other.remove_prefix(std::min(other.find_first_not_of('0'), other.size()));
   }
-  constexpr std::size_t kKind = 2;  // letters that tell the kind of device: "sd" of "sdaa"
-  const int kind = isNumber ? 0 : run.substr(0, kKind).compare(other.substr(0, kKind));
+  constexpr std::size_t kindSize = 2;  // letters that tell the kind of device: "sd" of "sdaa"
+  const int kind = isNumber ? 0 : run.substr(0, kindSize).compare(other.substr(0, kindSize));
   if (kind == 0 && run.size() != other.size()) {
     return run.size() < other.size() ? -1 : 1;
   }

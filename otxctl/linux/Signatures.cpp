@@ -8,8 +8,11 @@
 #include <cerrno>
 #include <cstdint>
 #include <memory>
-#include <optional>
+#include <string_view>
+#include <type_traits>
+#include <utility>
 
+#include "otxctl/disks/SignatureWords.h"
 #include "otxctl/linux/BoundedFile.h"
 #include "otxctl/linux/FileDescriptor.h"
 #include "tessa/text/Escape.h"
@@ -26,27 +29,13 @@ struct FreeProbe {
 using Prober = std::unique_ptr<std::remove_pointer_t<blkid_probe>, FreeProbe>;
 
 // What the library answers.
-constexpr int kFound = 0;
-constexpr int kNothing = 1;
-constexpr int kAmbivalent = -2;
+constexpr int foundOne = 0;
+constexpr int foundNothing = 1;
+constexpr int foundAmbivalent = -2;
 
 Signatures Unknown(const std::string& why) {
   return {Fact<Texts>::Unknown(why), Fact<std::string>::Unknown(why)};
 }
-
-struct Wording {
-  std::string_view type;
-  std::string_view words;
-};
-constexpr std::array<Wording, 9> kWordings = {{{"LVM1_member", "LVM physical volume"},
-                                               {"LVM2_member", "LVM physical volume"},
-                                               {"crypto_LUKS", "LUKS encrypted volume"},
-                                               {"BitLocker", "BitLocker encrypted volume"},
-                                               {"zfs_member", "member of a ZFS pool"},
-                                               {"swap", "swap space"},
-                                               {"swsuspend", "suspended system"},
-                                               {"bcache", "bcache device"},
-                                               {"mpath_member", "path of a multipath device"}}};
 
 std::string Value(blkid_probe probe, const char* name) {
   const char* text = nullptr;
@@ -82,7 +71,8 @@ void Take(blkid_probe probe, Texts& signatures, Texts& tables) {
   const std::string type = Value(probe, "TYPE");
   const std::string table = Value(probe, "PTTYPE");
   if (!type.empty()) {
-    AddOnce(signatures, SignatureInWords(type, Value(probe, "USAGE"), Value(probe, "LABEL")));
+    AddOnce(signatures,
+            Disks::SignatureInWords(Tessa::Sanitize(type), Tessa::Sanitize(Value(probe, "LABEL"))));
   }
   if (!table.empty()) {
     AddOnce(tables, Tessa::Sanitize(table));
@@ -119,22 +109,6 @@ std::string TablesInWords(const Texts& tables) {
 
 }  // namespace
 
-std::string SignatureInWords(std::string_view type, std::string_view usage, std::string_view label) {
-  const auto* const wording =
-      std::find_if(kWordings.begin(), kWordings.end(), [&](const Wording& one) { return one.type == type; });
-  const std::string cleanType = Tessa::Sanitize(type);
-  std::string words = cleanType + " signature";
-  if (wording != kWordings.end()) {
-    words = wording->words;
-  } else if (usage == "filesystem") {
-    words = cleanType + " file system";
-  } else if (usage == "raid") {
-    words = "member of a RAID array (" + cleanType + ")";
-  }
-  const std::string cleanLabel = Tessa::Sanitize(label);
-  return cleanLabel.empty() ? words : words + " " + Tessa::Quote(cleanLabel);
-}
-
 Signatures ReadSignatures(int descriptor, const std::string& name) {
   const Prober prober = NewProber(descriptor);
   if (prober == nullptr) {
@@ -145,23 +119,23 @@ Signatures ReadSignatures(int descriptor, const std::string& name) {
   }
   Texts signatures;
   Texts tables;
-  int result = kFound;
+  int result = foundOne;
   // Each call finds the next thing, of whatever kind.
-  while ((result = blkid_do_probe(prober.get())) == kFound) {
+  while ((result = blkid_do_probe(prober.get())) == foundOne) {
     Take(prober.get(), signatures, tables);
   }
-  if (result == kNothing) {
+  if (result == foundNothing) {
     // The other way round: as a whole. Finds the same, or that it contradicts itself.
     blkid_reset_probe(prober.get());
     const int whole = blkid_do_safeprobe(prober.get());
-    if (whole == kFound) {
+    if (whole == foundOne) {
       Take(prober.get(), signatures, tables);
-    } else if (whole == kAmbivalent && signatures.empty()) {
+    } else if (whole == foundAmbivalent && signatures.empty()) {
       signatures.emplace_back("several signatures that contradict each other");
     }
-    result = whole == kFound || whole == kAmbivalent ? kNothing : whole;
+    result = whole == foundOne || whole == foundAmbivalent ? foundNothing : whole;
   }
-  if (result != kNothing) {
+  if (result != foundNothing) {
     return Unknown("what stands on " + name + ": reading it failed");
   }
   return {std::move(signatures), TablesInWords(tables)};

@@ -8,7 +8,6 @@
 #pragma once
 
 #include <string>
-#include <string_view>
 #include <vector>
 
 #include "otxctl/disks/Fact.h"
@@ -22,8 +21,5 @@ struct Signatures {
 
 // `descriptor` is open for reading; `name` is told in messages.
 Signatures ReadSignatures(int descriptor, const std::string& name);
-
-// "ext4 file system \"DATA\"" of "ext4", "filesystem" and "DATA". Any text may come from the disk.
-std::string SignatureInWords(std::string_view type, std::string_view usage, std::string_view label);
 
 }  // namespace OtxCtl::Linux

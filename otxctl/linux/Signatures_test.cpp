@@ -114,14 +114,5 @@ TEST(Signatures, NoContentsAreTooMuch) {
   }
 }
 
-TEST(Signatures, WordsAreThoseOfTheField) {
-  EXPECT_EQ(SignatureInWords("xfs", "filesystem", "a b"), "xfs file system \"a b\"");
-  EXPECT_EQ(SignatureInWords("LVM2_member", "raid", ""), "LVM physical volume");
-  EXPECT_EQ(SignatureInWords("zfs_member", "filesystem", "tank"), "member of a ZFS pool \"tank\"");
-  EXPECT_EQ(SignatureInWords("bcache", "other", ""), "bcache device");
-  EXPECT_EQ(SignatureInWords("isw_raid_member", "raid", ""), "member of a RAID array (isw_raid_member)");
-  EXPECT_EQ(SignatureInWords("ubi", "other", ""), "ubi signature");
-}
-
 }  // namespace
 }  // namespace OtxCtl::Linux

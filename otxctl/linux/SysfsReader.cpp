@@ -20,8 +20,8 @@ namespace {
 
 using Disks::Fact;
 
-constexpr std::size_t kLongestAttribute = 4096;  // the kernel gives no more than a page
-constexpr std::size_t kMostNames = 1U << 20U;
+constexpr std::size_t longestAttribute = 4096;  // the kernel gives no more than a page
+constexpr std::size_t mostNames = 1U << 20U;
 
 // Empty, with errno, if there is none.
 std::string RealPathOf(const std::string& path) {
@@ -42,7 +42,7 @@ std::string SysfsReader::Shown(const std::string& path) const {
 }
 
 SysfsReader::Optional<std::string> SysfsReader::Bytes(const std::string& path, Refusal refusal) const {
-  return ReadWhole(_root + path, kLongestAttribute, refusal);
+  return ReadWhole(_root + path, longestAttribute, refusal);
 }
 
 SysfsReader::Optional<std::string> SysfsReader::Text(const std::string& path, Refusal refusal) const {
@@ -101,7 +101,7 @@ SysfsReader::Optional<std::vector<std::string>> SysfsReader::Folder(const std::s
     if (name != "." && name != "..") {
       names.emplace_back(name);
     }
-    if (names.size() > kMostNames) {
+    if (names.size() > mostNames) {
       return Optional<Names>::Unknown(Shown(path) + ": too many names");
     }
     errno = 0;

@@ -28,12 +28,12 @@ class Image {
   }
 
   Image& PutExt2(std::string_view label) {
-    constexpr std::size_t kSuperblock = 1024;
-    return PutNumber(kSuperblock + 4, _bytes.size() / 1024, 4)
-        .PutNumber(kSuperblock + 32, 8192, 4)
-        .PutNumber(kSuperblock + 56, 0xEF53, 2)
-        .PutNumber(kSuperblock + 76, 1, 4)
-        .Put(kSuperblock + 120, label);
+    constexpr std::size_t superblock = 1024;
+    return PutNumber(superblock + 4, _bytes.size() / 1024, 4)
+        .PutNumber(superblock + 32, 8192, 4)
+        .PutNumber(superblock + 56, 0xEF53, 2)
+        .PutNumber(superblock + 76, 1, 4)
+        .Put(superblock + 120, label);
   }
   Image& PutSwap(std::string_view label) {
     return PutNumber(1024, 1, 4).PutNumber(1028, 100, 4).Put(1052, label).Put(4086, "SWAPSPACE2");
@@ -54,23 +54,23 @@ class Image {
   }
   // With a protective table for those who do not know it.
   Image& PutGpt() {
-    constexpr std::size_t kSector = 512;
-    const std::uint64_t last = _bytes.size() / kSector - 1;
-    constexpr std::size_t kEntries = 128 * 128;
+    constexpr std::size_t sectorSize = 512;
+    const std::uint64_t last = _bytes.size() / sectorSize - 1;
+    constexpr std::size_t entriesSize = 128 * 128;
     PutDosTable(0xEE).PutNumber(446 + 8, 1, 4).PutNumber(446 + 12, last, 4);
-    Put(2 * kSector,
+    Put(2 * sectorSize,
         std::string_view("\xAF\x3D\xC6\x0F\x83\x84\x72\x47\x8E\x79\x3D\x69\xD8\x47\x7D\xE4", 16));
-    PutNumber(2 * kSector + 16, 1, 8)
-        .PutNumber(2 * kSector + 32, 2048, 8)
-        .PutNumber(2 * kSector + 40, 4095, 8);
-    Put(kSector, "EFI PART").PutNumber(kSector + 8, 0x10000, 4).PutNumber(kSector + 12, 92, 4);
-    PutNumber(kSector + 24, 1, 8).PutNumber(kSector + 32, last, 8);
-    PutNumber(kSector + 40, 34, 8)
-        .PutNumber(kSector + 48, last - 34, 8)
-        .Put(kSector + 56, "sixteen bytes id");
-    PutNumber(kSector + 72, 2, 8).PutNumber(kSector + 80, 128, 4).PutNumber(kSector + 84, 128, 4);
-    PutNumber(kSector + 88, Crc({_bytes.data() + 2 * kSector, kEntries}), 4);
-    return PutNumber(kSector + 16, Crc({_bytes.data() + kSector, 92}), 4);
+    PutNumber(2 * sectorSize + 16, 1, 8)
+        .PutNumber(2 * sectorSize + 32, 2048, 8)
+        .PutNumber(2 * sectorSize + 40, 4095, 8);
+    Put(sectorSize, "EFI PART").PutNumber(sectorSize + 8, 0x10000, 4).PutNumber(sectorSize + 12, 92, 4);
+    PutNumber(sectorSize + 24, 1, 8).PutNumber(sectorSize + 32, last, 8);
+    PutNumber(sectorSize + 40, 34, 8)
+        .PutNumber(sectorSize + 48, last - 34, 8)
+        .Put(sectorSize + 56, "sixteen bytes id");
+    PutNumber(sectorSize + 72, 2, 8).PutNumber(sectorSize + 80, 128, 4).PutNumber(sectorSize + 84, 128, 4);
+    PutNumber(sectorSize + 88, Crc({_bytes.data() + 2 * sectorSize, entriesSize}), 4);
+    return PutNumber(sectorSize + 16, Crc({_bytes.data() + sectorSize, 92}), 4);
   }
 
  private:

@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test clients check commits api-check bench growth soak door tls-check mutants build format-check format asan tsan shipped clang tidy fuzz clean
+.PHONY: help demo test clients check commits api-check bench growth soak door tls-check lab lab-programs mutants build format-check format asan tsan shipped clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -18,6 +18,7 @@ help:
 	@echo "make soak    an agent under mixed clients for SECONDS (180): its memory must stay flat"
 	@echo "make door    an agent with 2,000 clients at its doors who want nothing good: others are answered as in peace"
 	@echo "make tls-check  testssl on the agent: versions, suites, tickets, known weaknesses"
+	@echo "make lab     real disks in a virtual machine: the kernel's, unplugged and plugged; CASE=WORDS, LIST=1"
 	@echo "make build   the release build only: build/release"
 
 build:
@@ -140,6 +141,15 @@ tls-check:
 	@cmake --preset release >/dev/null
 	@cmake --build --preset release -j $(JOBS) --target agentd
 	@KOVA_BIN=$(CURDIR)/build/release/bin python3 -B tests/e2e/tls_check.py
+
+# A virtual machine with disks, and the programs of the dev build in it; all cases, or those with CASE in their names.
+lab: lab-programs
+	@python3 -B tests/lab/run.py $(if $(LIST),--list) --case "$(CASE)" build/lab build/dev
+
+lab-programs:
+	@$(SETUP) build lab
+	@cmake --preset dev >/dev/null
+	@cmake --build --preset dev -j $(JOBS) --target agentd kovactl
 
 # Changes the plug-in one place at a time and tells which changes no test sees: of COUNT (200) places, of the files
 # or folders FILE, or of ALL=1.

@@ -18,7 +18,7 @@ import guest
 
 LIMIT = 480  # seconds for all cases; booting and downloading have limits of their own
 # The order of the files is that of the run; every case leaves the machine as it found it.
-FILES = ("boot", "capture", "plug")
+FILES = ("boot", "capture", "plug", "inventory")
 
 
 def all_cases():

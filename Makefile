@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test clients check commits api-check bench growth soak door tls-check lab lab-programs mutants build format-check format asan tsan shipped clang tidy fuzz clean
+.PHONY: help demo test clients check commits api-check bench growth soak door tls-check lab lab-programs lab-record mutants build format-check format asan tsan shipped clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -150,6 +150,10 @@ lab-programs:
 	@$(SETUP) build lab
 	@cmake --preset dev >/dev/null
 	@cmake --build --preset dev -j $(JOBS) --target agentd kovactl
+
+# What unit tests read in place of a kernel and of a volume manager, recorded in that machine.
+lab-record: lab-programs
+	@python3 -B tests/lab/record.py build/lab build/dev otxctl/linux/testing/recorded
 
 # Changes the plug-in one place at a time and tells which changes no test sees: of COUNT (200) places, of the files
 # or folders FILE, or of ALL=1.

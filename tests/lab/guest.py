@@ -222,7 +222,7 @@ def boot(work, programs):
     os.makedirs(work, exist_ok=True)
     with emulator.only_machine(), tempfile.TemporaryDirectory(prefix="kova-lab-") as folder:
         try:
-            kernel, first = image.build(work, [os.path.join(programs, name) for name in TESTED])
+            kernel, first = image.build(work, programs, TESTED)
         except (image.Failed, packages.Failed) as failure:
             raise Failed(str(failure)) from failure
         command = arguments(work, folder, programs, kernel, first, make_disks(work))

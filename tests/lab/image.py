@@ -40,12 +40,13 @@ class Failed(Exception):
     """The image cannot be made; says why."""
 
 
-def build(work, tested):
-    """(kernel, first file system) in the folder `work`, good for programs that are like those `tested`."""
+def build(work, tested, names):
+    """(kernel, first file system) in the folder `work`, good for the programs of these names in the folder `tested`."""
     unpacked = os.path.join(work, "unpacked")
     packages.unpack(packages.fetch(os.path.join(work, "cache")), unpacked)
     sources = programs(unpacked)
-    libraries = needed_libraries([*sources.values(), *tested], unpacked)
+    files = [*sources.values(), *(os.path.join(tested, name) for name in names)]
+    libraries = [path for path in needed_libraries(files, unpacked) if not path.startswith(tested + "/")]
     name = digest([*sources.values(), *libraries, *glob.glob(HERE + "/*.py"), HERE + "/init",
                    os.path.join(unpacked, "unpacked-packages")])
     kernel, image = os.path.join(work, "vmlinux"), os.path.join(work, f"image-{name}.cpio")
@@ -102,15 +103,14 @@ def search_path(unpacked):
 
 
 def needed_libraries(files, unpacked):
-    """The libraries that programs need, but those that stand beside them in a build of this project."""
+    """The libraries that programs need, as the guest will find them."""
     found = set()
-    own = {os.path.dirname(os.path.dirname(file)) + "/lib/" for file in files if "/build/" in file}
     for file in files:
         listing = subprocess.run(["ldd", file], capture_output=True, text=True, check=False,
                                  env=os.environ | {"LD_LIBRARY_PATH": search_path(unpacked)})
         if listing.returncode != 0:
             raise Failed(f"ldd {file}: {listing.stderr}")
-        found.update(path for path in libraries_of(listing.stdout) if os.path.dirname(path) + "/" not in own)
+        found.update(libraries_of(listing.stdout))
     return sorted(found)
 
 

@@ -53,7 +53,6 @@ Mapping ReadMapping(const SysfsReader& reader, const std::string& path) {
 // What partitions have not, too: nobody asks it of them.
 void ReadWholeDevice(const SysfsReader& reader, BlockDevice& device) {
   const std::string& path = device.path;
-  device.sequence = TextOrEmpty(reader.Text(path + "/diskseq"));
   device.isRemovable = reader.RequiredFlag(path + "/removable");
   device.isHidden = reader.FlagOr(false, path + "/hidden");
   device.isRotational = reader.RequiredFlag(path + "/queue/rotational");
@@ -119,6 +118,8 @@ void BlockDevices::Read(const SysfsReader& reader, const std::string& name) {
     _notRead.push_back({name, "nobody knows: " + isPartition.WhyUnknown()});
     return;
   }
+  // First: should another disk take its place while the rest is read, that is seen by it in the end.
+  device.sequence = TextOrEmpty(reader.Text(device.path + "/diskseq"));
   device.number = reader.RequiredText(device.path + "/dev");
   device.bytes = Bytes(reader, device.path + "/size");
   device.isReadOnly = reader.RequiredFlag(device.path + "/ro");

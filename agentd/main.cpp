@@ -39,8 +39,13 @@ struct Options {
 
 void AddOptions(CLI::App& cli, Options& options) {
   cli.set_version_flag("--version", "agentd " + Host::VersionLine(), "Print version, build and API, and end");
-  cli.add_option("--host", options.machine.host,
-                 "Host description to serve; without one, an example host is served");
+  cli.add_option(
+      "--host", options.machine.host,
+      "Host to serve: linux for this machine, or a host description; without one, an example host is "
+      "served");
+  cli.add_option("--settings", options.machine.settings,
+                 "What no kernel knows of this machine: cluster, fault domain, networks, capacity flash")
+      ->capture_default_str();
   cli.add_flag("--save", options.machine.save, "Write every change of the host back to its description");
   cli.add_option("--ready-file", options.readyFile,
                  "File to write the addresses to, a line each, once they are answered on");
@@ -96,7 +101,7 @@ void Serve(Options& options) {
   }
   options.runtime.makeMachine = Machines::MachineOf(options.machine);
   Host::HostRuntime& runtime = Host::HostRuntime::Start(options.runtime);
-  const Host::KovaService service(runtime.Hooks(), runtime.GetSimulation());
+  const Host::KovaService service(runtime.Hooks(), runtime.GetSimulation(), runtime.GetFreshness());
   Agentd::TaskQueue tasks;
   Agentd::Router router(service, tasks);
   Agentd::HttpServer server(

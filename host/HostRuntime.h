@@ -6,6 +6,7 @@
 #include <string>
 
 #include "host/AgentApp.h"
+#include "host/Freshness.h"
 #include "host/Inventory.h"
 #include "host/Machine.h"
 #include "host/PluginLoader.h"
@@ -39,6 +40,10 @@ class HostRuntime {
   const PluginHooks& Hooks() const noexcept { return _hooks; }
   // The machine's, or null.
   Simulation* GetSimulation() noexcept { return _machine->GetSimulation(); }
+  // A simulated machine changes only by what this program does to it; others change by themselves.
+  Freshness GetFreshness() noexcept {
+    return GetSimulation() == nullptr ? Freshness::OfEachRequest : Freshness::OfLastChange;
+  }
 
  private:
   explicit HostRuntime(const RuntimeOptions& options);

@@ -260,12 +260,28 @@ Answer AnswerTo(const Orbis::DataObject& request, const PluginHooks& hooks) {
 
 }  // namespace
 
+// To read the storage is what makes the plug-in ask the kernel for the disks again.
+void KovaService::DropDiskCache() const {
+  std::string dropped;
+  _hooks.getStorageInfo(dropped);
+}
+
 Answer KovaService::Query(const Op::Query& request) const {
-  return AnswerTo(request, _hooks);
+  const bool isOfDisks = &request.GetType() == &Op::QueryDisksForKova::StaticType();
+  return isOfDisks ? AnswerFresh(request) : AnswerTo(request, _hooks);
 }
 
 Answer KovaService::Change(Op::Change&& request) const {
-  return AnswerTo(request, _hooks);
+  return AnswerFresh(request);
+}
+
+Answer KovaService::AnswerFresh(const Orbis::DataObject& request) const {
+  return Guarded([&] {
+    if (_freshness == Freshness::OfEachRequest) {
+      DropDiskCache();
+    }
+    return AnswerTo(request, _hooks);
+  });
 }
 
 Simulation& KovaService::Simulated() const {
@@ -295,8 +311,7 @@ Answer KovaService::ChangeHost(const std::string& change) const {
     }
     // The plug-in's cache of the disks must not be older than the host. This is done out here and not by the
     // machine's listener, which may run inside a hook that holds the plug-in's locks.
-    std::string dropped;
-    _hooks.getStorageInfo(dropped);
+    DropDiskCache();
     return Answer();
   });
 }

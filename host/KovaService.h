@@ -11,6 +11,7 @@
 #include <string>
 #include <string_view>
 
+#include "host/Freshness.h"
 #include "host/ManagementApi.h"
 #include "host/PluginLoader.h"
 
@@ -24,8 +25,9 @@ class KovaService final : public ManagementApi {
   // The hooks must be those of an initialised plug-in. `simulation` is that of the machine behind its
   // provider, if it has one, and outlives the service; DescribeHost and ChangeHost throw HostError without
   // it.
-  explicit KovaService(const PluginHooks& hooks, Simulation* simulation = nullptr)
-      : _hooks(hooks), _simulation(simulation) {}
+  explicit KovaService(const PluginHooks& hooks, Simulation* simulation = nullptr,
+                       Freshness freshness = Freshness::OfLastChange)
+      : _hooks(hooks), _simulation(simulation), _freshness(freshness) {}
 
   Answer Query(const Nox::Operation::Query& request) const override;
   Answer Change(Nox::Operation::Change&& request) const override;
@@ -35,9 +37,12 @@ class KovaService final : public ManagementApi {
 
  private:
   Simulation& Simulated() const;
+  void DropDiskCache() const;
+  Answer AnswerFresh(const Orbis::DataObject& request) const;
 
   PluginHooks _hooks;
   Simulation* _simulation;
+  Freshness _freshness;
 };
 
 }  // namespace Host

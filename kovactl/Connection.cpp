@@ -28,7 +28,8 @@ Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
 }
 
 std::unique_ptr<Host::ManagementApi> ServiceOf(Host::HostRuntime& runtime) {
-  return std::make_unique<Host::KovaService>(runtime.Hooks(), runtime.GetSimulation());
+  return std::make_unique<Host::KovaService>(runtime.Hooks(), runtime.GetSimulation(),
+                                             runtime.GetFreshness());
 }
 
 // What an agent of that address is asked with.

@@ -1,7 +1,7 @@
 // The machines that programs can serve, by what their users ask for.
 //
-// The one place that knows which kinds there are: today, simulated ones. A further kind is a folder or a file
-// beside this one, and its line in MakeMachine.
+// The one place that knows which kinds there are: simulated ones, and the machine that the program runs on. A
+// further kind is a folder or a file beside this one, and its line in MakeMachine.
 #pragma once
 
 #include <optional>
@@ -11,13 +11,17 @@
 
 namespace Machines {
 
-// As --host and --save give it.
+// What --host takes for the machine that the program runs on; a file of that name is "./linux".
+inline constexpr const char* thisMachine = "linux";
+
+// As --host, --save and --settings give it.
 struct MachineOptions {
-  std::string host = {};  // file of a host description; empty: the embedded example host
+  std::string host = {};  // thisMachine, or file of a host description; empty: the embedded example host
   // The description itself, instead of a file; it is never saved.
   std::optional<std::string> description = std::nullopt;
-  bool save = false;          // write every change of the host back to its file
-  bool waitForFaults = true;  // whether delays that the host has on demand are waited for
+  bool save = false;                             // write every change of the host back to its file
+  std::string settings = "/etc/kova/host.json";  // of this machine (HostSettingsFile.h)
+  bool waitForFaults = true;                     // whether delays that the host has on demand are waited for
 };
 
 // Throws Host::HostError, OtxCtl::Sim::HostFileError or OtxCtl::Sim::HostDescriptionError.

@@ -4,6 +4,7 @@
 #include <string>
 #include <vector>
 
+#include "machines/InventoryUnits.h"
 #include "nox/Host.h"
 #include "orbis/Types.h"
 #include "otxctl/sim/HostDescription.h"
@@ -16,30 +17,16 @@ using Nox::Host::ScsiDisk;
 using Nox::Host::ScsiLun;
 using Nox::Host::StorageDeviceInfo;
 using Orbis::DataArray;
-using Orbis::TextList;
 using OtxCtl::Sim::HostDescription;
 using OtxCtl::Sim::HostDisk;
 using Tessa::MakeRef;
 using Tessa::Ref;
-
-std::optional<std::string> UnlessEmpty(const std::string& text) {
-  return text.empty() ? std::nullopt : std::optional(text);
-}
 
 Ref<DurableName> ToDurableName(const OtxCtl::Sim::DurableName& name) {
   const auto durableName = MakeRef<DurableName>();
   durableName->SetAuthority(name.authority);
   durableName->SetIdentifier(name.identifier);
   return durableName;
-}
-
-void SetUnit(ScsiLun& unit, const std::string& name, const std::string& kind) {
-  unit.SetDeviceName(name);
-  unit.SetDeviceType(kind);
-  unit.SetUuid(name);
-  unit.SetCanonicalName(name);
-  unit.SetLunType(kind);
-  unit.SetOperationalState(MakeRef<TextList>(std::vector<std::string>{ScsiLun::STATE_OK}));
 }
 
 void SetIdentity(ScsiDisk& disk, const HostDisk& described) {
@@ -64,7 +51,7 @@ void SetIdentity(ScsiDisk& disk, const HostDisk& described) {
 
 Ref<ScsiDisk> ToDisk(const HostDisk& described) {
   const auto disk = MakeRef<ScsiDisk>();
-  SetUnit(*disk, described.name, ScsiLun::SCSILUNTYPE_DISK);
+  SetUnit(*disk, described.name, described.name, ScsiLun::SCSILUNTYPE_DISK);
   SetIdentity(*disk, described);
   disk->GetCapacity()->SetBlockSize(described.blockSize);
   disk->GetCapacity()->SetBlock(described.bytes / described.blockSize);
@@ -88,7 +75,8 @@ Ref<StorageDeviceInfo> DescribeInventory(const HostDescription& host) {
     Ref<ScsiLun> unit;
     if (host.otherLuns[i]) {
       unit = MakeRef<ScsiLun>();
-      SetUnit(*unit, *host.otherLuns[i] + std::to_string(i), *host.otherLuns[i]);
+      const std::string name = *host.otherLuns[i] + std::to_string(i);
+      SetUnit(*unit, name, name, *host.otherLuns[i]);
     }
     units->Append(unit);
   }

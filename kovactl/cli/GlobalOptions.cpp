@@ -40,10 +40,15 @@ void AddGlobalOptions(CLI::App& app, CommandLine& line) {
              "Agent to ask: unix:PATH, tls:HOST:PORT or tcp:ADDRESS:PORT; the environment's KOVA_AGENT "
              "unless given")
           ->capture_default_str();
-  auto* const host = app.add_option("--host", global.machine.host,
-                                    "Host description to work on in this process, without an agent")
-                         ->excludes(agent);
+  auto* const host =
+      app.add_option("--host", global.machine.host,
+                     "linux for this machine, or a host description: to work on in this process, "
+                     "without an agent")
+          ->excludes(agent);
   AddTlsOptions(app, global, host);
+  app.add_option("--settings", global.machine.settings,
+                 "Of this machine, what no kernel knows: cluster, networks, capacity flash")
+      ->capture_default_str();
   app.add_flag("--save", global.machine.save, "With --host, write changes back to the host description");
   app.add_option("-o,--output", global.output, "How to print: table, json or soap")
       ->check(CLI::IsMember({"table", "json", "soap"}))

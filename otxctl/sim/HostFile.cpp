@@ -178,12 +178,14 @@ HostFileWriter::HostFileWriter(const std::string& path, FolderSync syncFolder)
 }
 
 std::optional<std::string> HostFileWriter::Save(const HostDescription& host) const {
-  std::string text;
   try {
-    text = WriteHostDescription(host);
+    return SaveText(WriteHostDescription(host));
   } catch (const HostDescriptionError& error) {
     throw HostFileError(_path + ": " + error.what());
   }
+}
+
+std::optional<std::string> HostFileWriter::SaveText(std::string_view text) const {
   // Before anything is done: behind the renaming nothing may fail.
   const FileDescriptor folder = Open(FolderOf(_path), O_RDONLY | O_DIRECTORY, 0, "cannot be opened");
   NewFile file(_path);

@@ -8,6 +8,7 @@
 #include <optional>
 #include <stdexcept>
 #include <string>
+#include <string_view>
 
 #include "otxctl/sim/HostDescription.h"
 
@@ -60,6 +61,8 @@ class HostFileWriter {
   // to make the new name last takes nothing of that back, so it is no error: the warning that is returned
   // says that a power cut may bring the old file back. The next save that has none covers this one as well.
   [[nodiscard]] std::optional<std::string> Save(const HostDescription& host) const;
+  // The same with a text that is no host description, but lies in a file like one.
+  [[nodiscard]] std::optional<std::string> SaveText(std::string_view text) const;
 
  private:
   std::string _path;

@@ -22,8 +22,8 @@ constexpr std::array<std::string_view, 9> remoteTransports = {"iscsi", "fc",  "f
 constexpr std::array<std::string_view, 9> remoteSubsystems = {
     "iscsi", "iscsi_session", "iscsi_host", "fc", "fc_host", "rbd", "nbd", "aoe", "nvme-fabrics"};
 
-template <std::size_t Count>
-bool Contains(const std::array<std::string_view, Count>& table, std::string_view word) {
+template <std::size_t count>
+bool Contains(const std::array<std::string_view, count>& table, std::string_view word) {
   return std::find(table.begin(), table.end(), word) != table.end();
 }
 

@@ -30,8 +30,8 @@ constexpr std::array<std::string_view, 15> groundKinds = {
 constexpr std::string_view multipath = "mpath";
 constexpr std::string_view multipathMember = "mpath_member";
 
-template <std::size_t Count>
-bool Contains(const std::array<std::string_view, Count>& table, std::string_view word) {
+template <std::size_t count>
+bool Contains(const std::array<std::string_view, count>& table, std::string_view word) {
   return std::find(table.begin(), table.end(), word) != table.end();
 }
 

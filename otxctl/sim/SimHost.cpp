@@ -7,6 +7,7 @@
 
 #include "kova/agentd/include/HostCtlException.h"
 #include "otxctl/TaskScope.h"
+#include "otxctl/provider/NicRecords.h"
 #include "tessa/text/Escape.h"
 
 namespace OtxCtl::Sim {
@@ -16,34 +17,10 @@ using HostCtl::Kova::DiskMapping;
 using HostCtl::Kova::DiskResult;
 using HostCtl::Kova::FormatContext;
 using HostCtl::Kova::KovaClusterInfoDetailed;
-using HostCtl::Kova::KovaIpAddress;
 using HostCtl::Kova::KovaOtxNicConfig;
 using HostCtl::Kova::RemovalOptions;
 using HostCtl::Lib::HostCtlException;
 using Guard = std::lock_guard<std::mutex>;
-
-KovaIpAddress AddressOf(const std::string& text) {
-  KovaIpAddress address;
-  address.isIpv6 = text.find(':') != std::string::npos;
-  if (address.isIpv6) {
-    address.ipv6 = HostCtl::Network::Ipv6Address(text);
-  } else {
-    address.ipv4 = HostCtl::Network::Ipv4Address(text);
-  }
-  return address;
-}
-
-class SimNicConfig final : public KovaOtxNicConfig {
- public:
-  explicit SimNicConfig(HostNetwork network) : _network(std::move(network)) {}
-
-  std::string GetOtxnicName() const override { return _network.interface; }
-  KovaIpAddress GetMasterMulticastGroup() const override { return AddressOf(_network.masterMulticastGroup); }
-  KovaIpAddress GetAgentMulticastGroup() const override { return AddressOf(_network.agentMulticastGroup); }
-
- private:
-  HostNetwork _network;
-};
 
 HostDescription Checked(HostDescription host) {
   CheckHostDescription(host);
@@ -213,13 +190,11 @@ bool SimHost::IsAutoModeEnabled() {
 
 std::vector<KovaOtxNicConfig*> SimHost::GetKovaOtxNicConfigs() {
   return Read("GetKovaOtxNicConfigs", [](const SimRules& rules) {
-    std::vector<std::unique_ptr<KovaOtxNicConfig>> owned;
+    std::vector<Provider::NicGroups> nics;
     for (const HostNetwork& network : rules.Host().networks) {
-      owned.push_back(std::make_unique<SimNicConfig>(network));
+      nics.push_back({network.interface, network.masterMulticastGroup, network.agentMulticastGroup});
     }
-    std::vector<KovaOtxNicConfig*> records(owned.size());
-    std::transform(owned.begin(), owned.end(), records.begin(), [](auto& one) { return one.release(); });
-    return records;
+    return Provider::MakeNicRecords(nics);
   });
 }
 

@@ -1,0 +1,78 @@
+// The disks of this machine and KOVA's groups on them, looked at as a whole.
+//
+// Threads: any. One looks at a time; whoever asks meanwhile waits.
+#pragma once
+
+#include <chrono>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "otxctl/disks/DiskJudge.h"
+#include "otxctl/linux/Commands.h"
+#include "otxctl/linux/DiskGroups.h"
+#include "otxctl/linux/DiskScan.h"
+#include "otxctl/linux/HostSettings.h"
+
+namespace OtxCtl::Linux {
+
+// One look. Never changed.
+struct LinuxSnapshot {
+  std::vector<ScannedDisk> disks;
+  std::vector<Disks::DiskVerdict> verdicts;  // of the disks, in their order
+  std::vector<LeftOut> leftOut;
+  std::vector<DiskGroup> groups;  // in order of creation
+  HostSettings settings;
+
+  // "disk sda: ext4 file system" and the like, for who compares two looks.
+  friend bool operator==(const LinuxSnapshot& one, const LinuxSnapshot& other);
+};
+
+struct LinuxHostOptions {
+  SystemPaths paths;
+  std::string volumeManager = "/usr/sbin/lvm";
+  std::string machineId;
+  // Throws anything that says what is wrong.
+  std::function<HostSettings()> readSettings = [] { return HostSettings(); };
+  // A look that is younger answers the next question too; the questions of one operation come together.
+  std::chrono::milliseconds freshness = std::chrono::milliseconds(1000);
+};
+
+class LinuxHost {
+ public:
+  using Listener = std::function<void()>;
+
+  LinuxHost(LinuxHostOptions options, std::unique_ptr<DiskProbe> probe, std::unique_ptr<Commands> commands);
+
+  // A new look. Throws HostCtl::Lib::HostCtlException if the machine cannot be looked at; what was seen last
+  // stays.
+  std::shared_ptr<const LinuxSnapshot> Look();
+  // The last look if it is fresh, else a new one.
+  std::shared_ptr<const LinuxSnapshot> Current();
+  // The last one, however old; null: nobody has looked.
+  std::shared_ptr<const LinuxSnapshot> Last() const;
+
+  // Called after each look that differs from the one before, by the thread that looked.
+  void SetListener(Listener listener);
+
+ private:
+  using Clock = std::chrono::steady_clock;
+
+  LinuxSnapshot TakeSnapshot();
+  std::vector<DiskGroup> FindGroups(std::vector<ScannedDisk>& disks);
+  std::string Report(const char* command, const char* columns, const std::vector<ScannedDisk>& disks);
+
+  const LinuxHostOptions _options;
+  const std::unique_ptr<DiskProbe> _probe;
+  const std::unique_ptr<Commands> _commands;
+  std::mutex _looking;  // held while somebody looks
+  mutable std::mutex _mutex;
+  std::shared_ptr<const LinuxSnapshot> _last;
+  Clock::time_point _lookedAt;
+  Listener _listener;
+};
+
+}  // namespace OtxCtl::Linux

@@ -1,0 +1,183 @@
+#include "otxctl/linux/LinuxProvider.h"
+
+#include <unordered_map>
+#include <unordered_set>
+
+#include "kova/agentd/include/HostCtlException.h"
+#include "otxctl/provider/NicRecords.h"
+
+namespace OtxCtl::Linux {
+namespace {
+
+using HostCtl::Kova::DiskMapping;
+using HostCtl::Kova::DiskName;
+using HostCtl::Kova::DiskReason;
+using HostCtl::Kova::DiskResult;
+using HostCtl::Kova::DiskState;
+
+constexpr std::uint8_t groupFormatVersion = 3;
+
+[[noreturn]] void RefuseChange() {
+  throw HostCtl::Lib::HostCtlException(
+      "the disks of this machine can only be looked at: nothing was changed");
+}
+
+DiskName NameOf(const GroupMember& member) {
+  return {member.canonicalName, member.kovaUuid};
+}
+
+// Of each member that is there, by its canonical name, and of each that is not.
+struct Members {
+  std::unordered_map<std::string, std::string> uuidOf;
+  std::vector<DiskResult> absent;
+
+  explicit Members(const std::vector<DiskGroup>& groups) {
+    for (const DiskGroup& group : groups) {
+      Add(group.cache, group);
+      for (const GroupMember& member : group.capacity) {
+        Add(member, group);
+      }
+    }
+  }
+
+ private:
+  void Add(const GroupMember& member, const DiskGroup& group) {
+    if (!member.canonicalName.empty()) {
+      uuidOf.emplace(member.canonicalName, member.kovaUuid);
+      return;
+    }
+    DiskResult record;
+    record.kovaUuid = member.kovaUuid;
+    record.state = group.isMounted ? DiskState::InUse : DiskState::Ineligible;
+    record.reason = group.isMounted ? DiskReason::None : DiskReason::GroupNotMounted;
+    record.isSsd = member.isFlash;
+    record.isPdl = true;
+    record.formatVersion = groupFormatVersion;
+    absent.push_back(std::move(record));
+  }
+};
+
+bool IsAllFlash(const DiskGroup& group) {
+  for (const GroupMember& member : group.capacity) {
+    if (!member.isFlash) {
+      return false;
+    }
+  }
+  return true;
+}
+
+}  // namespace
+
+void LinuxProvider::QueryDisks(const std::vector<std::string>& names, std::vector<DiskResult>& results,
+                               bool) {
+  const auto seen = _host->Current();
+  const Members members(seen->groups);
+  const std::unordered_set<std::string> wanted(names.begin(), names.end());
+  const auto isWanted = [&wanted](const std::string& name) {
+    return wanted.empty() || wanted.count(name) > 0;
+  };
+  for (std::size_t index = 0; index < seen->disks.size(); ++index) {
+    const Disks::DiskFacts& facts = seen->disks[index].facts;
+    if (!isWanted(facts.canonicalName)) {
+      continue;
+    }
+    const auto uuid = members.uuidOf.find(facts.canonicalName);
+    DiskResult& record = results.emplace_back();
+    record.name = facts.canonicalName;
+    record.state = seen->verdicts[index].state;
+    record.reason = seen->verdicts[index].reason;
+    record.isSsd = facts.isFlash.Is(true);
+    record.capacityFlash = record.isSsd && seen->settings.capacityFlash.count(record.name) > 0;
+    if (uuid != members.uuidOf.end()) {
+      record.kovaUuid = uuid->second;
+      record.formatVersion = groupFormatVersion;
+    }
+  }
+  if (isWanted("")) {
+    results.insert(results.end(), members.absent.begin(), members.absent.end());
+  }
+}
+
+void LinuxProvider::GetDiskMappings(std::vector<DiskMapping>& mappings, bool withUnmounted) {
+  for (const DiskGroup& group : _host->Current()->groups) {
+    if (!group.isMounted && !withUnmounted) {
+      continue;
+    }
+    DiskMapping& mapping = mappings.emplace_back();
+    mapping.ssd = NameOf(group.cache);
+    for (const GroupMember& member : group.capacity) {
+      mapping.capacityDisks.push_back(NameOf(member));
+    }
+    mapping.formatVersion = groupFormatVersion;
+    mapping.allFlash = IsAllFlash(group);
+    mapping.thirdFlag = !group.isMounted;
+  }
+}
+
+void LinuxProvider::FormatDiskMapping(const std::string&, const std::vector<std::string>&,
+                                      const HostCtl::Kova::FormatContext&) {
+  RefuseChange();
+}
+
+void LinuxProvider::RestampDiskMapping(const std::string&, const std::vector<std::string>&) {
+  RefuseChange();
+}
+
+void LinuxProvider::MountDiskMapping(const std::string&, bool) {
+  RefuseChange();
+}
+
+void LinuxProvider::RestampDiskMappingByUuid(const std::string&) {
+  RefuseChange();
+}
+
+void LinuxProvider::RemoveDisk(const std::string&, const std::string&, const HostCtl::Kova::RemovalOptions&) {
+  RefuseChange();
+}
+
+void LinuxProvider::RemoveDiskMapping(const std::string&, const std::string&,
+                                      const HostCtl::Kova::RemovalOptions&) {
+  RefuseChange();
+}
+
+void LinuxProvider::UnmountDiskMapping(const std::string&) {
+  RefuseChange();
+}
+
+void LinuxProvider::RemoveDiskByUuid(const std::string&, const std::string&) {
+  RefuseChange();
+}
+
+bool LinuxProvider::IsAutoModeEnabled() {
+  return false;
+}
+
+std::vector<HostCtl::Kova::KovaOtxNicConfig*> LinuxProvider::GetKovaOtxNicConfigs() {
+  return Provider::MakeNicRecords(_host->Current()->settings.nics);
+}
+
+void LinuxProvider::GetClusterInfoDetailed(HostCtl::Kova::KovaClusterInfoDetailed& info) {
+  const auto seen = _host->Current();
+  info = {};
+  info.enabled = seen->settings.isInCluster;
+  info.clusterUuid = seen->settings.clusterUuid;
+  info.nodeUuid = seen->settings.nodeUuid;
+}
+
+std::string LinuxProvider::GetFaultDomainName() {
+  return _host->Current()->settings.faultDomain;
+}
+
+void LinuxProvider::ClaimUnmountedDiskgroups() {
+  for (const DiskGroup& group : _host->Current()->groups) {
+    if (!group.isMounted) {
+      RefuseChange();
+    }
+  }
+}
+
+void LinuxProvider::RefreshKovaInfo() {
+  _host->Look();
+}
+
+}  // namespace OtxCtl::Linux

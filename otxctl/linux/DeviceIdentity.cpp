@@ -50,9 +50,26 @@ Text ReadScsiSerial(const SysfsReader& reader, const std::string& device) {
   return TextOrEmpty(reader.Text(device + "/serial", Refusal::MeansNone));
 }
 
+// What is attached by USB has the number of the USB device on the way to it.
+Text ReadUsbSerial(const SysfsReader& reader, const std::string& device) {
+  constexpr std::string_view usb = "/usb";
+  for (std::string_view path = device; path.find(usb) != std::string_view::npos; path = ParentPath(path)) {
+    const std::string folder(path);
+    const Fact<bool> isUsbDevice = reader.Exists(folder + "/idVendor");
+    if (!isUsbDevice.IsKnown()) {
+      return Text::Unknown(isUsbDevice.WhyUnknown());
+    }
+    if (isUsbDevice.Get()) {
+      return TextOrEmpty(reader.Text(folder + "/serial", Refusal::MeansNone));
+    }
+  }
+  return {std::string()};
+}
+
 Text ReadSerial(const SysfsReader& reader, const BlockDevice& device, const std::string& kind) {
   if (kind == "scsi") {
-    return ReadScsiSerial(reader, device.device.Get());
+    const Text serial = ReadScsiSerial(reader, device.device.Get());
+    return serial.Is("") ? ReadUsbSerial(reader, device.device.Get()) : serial;
   }
   const std::string folder = kind == "virtio" || kind.empty() ? device.path : device.device.Get();
   return TextOrEmpty(reader.Text(folder + "/serial", Refusal::MeansNone));

@@ -66,6 +66,19 @@ TEST_F(DeviceIdentityTest, WithoutAPageTheSerialNumberIsAnAttribute) {
   EXPECT_EQ(Told(), "|LAB|HDD|S2") << "blanks are no serial number";
 }
 
+TEST_F(DeviceIdentityTest, OnUsbWithoutANumberOfItsOwnADiskHasThatOfTheUsbDevice) {
+  const std::string device = DeviceOf(_tree.AddUsbDisk("sda", {}));
+  const std::string usb = device.substr(0, device.find("/2-1/") + 4);
+  _tree.Write(usb.substr(0, usb.rfind('/')) + "/serial", "of the hub\n");
+  EXPECT_EQ(Told(), "|LAB|HDD|") << "what has no vendor's id is no USB device";
+  _tree.Write(usb + "/idVendor", "46f4\n");
+  EXPECT_EQ(Told(), "|LAB|HDD|");
+  _tree.Write(usb + "/serial", "STICK1\n");
+  EXPECT_EQ(Told(), "|LAB|HDD|STICK1");
+  _tree.Write(device + "/vpd_pg80", std::string("\0\x80\0\x02S1", 6));
+  EXPECT_EQ(Told(), "|LAB|HDD|S1");
+}
+
 TEST_F(DeviceIdentityTest, APartThatCannotBeReadMakesAllOfItUnknown) {
   const std::string device = DeviceOf(_tree.AddScsiDisk("sda", {.worldWideName = "naa.1", .serial = "S1"}));
   for (const char* const name : {"/wwid", "/vpd_pg80", "/vendor", "/model"}) {

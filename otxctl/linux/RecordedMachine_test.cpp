@@ -50,7 +50,7 @@ TEST_F(RecordedMachine, OffersWhatNobodyUsesAndNothingElse) {
                           Pair("naa.5000c50000000300", "1 partition"), Pair("naa.5000c50000000400", "free"),
                           Pair("naa.5000c50000000600", two), Pair("naa.5000c50000000600.2", two),
                           Pair(StartsWith("nvme."), "free"),
-                          Pair(StartsWith("path.pci-"), StartsWith("attached by USB, hot-plug"))));
+                          Pair("t10.QEMU_QEMU_HARDDISK_USBSTICK0001", StartsWith("attached by USB, hot-plug"))));
 }
 
 TEST_F(RecordedMachine, TellsKindsAndPlacesOfItsDisks) {

@@ -6,7 +6,6 @@ import disks
 import verdicts
 from case import case, expect
 
-WAITS = "an agent that serves the disks of the machine it runs on (agentd --host linux)"
 SOCKET = "/run/agentd.sock"
 
 
@@ -23,20 +22,20 @@ def agent(machine):
         machine.eventually("the agent has ended", lambda: machine.run("kill -0 $(cat /run/agentd.pid)").status != 0)
 
 
-@case(waits_for=WAITS)
+@case()
 def the_agent_tells_each_disk_with_its_verdict_and_in_words_why_not(machine):
     with agent(machine) as told:
         expect.assertEqual(verdicts.disagreements(told()), [])
 
 
-@case(waits_for=WAITS)
+@case()
 def the_agent_calls_disks_by_their_world_wide_names(machine):
     with agent(machine) as told:
         names = {result["disk"]["canonicalName"] for result in told()}
     expect.assertEqual({disk.wwid for disk in disks.DISKS if disk.wwid} - names, set())
 
 
-@case(waits_for=WAITS)
+@case()
 def a_disk_that_goes_and_comes_is_told_of_within_seconds(machine):
     with agent(machine) as told:
         machine.unplug("hdd3")
@@ -46,7 +45,7 @@ def a_disk_that_goes_and_comes_is_told_of_within_seconds(machine):
                            lambda: verdicts.faults(told()).get("HDD0000203") == [None])
 
 
-@case(waits_for=WAITS)
+@case()
 def a_disk_with_two_paths_is_free_once_only_one_is_left(machine):
     with agent(machine) as told:
         machine.unplug("twice_b")
@@ -56,7 +55,7 @@ def a_disk_with_two_paths_is_free_once_only_one_is_left(machine):
                            lambda: verdicts.disagreements(told()) == [])
 
 
-@case(waits_for=WAITS)
+@case()
 def the_agent_and_lsblk_agree_on_size_kind_and_transport(machine):
     with agent(machine) as told:
         results = verdicts.by_serial(told())
@@ -69,7 +68,7 @@ def the_agent_and_lsblk_agree_on_size_kind_and_transport(machine):
                 expect.assertEqual(disk.get("transport"), device["tran"], device["serial"])
 
 
-@case(waits_for=WAITS)
+@case()
 def an_import_of_this_machine_gives_the_verdicts_of_its_agent(machine):
     with agent(machine) as told:
         live = verdicts.faults(told())

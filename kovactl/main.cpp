@@ -20,6 +20,7 @@ void AddEverything(CLI::App& app, CommandLine& line) {
   Kovactl::AddPlanCommands(app, line);
   Kovactl::AddSimCommands(app, line);
   Kovactl::AddHostCommands(app, line);
+  Kovactl::AddCapacityFlashCommands(app, line);
   Kovactl::AddReplayCommand(app, line);
   app.footer(
       "Exit status: 0 done; 1 the host answered with a fault; 2 usage or bad input, or no consent;\n"

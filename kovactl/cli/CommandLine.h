@@ -21,11 +21,12 @@ struct CommandLine {
 };
 
 void AddGlobalOptions(CLI::App& app, CommandLine& line);
-void AddReportCommands(CLI::App& app, CommandLine& line);  // disks, groups, config, tasks
-void AddChangeCommands(CLI::App& app, CommandLine& line);  // add .. claim
-void AddPlanCommands(CLI::App& app, CommandLine& line);    // plan add .. plan claim
-void AddSimCommands(CLI::App& app, CommandLine& line);     // sim set ..
-void AddHostCommands(CLI::App& app, CommandLine& line);    // host import, host check
+void AddReportCommands(CLI::App& app, CommandLine& line);         // disks, groups, config, tasks
+void AddChangeCommands(CLI::App& app, CommandLine& line);         // add .. claim
+void AddPlanCommands(CLI::App& app, CommandLine& line);           // plan add .. plan claim
+void AddSimCommands(CLI::App& app, CommandLine& line);            // sim set ..
+void AddHostCommands(CLI::App& app, CommandLine& line);           // host import, host check
+void AddCapacityFlashCommands(CLI::App& app, CommandLine& line);  // capacity-flash set, clear
 void AddReplayCommand(CLI::App& app, CommandLine& line);
 
 ChangeOptions OptionsOf(const GlobalOptions& global);

@@ -11,16 +11,23 @@ using Disks::Attachment;
 using Disks::Connection;
 using Disks::Fact;
 
-// Buses inside a machine, as the kernel calls them, and ways that end at one.
-constexpr std::array<std::string_view, 12> buses = {"pci", "platform", "acpi", "amba", "virtio", "vmbus",
-                                                    "xen", "vio",      "ccw",  "css",  "pnp",    "of"};
+// Buses inside a machine, as the kernel calls them.
+constexpr std::array<std::string_view, 13> buses = {"pci",    "pci_express", "platform", "acpi", "amba",
+                                                    "virtio", "vmbus",       "xen",      "vio",  "ccw",
+                                                    "css",    "pnp",         "of"};
+// What stands between a disk and its bus. Anything else there may be a network: who comes by InfiniBand hangs
+// on a card of PCI in the end.
+constexpr std::array<std::string_view, 3> betweenBusAndDisk = {"block", "scsi", "nvme"};
+// Ways that end at a bus of the machine.
 constexpr std::array<std::string_view, 9> localTransports = {"ata",  "sata", "pata", "sas",   "spi",
                                                              "nvme", "pcie", "ufs",  "virtio"};
 
 constexpr std::array<std::string_view, 9> remoteTransports = {"iscsi", "fc",  "fcoe", "srp", "rbd",
                                                               "nbd",   "aoe", "tcp",  "rdma"};
-constexpr std::array<std::string_view, 9> remoteSubsystems = {
-    "iscsi", "iscsi_session", "iscsi_host", "fc", "fc_host", "rbd", "nbd", "aoe", "nvme-fabrics"};
+constexpr std::array<std::string_view, 11> remoteSubsystems = {
+    "iscsi", "iscsi_session", "iscsi_host",  "fc",           "fc_host",       "rbd",
+    "nbd",   "aoe",           "rnbd-client", "nvme-fabrics", "infiniband_srp"};
+constexpr std::array<std::string_view, 4> cardSubsystems = {"mmc", "mmc_host", "memstick", "memstick_host"};
 
 template <std::size_t count>
 bool Contains(const std::array<std::string_view, count>& table, std::string_view word) {
@@ -46,6 +53,20 @@ bool HangsOn(const LsblkDevice& device, std::string_view subsystem) {
   return AnyWord(device.subsystems, [subsystem](std::string_view word) { return word == subsystem; });
 }
 
+template <std::size_t count>
+bool HangsOnAny(const LsblkDevice& device, const std::array<std::string_view, count>& subsystems) {
+  return AnyWord(device.subsystems,
+                 [&subsystems](std::string_view word) { return Contains(subsystems, word); });
+}
+
+// A positive rule: a bus must be there, and nothing that is not understood.
+bool IsInMachine(const LsblkDevice& device) {
+  const bool isStrange = AnyWord(device.subsystems, [](std::string_view word) {
+    return !Contains(buses, word) && !Contains(betweenBusAndDisk, word);
+  });
+  return !isStrange && HangsOnAny(device, buses);
+}
+
 }  // namespace
 
 Fact<Connection> ConnectionOf(const LsblkDevice& device) {
@@ -56,19 +77,16 @@ Fact<Connection> ConnectionOf(const LsblkDevice& device) {
   if (transport == "sbp" || HangsOn(device, "ieee1394") || HangsOn(device, "firewire")) {
     return Connection{Attachment::FireWire, transport};
   }
-  if (transport == "mmc" || HangsOn(device, "mmc") || HangsOn(device, "mmc_host")) {
+  if (transport == "mmc" || HangsOnAny(device, cardSubsystems)) {
     return Connection{Attachment::MemoryCard, transport};
   }
-  const bool isRemote =
-      Contains(remoteTransports, transport) ||
-      AnyWord(device.subsystems, [](std::string_view word) { return Contains(remoteSubsystems, word); });
-  if (isRemote) {
+  if (Contains(remoteTransports, transport) || HangsOnAny(device, remoteSubsystems)) {
     return Connection{Attachment::Remote, transport};
   }
   if (device.subsystems.empty()) {
     return Fact<Connection>::Unknown("the capture has no SUBSYSTEMS of " + device.name);
   }
-  if (!AnyWord(device.subsystems, [](std::string_view word) { return Contains(buses, word); })) {
+  if (!IsInMachine(device)) {
     return Fact<Connection>::Unknown("what " + device.name + " is attached to (" + device.subsystems + ")");
   }
   if (!transport.empty() && !Contains(localTransports, transport)) {

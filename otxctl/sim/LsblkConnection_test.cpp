@@ -42,6 +42,12 @@ TEST(LsblkConnection, IsWhatTheDeviceIsSeenToHangOn) {
                          Row{"fcoe", "block:scsi:pci", Attachment::Remote},
                          Row{"srp", "block:scsi:pci", Attachment::Remote},
                          Row{"", "block:rbd", Attachment::Remote},
+                         Row{"", "block:scsi:infiniband_srp:pci", Attachment::Remote},
+                         Row{"", "block:memstick:memstick_host:pci", Attachment::MemoryCard},
+                         Row{"nvme", "block:nvme:pci:vmbus:acpi", Attachment::Machine},
+                         Row{"virtio", "block:virtio:ccw:css", Attachment::Machine},
+                         Row{"pcie", "block:nvme:pci", Attachment::Machine},
+                         Row{"", "block:scsi:vio", Attachment::Machine},
                          Row{"tcp", "block:nvme:nvme-fabrics", Attachment::Remote},
                          Row{"nvme", "block:nvme:nvme-fabrics", Attachment::Remote}}) {
     const auto connection = ConnectionOf(Attached(row.transport, row.subsystems));
@@ -60,6 +66,10 @@ TEST(LsblkConnection, OfWhatIsNotSeenToHangOnABusNobodyKnows) {
   EXPECT_EQ(why("", ""), "the capture has no SUBSYSTEMS of sda");
   EXPECT_EQ(why("nvme", "block:nvme-subsystem"), "what sda is attached to (block:nvme-subsystem)");
   EXPECT_EQ(why("", "block:scsi:pseudo"), "what sda is attached to (block:scsi:pseudo)");
+  EXPECT_EQ(why("", "block:scsi:fabric:pci"), "what sda is attached to (block:scsi:fabric:pci)")
+      << "a bus in the end does not make a way known";
+  EXPECT_EQ(why("", "block:mtd:platform"), "what sda is attached to (block:mtd:platform)");
+  EXPECT_EQ(why("", "block:nd:acpi"), "what sda is attached to (block:nd:acpi)");
   EXPECT_EQ(why("", "block"), "what sda is attached to (block)");
   EXPECT_EQ(why("teleport", "block:scsi:pci"), "whether teleport is a way to a local disk");
 }

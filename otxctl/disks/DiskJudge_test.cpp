@@ -234,6 +234,11 @@ TEST(DiskJudge, WhereANameIsMissingModelAndSerialNumberTellTheDisk) {
   EXPECT_FALSE(eligible({"", "", "HDD", "S1"}, {"", "LAB", "HDD", "S1"}));
   EXPECT_FALSE(eligible({"naa.1", "", "HDD", "S1"}, {"", "", "HDD", "S1"}));
   EXPECT_TRUE(eligible({"", "", "HDD", "S1"}, {"", "", "SSD", "S1"}));
+  EXPECT_FALSE(eligible({"", "", "HDD", "S1"}, {"", "", "", "S1"})) << "a model that is not told may be it";
+  EXPECT_FALSE(eligible({"naa.1", "", "HDD", "S1"}, {"", "", "", "S1"}));
+  EXPECT_FALSE(eligible({"naa.1", "", "", "S1"}, {"", "", "HDD", "S1"}));
+  EXPECT_TRUE(eligible({"naa.1", "", "HDD", "S1"}, {"naa.2", "", "", "S1"}));
+  EXPECT_TRUE(eligible({"", "", "HDD", "S1"}, {"", "", "", "S2"}));
   EXPECT_TRUE(eligible({"", "", "HDD", "S1"}, {"", "", "HDD", "S2"}));
   // Two namespaces of one controller have its serial number.
   EXPECT_TRUE(eligible({"eui.1", "", "HDD", "S1"}, {"eui.2", "", "HDD", "S1"}));

@@ -8,8 +8,8 @@ namespace {
 constexpr std::size_t mostNamed = 3;  // twins that are named; of more, the number is told
 
 // A zero byte stands in neither text.
-std::string SerialKey(const DiskIdentity& identity) {
-  return identity.model + '\0' + identity.serial;
+std::string SerialKey(const std::string& model, const std::string& serial) {
+  return model + '\0' + serial;
 }
 
 std::string PathsInWords(std::size_t paths) {
@@ -32,9 +32,18 @@ DiskTwins::DiskTwins(const std::vector<DiskFacts>& disks) : _disks(disks) {
       Add(index, _byName[identity.worldWideName]);
     }
     if (!identity.serial.empty()) {
-      SameSerial& same = _bySerial[SerialKey(identity)];
-      Add(index, isNamed ? same.named : same.unnamed);
+      AddSerial(index, isNamed);
     }
+  }
+}
+
+void DiskTwins::AddSerial(std::size_t index, bool isNamed) {
+  const DiskIdentity& identity = _disks[index].identity.Get();
+  SameSerial& same = _bySerial[SerialKey(identity.model, identity.serial)];
+  Add(index, isNamed ? same.named : same.unnamed);
+  if (!identity.model.empty()) {
+    SameSerial& any = _ofAnyModel[identity.serial];
+    Add(index, isNamed ? any.named : any.unnamed);
   }
 }
 
@@ -70,6 +79,32 @@ std::string DiskTwins::NameOf(std::size_t index) const {
   return _disks[index].canonicalName + " (" + _disks[index].kernelName + ")";
 }
 
+// Lists of devices that are the disk itself or its twins. The device of the disk itself is in one of them.
+std::vector<const DiskTwins::Devices*> DiskTwins::LikeIt(std::size_t index) const {
+  const DiskIdentity& identity = _disks[index].identity.Get();
+  const bool isNamed = !identity.worldWideName.empty();
+  std::vector<const Devices*> all;
+  const auto addSame = [&](const std::unordered_map<std::string, SameSerial>& serials,
+                           const std::string& key) {
+    const auto found = serials.find(key);
+    if (found != serials.end()) {
+      if (!isNamed) {
+        all.push_back(&found->second.named);
+      }
+      all.push_back(&found->second.unnamed);
+    }
+  };
+  if (isNamed) {
+    all.push_back(&_byName.at(identity.worldWideName));
+  }
+  if (!identity.serial.empty()) {
+    addSame(_bySerial, SerialKey(identity.model, identity.serial));
+    identity.model.empty() ? addSame(_ofAnyModel, identity.serial)
+                           : addSame(_bySerial, SerialKey("", identity.serial));
+  }
+  return all;
+}
+
 std::string DiskTwins::WordsFor(std::size_t index) const {
   for (std::size_t i = 0; i < _unidentified.size() && i < 2; ++i) {
     if (_unidentified[i] != index) {
@@ -79,18 +114,10 @@ std::string DiskTwins::WordsFor(std::size_t index) const {
   if (!_disks[index].identity.IsKnown()) {
     return {};
   }
-  const DiskIdentity& identity = _disks[index].identity.Get();
-  const bool isNamed = !identity.worldWideName.empty();
-  static const Devices none;
-  static const SameSerial noSerial;
-  const Devices& sameName = isNamed ? _byName.at(identity.worldWideName) : none;
-  const SameSerial& sameSerial = identity.serial.empty() ? noSerial : _bySerial.at(SerialKey(identity));
-  const Devices& named = isNamed ? none : sameSerial.named;
-
   std::string words;
   std::size_t told = 0;
   std::size_t others = 0;
-  for (const Devices* const devices : {&sameName, &named, &sameSerial.unnamed}) {
+  for (const Devices* const devices : LikeIt(index)) {
     others += devices->size();
     for (std::size_t i = 0; i < devices->size() && told < mostNamed; ++i) {
       const std::size_t other = (*devices)[i];

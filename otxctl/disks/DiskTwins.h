@@ -12,8 +12,9 @@
 namespace OtxCtl::Disks {
 
 // Two disks of one world wide name are the same; where one of them has none, two of the same model and serial
-// number. A multipath device and its paths are one device, so not twins of each other. A disk of which nobody
-// knows what identifies it may be the twin of any other.
+// number, and of the same serial number if one of them tells no model. A multipath device and its paths are
+// one device, so not twins of each other. A disk of which nobody knows what identifies it may be the twin of
+// any other.
 class DiskTwins {
  public:
   // Keeps a reference to `disks`.
@@ -31,13 +32,16 @@ class DiskTwins {
   };
 
   void FindDevices();
+  void AddSerial(std::size_t index, bool isNamed);
   void Add(std::size_t index, Devices& devices) const;
+  std::vector<const Devices*> LikeIt(std::size_t index) const;
   std::string NameOf(std::size_t index) const;
 
   const std::vector<DiskFacts>& _disks;
   std::vector<std::size_t> _deviceOf;  // a path has the number of its map
   std::unordered_map<std::string, Devices> _byName;
-  std::unordered_map<std::string, SameSerial> _bySerial;
+  std::unordered_map<std::string, SameSerial> _bySerial;    // and model, if it tells one
+  std::unordered_map<std::string, SameSerial> _ofAnyModel;  // those that tell one, by serial number alone
   Devices _unidentified;
 };
 

@@ -6,6 +6,7 @@
 #include <limits>
 #include <nlohmann/json.hpp>
 #include <unordered_map>
+#include <unordered_set>
 #include <utility>
 
 #include "otxctl/sim/HostDescriptionError.h"
@@ -105,10 +106,12 @@ class DeviceReader {
 
   // "mountpoints" is a list that holds null for a device that is not mounted; old versions have one text.
   std::vector<std::string> Mounts() const {
+    constexpr std::size_t enough = 8;
     std::vector<std::string> mounts;
     const auto add = [&](const json& value, const char* key) {
       std::string mount = value.is_null() ? std::string() : TextOf(value, key);
-      if (!mount.empty() && std::find(mounts.begin(), mounts.end(), mount) == mounts.end()) {
+      if (!mount.empty() && mounts.size() < enough &&
+          std::find(mounts.begin(), mounts.end(), mount) == mounts.end()) {
         mounts.push_back(std::move(mount));
       }
     };
@@ -215,6 +218,12 @@ void AddTableOfUuid(const DeviceReader& reader, LsblkDevice& device) {
 class DeviceList {
  public:
   void Add(LsblkDevice device) {
+    // A zero byte stands in no name.
+    const auto isKnownParent = [&](const std::string& parent) {
+      return !_parents.insert(device.kernelName + '\0' + parent).second;
+    };
+    device.parents.erase(std::remove_if(device.parents.begin(), device.parents.end(), isKnownParent),
+                         device.parents.end());
     const auto [position, isNew] = _positions.try_emplace(device.kernelName, _devices.size());
     if (isNew) {
       _devices.push_back(std::move(device));
@@ -230,7 +239,7 @@ class DeviceList {
     if (known.type != again.type) {
       Refuse(again.path, "is " + known.name + " of " + known.path + " again, with another type");
     }
-    Unite(known.parents, again.parents);
+    known.parents.insert(known.parents.end(), again.parents.begin(), again.parents.end());
     Unite(known.mounts, again.mounts);
     Unite(known.otherTraces, again.otherTraces);
     Unite(known.missingColumns, again.missingColumns);
@@ -254,9 +263,11 @@ class DeviceList {
     }
   }
 
+  // Of very many, some: one is enough to rule a disk out.
   static void Unite(std::vector<std::string>& known, const std::vector<std::string>& again) {
+    constexpr std::size_t enough = 32;
     for (const std::string& text : again) {
-      if (std::find(known.begin(), known.end(), text) == known.end()) {
+      if (known.size() < enough && std::find(known.begin(), known.end(), text) == known.end()) {
         known.push_back(text);
       }
     }
@@ -271,6 +282,7 @@ class DeviceList {
 
   std::vector<LsblkDevice> _devices;
   std::unordered_map<std::string, std::size_t> _positions;
+  std::unordered_set<std::string> _parents;  // of which device, and which
 };
 
 // Depth is bounded by the limits of the document.
@@ -283,9 +295,10 @@ void ReadDevices(const json& list, const std::string& path, const std::string& p
     const DeviceReader reader(list[index], devicePath);
     LsblkDevice device = ReadDevice(reader, devicePath);
     AddTableOfUuid(reader, device);
-    const std::string below = parent.empty() ? reader.DeviceName("pkname") : parent;
-    if (!below.empty()) {
-      device.parents.push_back(below);
+    for (const std::string& below : {parent, reader.DeviceName("pkname")}) {
+      if (!below.empty() && std::count(device.parents.begin(), device.parents.end(), below) == 0) {
+        device.parents.push_back(below);
+      }
     }
     const std::string kernelName = device.kernelName;
     devices.Add(std::move(device));

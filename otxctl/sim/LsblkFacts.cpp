@@ -6,12 +6,14 @@
 #include <optional>
 #include <string_view>
 #include <unordered_map>
+#include <unordered_set>
 #include <utility>
 
 #include "otxctl/disks/DiskNames.h"
 #include "otxctl/disks/SignatureWords.h"
 #include "otxctl/sim/HostDescriptionError.h"
 #include "otxctl/sim/LsblkConnection.h"
+#include "otxctl/sim/LsblkStack.h"
 
 namespace OtxCtl::Sim {
 namespace {
@@ -24,10 +26,9 @@ using Disks::Fact;
 using Texts = std::vector<std::string>;
 
 // Kinds of device that stand by themselves. Every other kind stands on one that the capture has to show.
-constexpr std::array<std::string_view, 15> groundKinds = {
-    "disk", "loop",    "rom",     "tape",    "changer",   "printer", "processor", "worm",
-    "comm", "scanner", "mo-disk", "optical", "enclosure", "zbc",     "no-lun"};
-constexpr std::string_view multipath = "mpath";
+constexpr std::array<std::string_view, 17> groundKinds = {
+    "disk",    "loop",    "rom",     "tape",      "changer", "printer", "processor", "worm", "comm",
+    "scanner", "mo-disk", "optical", "enclosure", "zbc",     "no-lun",  "rbc",       "osd"};
 constexpr std::string_view multipathMember = "mpath_member";
 
 template <std::size_t count>
@@ -35,8 +36,8 @@ bool Contains(const std::array<std::string_view, count>& table, std::string_view
   return std::find(table.begin(), table.end(), word) != table.end();
 }
 
-bool IsPartition(const LsblkDevice& device) {
-  return device.type == "part";
+bool IsRunning(const std::string& state) {
+  return state.empty() || state == "running" || state == "live";
 }
 
 [[noreturn]] void Refuse(const LsblkDevice& device, const std::string& why) {
@@ -53,39 +54,31 @@ Fact<Value> Told(const LsblkDevice& device, const std::optional<Value>& value, c
 
 class Capture {
  public:
-  explicit Capture(const std::vector<LsblkDevice>& devices) : _devices(devices) {
-    for (const LsblkDevice& device : devices) {
-      _deviceOf.emplace(device.kernelName, &device);
-    }
-    for (const LsblkDevice& device : devices) {
-      for (const std::string& parent : device.parents) {
-        _standOn[parent].push_back(&device);
-      }
-    }
-  }
+  explicit Capture(const std::vector<LsblkDevice>& devices) : _devices(devices), _stack(devices) {}
 
   CapturedDisks Disks() {
-    CapturedDisks disks;
     for (const LsblkDevice& device : _devices) {
       CheckPlace(device);
       CheckSight(device);
+    }
+    if (const LsblkDevice* const lost = _stack.FindInCircle()) {
+      Refuse(*lost, lost->name + " stands on itself, or on what does");
+    }
+    CapturedDisks disks;
+    for (const LsblkDevice& device : _devices) {
       if (device.parents.empty()) {
         AddGroundDevice(device, disks);
+      } else if (device.type == "disk") {
+        disks.leftOut.push_back({device.name, "stands on " + device.parents.front()});
       }
     }
     return disks;
   }
 
  private:
-  const std::vector<const LsblkDevice*>& DevicesOn(const LsblkDevice& device) const {
-    static const std::vector<const LsblkDevice*> none;
-    const auto found = _standOn.find(device.kernelName);
-    return found == _standOn.end() ? none : found->second;
-  }
-
   void CheckPlace(const LsblkDevice& device) const {
     for (const std::string& parent : device.parents) {
-      if (_deviceOf.count(parent) == 0) {
+      if (_stack.Find(parent) == nullptr) {
         Refuse(device, device.name + " stands on " + parent + ", which the capture does not show");
       }
     }
@@ -99,7 +92,7 @@ class Capture {
   // what is on a disk. Then every disk looks free.
   void CheckSight(const LsblkDevice& device) const {
     const bool isKernelsOwn = device.type == "loop" || device.type == "rom" || device.type == "dm" ||
-                              (device.type == "disk" && IsVirtual(device));
+                              (device.type == "disk" && device.parents.empty() && IsVirtual(device));
     if (!isKernelsOwn && !device.mounts.empty() && device.fileSystem.empty()) {
       Refuse(device, device.name + " is mounted at " + device.mounts.front() +
                          ", but lsblk saw no file system on it: it had no data of udev");
@@ -112,8 +105,8 @@ class Capture {
 
   bool HasTable(const LsblkDevice& partition) const {
     return std::any_of(partition.parents.begin(), partition.parents.end(), [this](const std::string& parent) {
-      const auto found = _deviceOf.find(parent);
-      return found != _deviceOf.end() && !found->second->partitionTable.empty();
+      const LsblkDevice* const found = _stack.Find(parent);
+      return found != nullptr && !found->partitionTable.empty();
     });
   }
 
@@ -131,14 +124,13 @@ class Capture {
       disks.leftOut.push_back({device.name, "without a medium"});
       return;
     }
-    for (const LsblkDevice* const above : DevicesOn(device)) {
-      if (above->type == multipath && std::find(_maps.begin(), _maps.end(), above) == _maps.end()) {
+    for (const LsblkDevice* const above : _stack.On(device)) {
+      if (IsMultipath(*above) && _maps.insert(above).second) {
         CheckColumns(*above);
-        _maps.push_back(above);
         disks.disks.push_back({above, FactsOfMap(*above)});
       }
     }
-    disks.disks.push_back({&device, FactsOf(device)});
+    disks.disks.push_back({&device, FactsOfDisk(device)});
   }
 
   static void CheckColumns(const LsblkDevice& device) {
@@ -153,37 +145,49 @@ class Capture {
                                "; run: " + lsblkCommand + " (of util-linux 2.33 or newer)");
   }
 
-  DiskFacts FactsOf(const LsblkDevice& device) const {
-    DiskFacts facts;
+  // A disk may be a path of many multipath devices.
+  const DiskFacts& FactsOfDisk(const LsblkDevice& device) {
+    const auto [known, isNew] = _facts.try_emplace(&device);
+    DiskFacts& facts = known->second;
+    if (!isNew) {
+      return facts;
+    }
     facts.kernelName = device.name;
     facts.identity =
         DiskIdentity{Disks::WorldWideName(device.worldWideName), device.vendor, device.model, device.serial};
     facts.connection = ConnectionOf(device);
     facts.multipathMap = std::string();
-    for (const LsblkDevice* const above : DevicesOn(device)) {
-      if (above->type == multipath) {
-        facts.multipathMap = above->name;
+    for (const LsblkDevice* const above : _stack.On(device)) {
+      if (IsMultipath(*above)) {
+        facts.multipathMap = _stack.MapName(*above);
       }
     }
     FillOwnFacts(device, facts);
     return facts;
   }
 
-  // The disk that several paths lead to: it is what the paths say, and used as it says itself.
-  DiskFacts FactsOfMap(const LsblkDevice& map) const {
+  // The disk that several paths lead to: it is what the paths say, and used as it says itself, or one of
+  // them.
+  DiskFacts FactsOfMap(const LsblkDevice& map) {
+    const DiskFacts& first = FactsOfDisk(*_stack.Find(map.parents.front()));
     DiskFacts facts;
-    bool isFirst = true;
-    for (const std::string& parent : map.parents) {
-      const DiskFacts path = FactsOf(*_deviceOf.at(parent));
-      facts.identity = isFirst ? path.identity : SameIdentity(facts.identity, path.identity, map);
-      facts.connection = isFirst ? path.connection : Worse(facts.connection, path.connection);
-      isFirst = false;
-    }
-    facts.kernelName = map.name;
+    facts.identity = first.identity;
+    facts.connection = first.connection;
+    facts.kernelName = _stack.MapName(map);
     facts.multipathMap = std::string();
     FillOwnFacts(map, facts);
+    bool isAnyRunning = false;
     for (const std::string& parent : map.parents) {
-      AddWorseOf(*_deviceOf.at(parent), facts);
+      const LsblkDevice& device = *_stack.Find(parent);
+      const DiskFacts& path = FactsOfDisk(device);
+      facts.identity = SameIdentity(facts.identity, path.identity, map);
+      facts.connection = Worse(facts.connection, path.connection);
+      AddWorseOf(device, facts);
+      AddUseOf(device, path, facts);
+      isAnyRunning = isAnyRunning || IsRunning(device.state);
+    }
+    if (!isAnyRunning && IsRunning(map.state)) {
+      facts.state = first.state;
     }
     return facts;
   }
@@ -199,18 +203,9 @@ class Capture {
     facts.zones = device.zones;
     facts.signatures = SignaturesOf(device);
     facts.partitionTable = device.partitionTable;
-    facts.mounts = MountsOf(device);
-    std::int32_t partitions = 0;
-    Texts holders;
-    for (const LsblkDevice* const above : DevicesOn(device)) {
-      if (IsPartition(*above)) {
-        ++partitions;
-      } else if (above->type != multipath) {
-        holders.push_back(above->name + " (" + above->type + ")");
-      }
-    }
-    facts.partitions = partitions;
-    facts.holders = std::move(holders);
+    facts.mounts = _stack.MountsOn(device);
+    facts.partitions = _stack.PartitionsOn(device);
+    facts.holders = _stack.HoldersOf(device);
   }
 
   static Texts SignaturesOf(const LsblkDevice& device) {
@@ -228,27 +223,6 @@ class Capture {
     }
     signatures.insert(signatures.end(), device.otherTraces.begin(), device.otherTraces.end());
     return signatures;
-  }
-
-  // Of the disk itself, and of whatever stands on it.
-  Texts MountsOf(const LsblkDevice& device) const {
-    Texts mounts = device.mounts;
-    std::vector<const LsblkDevice*> waiting = DevicesOn(device);
-    Texts seen;
-    while (!waiting.empty() && mounts.size() < mostMounts) {
-      const LsblkDevice* const above = waiting.back();
-      waiting.pop_back();
-      if (std::find(seen.begin(), seen.end(), above->kernelName) != seen.end()) {
-        continue;
-      }
-      seen.push_back(above->kernelName);
-      for (const std::string& mount : above->mounts) {
-        mounts.push_back(mount + " (" + above->name + ")");
-      }
-      const auto& further = DevicesOn(*above);
-      waiting.insert(waiting.end(), further.begin(), further.end());
-    }
-    return mounts;
   }
 
   static Fact<DiskIdentity> SameIdentity(const Fact<DiskIdentity>& one, const Fact<DiskIdentity>& other,
@@ -278,25 +252,36 @@ class Capture {
     if (facts.zones.Get().empty() || facts.zones.Get() == "none") {
       facts.zones = path.zones;
     }
-    Texts signatures = facts.signatures.Get();
-    for (const std::string& signature : SignaturesOf(path)) {
-      const bool isExpected = path.fileSystem == multipathMember;
-      if (!isExpected && std::find(signatures.begin(), signatures.end(), signature) == signatures.end()) {
-        signatures.push_back(signature);
-      }
+    if (path.fileSystem != multipathMember) {
+      facts.signatures = Both(facts.signatures.Get(), SignaturesOf(path));
     }
-    facts.signatures = std::move(signatures);
     if (facts.partitionTable.Get().empty()) {
       facts.partitionTable = path.partitionTable;
     }
   }
 
-  static constexpr std::size_t mostMounts = 8;  // that are told of one disk
+  // Whoever uses a path past the multipath device uses the disk. What stands on that is seen there.
+  static void AddUseOf(const LsblkDevice& device, const DiskFacts& path, DiskFacts& facts) {
+    facts.mounts = Both(facts.mounts.Get(), device.mounts);
+    facts.partitions = std::max(facts.partitions.Get(), path.partitions.Get());
+    facts.holders = Both(facts.holders.Get(), path.holders.Get());
+  }
+
+  // Of very many, some: one is enough.
+  static Texts Both(Texts texts, const Texts& others) {
+    constexpr std::size_t most = 8;
+    for (const std::string& other : others) {
+      if (texts.size() < most && std::find(texts.begin(), texts.end(), other) == texts.end()) {
+        texts.push_back(other);
+      }
+    }
+    return texts;
+  }
 
   const std::vector<LsblkDevice>& _devices;
-  std::unordered_map<std::string, const LsblkDevice*> _deviceOf;
-  std::unordered_map<std::string, std::vector<const LsblkDevice*>> _standOn;
-  std::vector<const LsblkDevice*> _maps;
+  const LsblkStack _stack;
+  std::unordered_map<const LsblkDevice*, DiskFacts> _facts;
+  std::unordered_set<const LsblkDevice*> _maps;
 };
 
 }  // namespace

@@ -1,5 +1,6 @@
 #include "otxctl/linux/DeviceFacts.h"
 
+#include <cstdint>
 #include <utility>
 #include <vector>
 
@@ -85,6 +86,11 @@ Fact<bool> Either(const Fact<bool>& one, const Fact<bool>& other) {
   return one.IsKnown() ? other : one;
 }
 
+Fact<std::int32_t> More(const Fact<std::int32_t>& one, const Fact<std::int32_t>& other) {
+  const bool isMore = one.IsKnown() && (!other.IsKnown() || other.Get() > one.Get());
+  return isMore ? other : one;
+}
+
 Fact<Connection> Worst(const Fact<Connection>& one, const Fact<Connection>& other) {
   const bool isLocal = one.IsKnown() && one.Get().attachment == Disks::Attachment::Machine;
   return isLocal ? other : one;
@@ -137,6 +143,7 @@ void AddPathFacts(const SysfsReader& reader, const BlockDevices& devices, const 
     facts.isReadOnly = Either(facts.isReadOnly, path.isReadOnly);
     facts.isRemovable = Either(facts.isRemovable, path.isRemovable);
     facts.state = Best(facts.state, path.state);
+    facts.partitions = More(facts.partitions, path.partitions);
   }
   facts.state = MapState(map, facts.state);
 }

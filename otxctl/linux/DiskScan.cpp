@@ -67,6 +67,7 @@ class Scan {
   void ProbeOne(Candidate& candidate);
   void AddUse();
   void AddHolders(const DeviceStack& stack, const Candidate& candidate, DiskFacts& facts) const;
+  void AddUseOfPaths(const DeviceStack& stack, const BlockDevice& map, DiskFacts& facts) const;
   void DropThoseGone();
   void NameAll();
 
@@ -151,6 +152,34 @@ void Scan::AddUse() {
     facts.partitionTable = candidate.found.partitionTable;
     facts.mounts = stack.MountsOn(*candidate.device);
     AddHolders(stack, candidate, facts);
+    if (IsMultipathMap(*candidate.device)) {
+      AddUseOfPaths(stack, *candidate.device, facts);
+    }
+  }
+}
+
+// Device-mapper lets its devices share what is below them: one may use a path past the multipath device.
+void Scan::AddUseOfPaths(const DeviceStack& stack, const BlockDevice& map, DiskFacts& facts) const {
+  if (!map.slaves.IsKnown()) {
+    return;  // then nobody knows what it leads to either
+  }
+  for (const std::string& name : map.slaves.Get()) {
+    const BlockDevice* const path = _devices.ByName(name);
+    if (path == nullptr || !facts.holders.IsKnown()) {
+      continue;
+    }
+    const Fact<Texts> ofPath = stack.HoldersOf(*path);
+    if (!ofPath.IsKnown()) {
+      facts.holders = ofPath;
+      continue;
+    }
+    Texts all = facts.holders.Get();
+    for (const std::string& holder : ofPath.Get()) {
+      if (std::find(all.begin(), all.end(), holder) == all.end()) {
+        all.push_back(holder);
+      }
+    }
+    facts.holders = std::move(all);
   }
 }
 

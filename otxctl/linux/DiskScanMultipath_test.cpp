@@ -76,6 +76,16 @@ TEST_F(DiskScanMultipath, ForeignHoldersOfAPathAreTold) {
   EXPECT_THAT(Verdicts().at("sda"), HasSubstr("held by vg0-data (LVM)"));
 }
 
+TEST_F(DiskScanMultipath, WhoUsesAPathUsesTheDiskBehindTheMap) {
+  _tree.AddMapping("dm-1", "vault", "CRYPT-PLAIN-vault", {"sdb"});
+  EXPECT_EQ(Verdicts().at("mpatha"), "held by vault (encryption)");
+}
+
+TEST_F(DiskScanMultipath, PartitionsOfAPathAreOnTheDiskBehindTheMap) {
+  _tree.AddMapping("dm-1", "sdb-part1", "part1-sdb", {"sdb"});
+  EXPECT_EQ(Verdicts().at("mpatha"), "1 partition");
+}
+
 TEST_F(DiskScanMultipath, TheMapIsOnlyAsGoodAsItsPaths) {
   _tree.Write(_sdb + "/ro", "1\n");
   EXPECT_EQ(Verdicts().at("mpatha"), "read-only");

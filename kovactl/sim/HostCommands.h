@@ -19,7 +19,8 @@ struct ImportOptions {
 // Prints a host description of the machine that the text was captured on, or writes it to its file; and what
 // was taken over and left out, and why: to `err` if the description goes to `out`. Throws BadInput that names
 // the file and the path in it.
-ExitStatus RunHostImport(const ImportOptions& options, std::istream& in, std::ostream& out, std::ostream& err);
+ExitStatus RunHostImport(const ImportOptions& options, std::istream& in, std::ostream& out,
+                         std::ostream& err);
 
 // Reads a description and says in a line what it holds. Throws BadInput that names the file and the path in
 // it.

@@ -42,15 +42,16 @@ TEST_F(RecordedMachine, OffersWhatNobodyUsesAndNothingElse) {
   const DiskScan scan = Scan("lab.tree");
   EXPECT_THAT(scan.leftOut, IsEmpty());
   const auto two = HasSubstr("two paths");
-  EXPECT_THAT(VerdictsOf(scan),
-              ElementsAre(Pair("naa.5000c50000000100", "free"), Pair("naa.5000c50000000101", "free"),
-                          Pair("naa.5000c50000000200", "free"), Pair("naa.5000c50000000201", "free"),
-                          Pair("naa.5000c50000000202", "free"), Pair("naa.5000c50000000203", "free"),
-                          Pair("naa.5000c50000000204", "free"), Pair("naa.5000c50000000205", "free"),
-                          Pair("naa.5000c50000000300", "1 partition"), Pair("naa.5000c50000000400", "free"),
-                          Pair("naa.5000c50000000600", two), Pair("naa.5000c50000000600.2", two),
-                          Pair(StartsWith("nvme."), "free"),
-                          Pair("t10.QEMU_QEMU_HARDDISK_USBSTICK0001", StartsWith("attached by USB, hot-plug"))));
+  EXPECT_THAT(
+      VerdictsOf(scan),
+      ElementsAre(Pair("naa.5000c50000000100", "free"), Pair("naa.5000c50000000101", "free"),
+                  Pair("naa.5000c50000000200", "free"), Pair("naa.5000c50000000201", "free"),
+                  Pair("naa.5000c50000000202", "free"), Pair("naa.5000c50000000203", "free"),
+                  Pair("naa.5000c50000000204", "free"), Pair("naa.5000c50000000205", "free"),
+                  Pair("naa.5000c50000000300", "1 partition"), Pair("naa.5000c50000000400", "free"),
+                  Pair("naa.5000c50000000600", two), Pair("naa.5000c50000000600.2", two),
+                  Pair(StartsWith("nvme."), "free"),
+                  Pair("t10.QEMU_QEMU_HARDDISK_USBSTICK0001", StartsWith("attached by USB, hot-plug"))));
 }
 
 TEST_F(RecordedMachine, TellsKindsAndPlacesOfItsDisks) {

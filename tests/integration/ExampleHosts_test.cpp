@@ -30,7 +30,8 @@ std::string ReadText(const fs::path& path) {
 
 OtxCtl::Sim::HostDescription LoadExample(const std::string& name) {
   const std::string path = examples + "/" + name + ".json";
-  return name == lsblkOutput ? OtxCtl::Sim::ImportLsblk(ReadText(path)).host : OtxCtl::Sim::LoadHostFile(path);
+  return name == lsblkOutput ? OtxCtl::Sim::ImportLsblk(ReadText(path)).host
+                             : OtxCtl::Sim::LoadHostFile(path);
 }
 
 std::set<std::string> NamesIn(const std::string& folder, const std::string& extension) {

@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <system_error>
 
@@ -16,6 +17,13 @@ using Content = Disks::Fact<std::optional<std::string>>;
 
 bool IsNoSuchThing(int error) {
   return error == EINVAL || error == ENXIO || error == ENODATA || error == EOPNOTSUPP;
+}
+
+// Room for what most files are, and then for twice as much each time: a file may be far shorter than it is
+// allowed to be, and room that is made is paid for. One byte more than allowed tells that a file is too long.
+std::size_t NextRoom(std::size_t room, std::size_t most) {
+  constexpr std::size_t first = 4097;
+  return std::min(most + 1, std::max(first, 2 * room));
 }
 
 }  // namespace
@@ -32,9 +40,11 @@ Content ReadWhole(const std::string& path, std::size_t most, Refusal refusal) {
     const int error = errno;
     return error == ENOENT ? Content(std::nullopt) : Content::Unknown(CannotRead(path, error));
   }
-  std::string bytes(most + 1, '\0');
-  std::size_t size = 0;
-  while (size < bytes.size()) {
+  std::string bytes;
+  for (std::size_t size = 0; size <= most;) {
+    if (size == bytes.size()) {
+      bytes.resize(NextRoom(size, most));
+    }
     const ssize_t count =
         Uninterrupted([&] { return read(file.Get(), bytes.data() + size, bytes.size() - size); });
     if (count < 0) {

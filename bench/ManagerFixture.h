@@ -1,10 +1,9 @@
 // The plug-in's manager over a simulated host, for benchmarks.
 #pragma once
 
-#include <benchmark/benchmark.h>
-
 #include <memory>
 
+#include "bench/CountDisks.h"
 #include "bench/Hosts.h"
 #include "host/AgentApp.h"
 #include "host/Inventory.h"
@@ -49,12 +48,5 @@ class ManagerFixture {
   Host::AgentApp _app;
   Tessa::Ref<Kovasvc::KovaManagerImpl> _manager;
 };
-
-// Reports the time per disk; the benchmark's first argument is their number.
-inline void CountDisks(benchmark::State& state) {
-  state.counters["per disk"] =
-      benchmark::Counter(static_cast<double>(state.range(0)) * static_cast<double>(state.iterations()),
-                         benchmark::Counter::kIsRate | benchmark::Counter::kInvert);
-}
 
 }  // namespace Bench

@@ -34,6 +34,7 @@ LINKS = {"usr/bin/sh": "bash", "usr/lib/systemd/systemd-udevd": "/usr/bin/udevad
 KMOD_NAMES = ("modprobe", "insmod", "rmmod", "lsmod", "depmod", "modinfo")
 LIBRARIES = "usr/lib/x86_64-linux-gnu"
 LOADER = "/lib64/ld-linux-x86-64.so.2"
+MACHINE_ID = "6b6f7661206c616220206d616368696e"
 
 
 class Failed(Exception):
@@ -205,6 +206,7 @@ def contents(work, unpacked, sources, libraries):
     with open(HERE + "/init", encoding="utf-8") as file:
         image.text("usr/sbin/lab-init", file.read(), 0o755)
     image.text("etc/passwd", "root:x:0:0:root:/:/bin/sh\n")
+    image.text("etc/machine-id", MACHINE_ID + "\n")
     for path in ("etc/group", "etc/ld.so.conf"):
         image.file(path, "/" + path)
     for path, target in LINKS.items():

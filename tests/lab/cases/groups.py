@@ -162,7 +162,7 @@ def a_disk_that_something_keeps_for_itself_is_told_to_be_held(machine):
         with agent.running(machine) as here:
             machine.check(f"dmsetup create keeper --table '0 8192 linear {device['hdd2']} 0'")
             # Mounted where the agent cannot see it, and then without a trace on the disk.
-            machine.check(f"mkfs.ext4 -q {device['hdd3']} && mkdir -p /mnt/hidden && "
+            machine.check(f"modprobe ext4 && mkfs.ext4 -q {device['hdd3']} && mkdir -p /mnt/hidden && "
                           f"(unshare -m sh -c 'mount {device['hdd3']} /mnt/hidden && "
                           f"wipefs -q -a -f {device['hdd3']} && touch /run/hidden && "
                           "exec sleep 1000' >/dev/null 2>&1 & echo $! >/run/hidden.pid)")

@@ -101,7 +101,7 @@ void Serve(Options& options) {
   }
   options.runtime.makeMachine = Machines::MachineOf(options.machine);
   Host::HostRuntime& runtime = Host::HostRuntime::Start(options.runtime);
-  const Host::KovaService service(runtime.Hooks(), runtime.GetSimulation(), runtime.GetFreshness());
+  const Host::KovaService service(runtime.Hooks(), &runtime.GetMachine());
   Agentd::TaskQueue tasks;
   Agentd::Router router(service, tasks);
   Agentd::HttpServer server(

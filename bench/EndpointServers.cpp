@@ -12,7 +12,7 @@ namespace http = boost::beast::http;
 using boost::system::error_code;
 
 AgentServer::AgentServer(const std::vector<Agentd::HttpAddress>& listen, Host::HostRuntime& runtime)
-    : _service(runtime.Hooks(), runtime.GetSimulation()),
+    : _service(runtime.Hooks(), &runtime.GetMachine()),
       _router(_service, _tasks),
       // By that name clients reach it whatever port was found.
       _server(Agentd::HttpOptions{.listen = listen, .serverNames = {"localhost"}},

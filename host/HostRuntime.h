@@ -6,7 +6,6 @@
 #include <string>
 
 #include "host/AgentApp.h"
-#include "host/Freshness.h"
 #include "host/Inventory.h"
 #include "host/Machine.h"
 #include "host/PluginLoader.h"
@@ -38,12 +37,9 @@ class HostRuntime {
   static HostRuntime& Start(const RuntimeOptions& options);
 
   const PluginHooks& Hooks() const noexcept { return _hooks; }
+  Machine& GetMachine() noexcept { return *_machine; }
   // The machine's, or null.
   Simulation* GetSimulation() noexcept { return _machine->GetSimulation(); }
-  // A simulated machine changes only by what this program does to it; others change by themselves.
-  Freshness GetFreshness() noexcept {
-    return GetSimulation() == nullptr ? Freshness::OfEachRequest : Freshness::OfLastChange;
-  }
 
  private:
   explicit HostRuntime(const RuntimeOptions& options);

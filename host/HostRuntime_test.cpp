@@ -135,9 +135,56 @@ TEST_F(HostRuntimeTest, ServesAMachineThatIsNotSimulated) {
     HostRuntime& runtime = HostRuntime::Start(options);
     EXPECT_EQ(runtime.GetSimulation(), nullptr);
     EXPECT_THAT(Disks(runtime), ElementsAre());
-    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
+    const KovaService service(runtime.Hooks(), &runtime.GetMachine());
     EXPECT_NO_THROW(service.CheckHostChange("no change"));
     EXPECT_THROW(service.DescribeHost(), HostError);
+  });
+}
+
+// A machine whose disks others change, too.
+class LivingMachine final : public Machine {
+ public:
+  explicit LivingMachine(std::shared_ptr<SimHost> host) : _machine(std::move(host)) {}
+
+  std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider() override { return _machine.MakeProvider(); }
+  Ref<Nox::Host::StorageDeviceInfo> GetInventory() override { return _machine.GetInventory(); }
+  void SetListener(Listener listener) override { _machine.SetListener(std::move(listener)); }
+  std::shared_ptr<void> HoldLook() override {
+    ++looksHeld;
+    return nullptr;
+  }
+
+  int looksHeld = 0;
+
+ private:
+  Machines::SimulatedMachine _machine;
+};
+
+TEST_F(HostRuntimeTest, OfAMachineThatChangesByItselfEachQuestionSeesItsDisksAsTheyAre) {
+  auto options = On(AHost().WithSsd("naa.1"));
+  options.makeMachine = [host = _host] { return std::make_unique<LivingMachine>(host); };
+  InOwnProcess([this, &options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const KovaService service(runtime.Hooks(), &runtime.GetMachine());
+    EXPECT_THAT(DisksOf(service.Query(Op::QueryDisksForKova())), ElementsAre("naa.1 eligible"));
+    _host->Change([](OtxCtl::Sim::HostDescription& host) { host.disks[0].partitions = 1; });
+    EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible")) << "what the plug-in alone would say";
+    EXPECT_THAT(DisksOf(service.Query(Op::QueryDisksForKova())), ElementsAre("naa.1 ineligible"));
+    service.Query(Op::GetConfigInfo());
+    EXPECT_EQ(static_cast<LivingMachine&>(runtime.GetMachine()).looksHeld, 2) << "one for each about disks";
+  });
+}
+
+TEST_F(HostRuntimeTest, AChangeOfAMachineThatChangesByItselfSeesItsDisksAsTheyAre) {
+  auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
+  options.makeMachine = [host = _host] { return std::make_unique<LivingMachine>(host); };
+  InOwnProcess([this, &options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    const KovaService service(runtime.Hooks(), &runtime.GetMachine());
+    service.Query(Op::QueryDisksForKova());
+    _host->Change([](OtxCtl::Sim::HostDescription& host) { host.disks[0].verdict = {2, 4}; });
+    service.Change(Op::AddAllEligibleDisks());
+    EXPECT_THAT(_host->Snapshot().groups, testing::IsEmpty());
   });
 }
 
@@ -251,7 +298,7 @@ TEST_F(HostRuntimeTest, MakesNoGroupOfADiskThatTheKernelCouldNotTellAbout) {
                               }));
   InOwnProcess([&options, this] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
+    const KovaService service(runtime.Hooks(), &runtime.GetMachine());
     const Answer answer =
         service.Change(Op::InitializeDisks(Testing::Mappings({Testing::MappingOf("naa.1", {"naa.2"})})));
     EXPECT_TRUE(answer.fault);
@@ -281,7 +328,7 @@ TEST_F(HostRuntimeTest, AddsUnmountsClaimsAndRemovesOnTheSimulatedHost) {
   const auto options = On(AHost().WithSsd("naa.1").WithHdds({"naa.2", "naa.3"}));
   InOwnProcess([&options, this] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
+    const KovaService service(runtime.Hooks(), &runtime.GetMachine());
     const auto groups = [this] { return _host->Snapshot().groups; };
     EXPECT_EQ(ToldBy(service.Change(Op::AddDisks(Testing::DisksNamed({"naa.1", "naa.2", "naa.3"})))), "done");
     ASSERT_EQ(groups().size(), 1u);
@@ -306,7 +353,7 @@ TEST_F(HostRuntimeTest, RefusesTheCacheDiskOfABrokenGroupThatWouldEndThePlugin) 
                               .Without("naa.3"));
   InOwnProcess([&options, this] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
+    const KovaService service(runtime.Hooks(), &runtime.GetMachine());
     EXPECT_THAT(ToldBy(service.Change(Op::AddDisks(Testing::DisksNamed({"naa.1", "naa.4"})))),
                 HasSubstr("'kova:uuid-of-naa.3'"));
     EXPECT_EQ(ToldBy(service.ChangeHost(R"({"disk": {"name": "naa.3", "absent": false}})")), "done");
@@ -334,7 +381,7 @@ TEST_F(HostRuntimeTest, AChangeOfTheHostIsSeenByTheNextRequest) {
   const auto options = On(AHost().WithSsd("naa.1").WithHdd("naa.2"));
   InOwnProcess([&options] {
     HostRuntime& runtime = HostRuntime::Start(options);
-    const KovaService service(runtime.Hooks(), runtime.GetSimulation());
+    const KovaService service(runtime.Hooks(), &runtime.GetMachine());
     EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible", "naa.2 eligible"));
     EXPECT_EQ(ToldBy(service.ChangeHost(R"({"disk": {"name": "naa.2", "partitions": 1}})")), "done");
     EXPECT_THAT(Disks(runtime), ElementsAre("naa.1 eligible", "naa.2 ineligible"));

@@ -9,6 +9,7 @@
 #include "host/Gate.h"
 #include "host/HostError.h"
 #include "host/KnownDisks.h"
+#include "host/Machine.h"
 #include "host/Refusal.h"
 #include "host/RequestTexts.h"
 #include "host/Simulation.h"
@@ -260,6 +261,11 @@ Answer AnswerTo(const Orbis::DataObject& request, const PluginHooks& hooks) {
 
 }  // namespace
 
+KovaService::KovaService(const PluginHooks& hooks, Machine* machine)
+    : _hooks(hooks),
+      _machine(machine),
+      _simulation(machine == nullptr ? nullptr : machine->GetSimulation()) {}
+
 // To read the storage is what makes the plug-in ask the kernel for the disks again.
 void KovaService::DropDiskCache() const {
   std::string dropped;
@@ -268,16 +274,19 @@ void KovaService::DropDiskCache() const {
 
 Answer KovaService::Query(const Op::Query& request) const {
   const bool isOfDisks = &request.GetType() == &Op::QueryDisksForKova::StaticType();
-  return isOfDisks ? AnswerFresh(request) : AnswerTo(request, _hooks);
+  if (!isOfDisks || !ChangesByItself()) {
+    return AnswerTo(request, _hooks);
+  }
+  return Guarded([&] {
+    const std::shared_ptr<void> look = _machine->HoldLook();
+    DropDiskCache();
+    return AnswerTo(request, _hooks);
+  });
 }
 
 Answer KovaService::Change(Op::Change&& request) const {
-  return AnswerFresh(request);
-}
-
-Answer KovaService::AnswerFresh(const Orbis::DataObject& request) const {
   return Guarded([&] {
-    if (_freshness == Freshness::OfEachRequest) {
+    if (ChangesByItself()) {
       DropDiskCache();
     }
     return AnswerTo(request, _hooks);

@@ -11,23 +11,22 @@
 #include <string>
 #include <string_view>
 
-#include "host/Freshness.h"
 #include "host/ManagementApi.h"
 #include "host/PluginLoader.h"
 
 namespace Host {
 
 class KnownDisks;
+class Machine;
 class Simulation;
 
 class KovaService final : public ManagementApi {
  public:
-  // The hooks must be those of an initialised plug-in. `simulation` is that of the machine behind its
-  // provider, if it has one, and outlives the service; DescribeHost and ChangeHost throw HostError without
-  // it.
-  explicit KovaService(const PluginHooks& hooks, Simulation* simulation = nullptr,
-                       Freshness freshness = Freshness::OfLastChange)
-      : _hooks(hooks), _simulation(simulation), _freshness(freshness) {}
+  // The hooks must be those of an initialised plug-in. `machine` is the one behind its provider, if it is
+  // known, and outlives the service. A simulated one changes only by what is asked for here, and may be
+  // described and changed; of any other, each request looks at the disks anew, for they are plugged, mounted
+  // and written by others. DescribeHost and ChangeHost throw HostError without a simulated one.
+  explicit KovaService(const PluginHooks& hooks, Machine* machine = nullptr);
 
   Answer Query(const Nox::Operation::Query& request) const override;
   Answer Change(Nox::Operation::Change&& request) const override;
@@ -38,11 +37,11 @@ class KovaService final : public ManagementApi {
  private:
   Simulation& Simulated() const;
   void DropDiskCache() const;
-  Answer AnswerFresh(const Orbis::DataObject& request) const;
+  bool ChangesByItself() const noexcept { return _machine != nullptr && _simulation == nullptr; }
 
   PluginHooks _hooks;
+  Machine* _machine;
   Simulation* _simulation;
-  Freshness _freshness;
 };
 
 }  // namespace Host

@@ -136,7 +136,7 @@ class KovaServiceChanges : public testing::Test {
   Ref<Inventory> _inventory = MakeRef<Inventory>();
   AgentApp _app;
   Machines::SimulatedMachine _machine{_host};
-  const KovaService _service{Listeners(), _machine.GetSimulation()};
+  const KovaService _service{Listeners(), &_machine};
 };
 
 TEST_F(KovaServiceChanges, HandsDisksDownAsTheInventoryKnowsThem) {

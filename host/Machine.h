@@ -40,6 +40,10 @@ class Machine {
   // takes it away.
   virtual void SetListener(Listener listener) = 0;
 
+  // While what is handed back lives, the machine is looked at once for all that this thread asks of it; to be
+  // let go by the thread that has it. Null: a look costs this machine nothing.
+  virtual std::shared_ptr<void> HoldLook();
+
   // How the machine is described and changed from outside, if it is not a real one; otherwise null. Lives as
   // long as the machine.
   virtual Simulation* GetSimulation() noexcept;

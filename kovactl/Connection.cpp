@@ -28,8 +28,7 @@ Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
 }
 
 std::unique_ptr<Host::ManagementApi> ServiceOf(Host::HostRuntime& runtime) {
-  return std::make_unique<Host::KovaService>(runtime.Hooks(), runtime.GetSimulation(),
-                                             runtime.GetFreshness());
+  return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.GetMachine());
 }
 
 // What an agent of that address is asked with.

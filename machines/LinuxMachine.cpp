@@ -82,6 +82,10 @@ void LinuxMachine::SetListener(Listener listener) {
   _listener = std::move(listener);
 }
 
+std::shared_ptr<void> LinuxMachine::HoldLook() {
+  return std::make_shared<LinuxHost::OneLook>();
+}
+
 void LinuxMachine::Follow() {
   try {
     _host->Look();

@@ -28,6 +28,7 @@ class LinuxMachine final : public Host::Machine {
   std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider() override;
   Tessa::Ref<Nox::Host::StorageDeviceInfo> GetInventory() override;
   void SetListener(Listener listener) override;
+  std::shared_ptr<void> HoldLook() override;
 
  private:
   void Follow();

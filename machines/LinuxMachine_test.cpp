@@ -126,6 +126,22 @@ TEST(LinuxMachine, ItsProvidersOutliveIt) {
   EXPECT_EQ(records.size(), 1U);
 }
 
+TEST(LinuxMachine, IsLookedAtOnceWhileALookIsHeld) {
+  TestMachine machine;
+  LinuxMachine served(machine.Host());
+  const auto provider = served.MakeProvider();
+  std::vector<HostCtl::Kova::DiskResult> records;
+  auto look = served.HoldLook();
+  provider->RefreshKovaInfo();
+  machine.tree.AddScsiDisk("sda", {.worldWideName = "naa.1", .serial = "S1"});
+  provider->RefreshKovaInfo();
+  provider->QueryDisks({}, records, true);
+  EXPECT_EQ(records.size(), 0U);
+  look.reset();
+  provider->QueryDisks({}, records, true);
+  EXPECT_EQ(records.size(), 1U);
+}
+
 TEST(LinuxMachine, IsNoSimulation) {
   TestMachine machine;
   EXPECT_EQ(LinuxMachine(machine.Host()).GetSimulation(), nullptr);

@@ -35,11 +35,22 @@ bool AreSame(const std::vector<Item>& one, const std::vector<Item>& other) {
                     [](const Item& left, const Item& right) { return Digest(left) == Digest(right); });
 }
 
+// The innermost of this thread, or null.
+thread_local LinuxHost::OneLook* oneLook = nullptr;
+
 [[noreturn]] void Fail(const std::string& what, const std::string& why) {
   throw HostCtlException(what + ": " + why);
 }
 
 }  // namespace
+
+LinuxHost::OneLook::OneLook() : _outer(oneLook) {
+  oneLook = this;
+}
+
+LinuxHost::OneLook::~OneLook() {
+  oneLook = _outer;
+}
 
 bool operator==(const LinuxSnapshot& one, const LinuxSnapshot& other) {
   return one.verdicts == other.verdicts && AreSame(one.disks, other.disks) &&
@@ -51,6 +62,17 @@ LinuxHost::LinuxHost(LinuxHostOptions options, std::unique_ptr<DiskProbe> probe,
     : _options(std::move(options)), _probe(std::move(probe)), _commands(std::move(commands)) {}
 
 std::shared_ptr<const LinuxSnapshot> LinuxHost::Look() {
+  if (oneLook == nullptr) {
+    return LookAnew();
+  }
+  if (oneLook->_host != this) {
+    oneLook->_seen = LookAnew();
+    oneLook->_host = this;
+  }
+  return oneLook->_seen;
+}
+
+std::shared_ptr<const LinuxSnapshot> LinuxHost::LookAnew() {
   std::shared_ptr<const LinuxSnapshot> seen;
   Listener listener;
   {

@@ -45,10 +45,25 @@ class LinuxHost {
  public:
   using Listener = std::function<void()>;
 
+  // While one lives, all looks of its thread are one: the first. To be let go by the thread that made it.
+  class OneLook {
+   public:
+    OneLook();
+    ~OneLook();
+    OneLook(const OneLook&) = delete;
+    OneLook& operator=(const OneLook&) = delete;
+
+   private:
+    friend class LinuxHost;
+    const LinuxHost* _host = nullptr;  // whose look it is
+    std::shared_ptr<const LinuxSnapshot> _seen;
+    OneLook* const _outer;
+  };
+
   LinuxHost(LinuxHostOptions options, std::unique_ptr<DiskProbe> probe, std::unique_ptr<Commands> commands);
 
-  // A new look. Throws HostCtl::Lib::HostCtlException if the machine cannot be looked at; what was seen last
-  // stays.
+  // A new look, but for those within a OneLook. Throws HostCtl::Lib::HostCtlException if the machine cannot
+  // be looked at; what was seen last stays.
   std::shared_ptr<const LinuxSnapshot> Look();
   // The last look if it is fresh, else a new one.
   std::shared_ptr<const LinuxSnapshot> Current();
@@ -61,6 +76,7 @@ class LinuxHost {
  private:
   using Clock = std::chrono::steady_clock;
 
+  std::shared_ptr<const LinuxSnapshot> LookAnew();
   LinuxSnapshot TakeSnapshot();
   std::vector<DiskGroup> FindGroups(std::vector<ScannedDisk>& disks);
   std::string Report(const char* command, const char* columns, const std::vector<ScannedDisk>& disks);

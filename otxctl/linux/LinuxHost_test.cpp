@@ -150,6 +150,23 @@ TEST(LinuxHost, TellsWhoListensOfWhatIsOtherThanBefore) {
   EXPECT_EQ(told, 3);
 }
 
+TEST(LinuxHost, WithinOneLookAllLooksOfAThreadAreTheFirst) {
+  TestMachine machine;
+  machine.AddGroup();
+  const auto host = machine.Host();
+  std::shared_ptr<const LinuxSnapshot> held;
+  {
+    const LinuxHost::OneLook look;
+    held = host->Look();
+    EXPECT_EQ(host->Look(), held);
+    EXPECT_EQ(host->Current(), held);
+    EXPECT_THAT(machine.results.commands, SizeIs(2));
+    const auto other = machine.Host();
+    EXPECT_NE(other->Look(), held) << "of another host";
+  }
+  EXPECT_NE(host->Look(), held);
+}
+
 TEST(LinuxHost, AFreshLookAnswersTheNextQuestionToo) {
   TestMachine machine;
   machine.freshness = std::chrono::hours(1);

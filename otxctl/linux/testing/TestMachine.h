@@ -31,8 +31,7 @@ class TestMachine {
       member.signatures = std::vector<std::string>{"LVM physical volume"};
       probeResults[name] = member;
     }
-    const auto row = [this, &state](const std::string& name, const std::string& number,
-                                    const std::string& tags) {
+    const auto row = [&state](const std::string& name, const std::string& number, const std::string& tags) {
       const std::size_t colon = number.find(':');
       return R"({"pv_name":")" + name + R"(","pv_major":")" + number.substr(0, colon) + R"(","pv_minor":")" +
              number.substr(colon + 1) + R"(","pv_missing":"","pv_tags":")" + tags +

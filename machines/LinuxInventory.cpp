@@ -18,6 +18,7 @@ using OtxCtl::Disks::Attachment;
 using OtxCtl::Disks::DiskFacts;
 using OtxCtl::Disks::DiskIdentity;
 using OtxCtl::Disks::DiskVerdict;
+using OtxCtl::Disks::IsRunning;
 using OtxCtl::Linux::ScannedDisk;
 using Tessa::MakeRef;
 using Tessa::Ref;
@@ -43,15 +44,11 @@ void SetConnection(ScsiDisk& disk, const DiskFacts& facts) {
   }
 }
 
-bool IsRunning(const DiskFacts& facts) {
-  return facts.state.Is("") || facts.state.Is("running") || facts.state.Is("live");
-}
-
 Ref<ScsiDisk> ToDisk(const ScannedDisk& scanned, const DiskVerdict& verdict) {
   const DiskFacts& facts = scanned.facts;
   const auto disk = MakeRef<ScsiDisk>();
   SetUnit(*disk, facts.canonicalName, scanned.deviceNode, ScsiLun::SCSILUNTYPE_DISK);
-  if (!IsRunning(facts)) {
+  if (!facts.state.IsKnown() || !IsRunning(facts.state.Get())) {
     disk->SetOperationalState(MakeRef<Orbis::TextList>(std::vector<std::string>{ScsiLun::STATE_OFF}));
   }
   disk->SetDisplayName(scanned.displayName);

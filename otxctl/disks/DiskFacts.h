@@ -43,6 +43,10 @@ enum class Membership {
   Unmounted,  // of a disk group of this machine that is not
 };
 
+// Whether the kernel's word for the state of a disk says that it works; kinds without states have none to
+// say.
+bool IsRunning(const std::string& state);
+
 struct DiskFacts {
   std::string kernelName;     // "sda"
   std::string canonicalName;  // unique on its host

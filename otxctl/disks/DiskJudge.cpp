@@ -144,7 +144,7 @@ void JudgeFitness(const DiskFacts& disk, Findings& findings) {
   JudgeFlag(disk.isHotPlug, "hot-plug", findings);
   if (findings.IsKnown(disk.state)) {
     const std::string& state = disk.state.Get();
-    if (!state.empty() && state != "running" && state != "live") {
+    if (!IsRunning(state)) {
       findings.Add(DiskReason::HasForeignPartitions, "not running: " + state);
     }
   }
@@ -200,6 +200,10 @@ DiskVerdict Judge(const DiskFacts& disk, const std::string& twins, const DiskLim
 }
 
 }  // namespace
+
+bool IsRunning(const std::string& state) {
+  return state.empty() || state == "running" || state == "live";
+}
 
 std::vector<DiskVerdict> JudgeDisks(const std::vector<DiskFacts>& disks, const DiskLimits& limits) {
   const DiskTwins twins(disks);

@@ -16,10 +16,7 @@ using Disks::Connection;
 using Disks::DiskFacts;
 using Disks::DiskIdentity;
 using Disks::Fact;
-
-bool IsRunning(const std::string& state) {
-  return state.empty() || state == "running" || state == "live";
-}
+using Disks::IsRunning;
 
 Fact<bool> IsFlash(const BlockDevice& device) {
   return device.isRotational.IsKnown() ? Fact<bool>(!device.isRotational.Get()) : device.isRotational;

@@ -23,6 +23,7 @@ using Disks::Connection;
 using Disks::DiskFacts;
 using Disks::DiskIdentity;
 using Disks::Fact;
+using Disks::IsRunning;
 using Texts = std::vector<std::string>;
 
 // Kinds of device that stand by themselves. Every other kind stands on one that the capture has to show.
@@ -34,10 +35,6 @@ constexpr std::string_view multipathMember = "mpath_member";
 template <std::size_t count>
 bool Contains(const std::array<std::string_view, count>& table, std::string_view word) {
   return std::find(table.begin(), table.end(), word) != table.end();
-}
-
-bool IsRunning(const std::string& state) {
-  return state.empty() || state == "running" || state == "live";
 }
 
 [[noreturn]] void Refuse(const LsblkDevice& device, const std::string& why) {

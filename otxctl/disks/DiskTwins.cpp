@@ -62,17 +62,11 @@ void DiskTwins::FindDevices() {
   }
 }
 
-// All paths of a device come to the same list, so to look at the last one is not enough, and at all of them
-// too much: a map is rarely far from its paths.
-void DiskTwins::Add(std::size_t index, Devices& devices) const {
-  constexpr std::size_t looked = 16;
-  const std::size_t first = devices.size() < looked ? 0 : devices.size() - looked;
-  for (std::size_t i = first; i < devices.size(); ++i) {
-    if (_deviceOf[devices[i]] == _deviceOf[index]) {
-      return;
-    }
+// All paths of a device come to the same list, and count once there.
+void DiskTwins::Add(std::size_t index, Devices& devices) {
+  if (_listed.emplace(&devices, _deviceOf[index]).second) {
+    devices.push_back(index);
   }
-  devices.push_back(index);
 }
 
 std::string DiskTwins::NameOf(std::size_t index) const {

@@ -3,8 +3,10 @@
 
 #include <cstddef>
 #include <optional>
+#include <set>
 #include <string>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
 #include "otxctl/disks/DiskFacts.h"
@@ -33,15 +35,16 @@ class DiskTwins {
 
   void FindDevices();
   void AddSerial(std::size_t index, bool isNamed);
-  void Add(std::size_t index, Devices& devices) const;
+  void Add(std::size_t index, Devices& devices);
   std::vector<const Devices*> LikeIt(std::size_t index) const;
   std::string NameOf(std::size_t index) const;
 
   const std::vector<DiskFacts>& _disks;
   std::vector<std::size_t> _deviceOf;  // a path has the number of its map
   std::unordered_map<std::string, Devices> _byName;
-  std::unordered_map<std::string, SameSerial> _bySerial;    // and model, if it tells one
-  std::unordered_map<std::string, SameSerial> _ofAnyModel;  // those that tell one, by serial number alone
+  std::unordered_map<std::string, SameSerial> _bySerial;     // and model, if it tells one
+  std::unordered_map<std::string, SameSerial> _ofAnyModel;   // those that tell one, by serial number alone
+  std::set<std::pair<const Devices*, std::size_t>> _listed;  // devices that stand in a list already
   Devices _unidentified;
 };
 

@@ -33,13 +33,13 @@ std::string ReadMachineId() {
 
 std::shared_ptr<LinuxHost> HostOfThisSystem(const std::string& settingsFile) {
   ReadHostSettings(settingsFile);  // a mistake in it is told when the program starts
-  const auto commands = std::make_shared<OtxCtl::Linux::SystemCommands>();
+  auto commands = std::make_unique<OtxCtl::Linux::SystemCommands>();
   OtxCtl::Linux::LinuxHostOptions options;
   options.volumeManager = commands->Has("/usr/sbin/lvm") ? "/usr/sbin/lvm" : "/sbin/lvm";
   options.machineId = ReadMachineId();
   options.readSettings = [settingsFile] { return ReadHostSettings(settingsFile); };
   return std::make_shared<LinuxHost>(std::move(options), std::make_unique<OtxCtl::Linux::BlkidProbe>(),
-                                     std::make_unique<OtxCtl::Linux::SystemCommands>());
+                                     std::move(commands));
 }
 
 }  // namespace

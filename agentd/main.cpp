@@ -99,6 +99,7 @@ void Serve(Options& options) {
   if (!options.traceFile.empty()) {
     options.runtime.recorder = Agentd::TraceTo(options.traceFile);
   }
+  options.machine.alone = true;
   options.runtime.makeMachine = Machines::MachineOf(options.machine);
   Host::HostRuntime& runtime = Host::HostRuntime::Start(options.runtime);
   const Host::KovaService service(runtime.Hooks(), &runtime.GetMachine());

@@ -41,7 +41,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     }
     std::vector<OtxCtl::Linux::ScannedDisk> disks(1);
     disks[0].deviceNumber = "8:0";
-    OtxCtl::Linux::FindDiskGroups(physical, logical, "m1", disks);
+    OtxCtl::Linux::FindDiskGroups(physical, logical, "m1", {}, disks);
   } catch (const BadReport&) {
     return 0;
   }

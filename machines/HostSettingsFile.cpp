@@ -26,7 +26,8 @@ using OtxCtl::Linux::HostSettings;
 constexpr std::size_t longestFile = std::size_t{1} << 20;
 constexpr const char* capacityFlashKey = "capacityFlash";
 constexpr const char* minimumKey = "minimumDiskBytes";
-constexpr std::array<std::string_view, 4> describedKeys = {"cluster", "faultDomain", "networks", minimumKey};
+constexpr std::array<std::string_view, 5> describedKeys = {"autoMode", "cluster", "faultDomain", "networks",
+                                                           minimumKey};
 
 // False: there is no such file.
 bool CheckFile(const std::string& file) {
@@ -98,6 +99,7 @@ HostSettings Read(const std::string& file, const json& document) {
   }
   try {
     const OtxCtl::Sim::HostDescription host = OtxCtl::Sim::ReadHostDescription(described);
+    settings.isAutoMode = host.autoMode;
     settings.isInCluster = host.cluster.enabled;
     settings.clusterUuid = host.cluster.clusterUuid;
     settings.nodeUuid = host.cluster.nodeUuid;

@@ -1,9 +1,11 @@
 #include "machines/LinuxMachine.h"
 
+#include <chrono>
 #include <fstream>
 #include <system_error>
 #include <utility>
 
+#include "host/HostError.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "machines/HostSettingsFile.h"
 #include "machines/LinuxInventory.h"
@@ -14,6 +16,7 @@
 
 namespace Machines {
 
+using OtxCtl::Linux::GroupChanges;
 using OtxCtl::Linux::LinuxHost;
 using OtxCtl::Linux::LinuxSnapshot;
 using Tessa::Service::LogLevel;
@@ -31,6 +34,12 @@ std::string ReadMachineId() {
   return id;
 }
 
+constexpr const char* stateFolder = "/var/lib/kova";
+constexpr const char* lockFile = "/run/kova/disks.lock";
+
+// A volume manager that has not ended after this time is asked to, and told of.
+constexpr std::chrono::minutes changeLimit(10);
+
 std::shared_ptr<LinuxHost> HostOfThisSystem(const std::string& settingsFile) {
   ReadHostSettings(settingsFile);  // a mistake in it is told when the program starts
   auto commands = std::make_unique<OtxCtl::Linux::SystemCommands>();
@@ -38,13 +47,39 @@ std::shared_ptr<LinuxHost> HostOfThisSystem(const std::string& settingsFile) {
   options.volumeManager = commands->Has("/usr/sbin/lvm") ? "/usr/sbin/lvm" : "/sbin/lvm";
   options.machineId = ReadMachineId();
   options.readSettings = [settingsFile] { return ReadHostSettings(settingsFile); };
+  options.stateFolder = stateFolder;
   return std::make_shared<LinuxHost>(std::move(options), std::make_unique<OtxCtl::Linux::BlkidProbe>(),
                                      std::move(commands));
 }
 
+std::shared_ptr<GroupChanges> ChangesOf(const std::shared_ptr<LinuxHost>& host,
+                                        const MachineOptions& options) {
+  OtxCtl::Linux::ChangeTools tools;
+  tools.commands = std::make_unique<OtxCtl::Linux::SystemCommands>(changeLimit);
+  tools.locks = std::make_unique<OtxCtl::Linux::DeviceFileLocks>(host->GetOptions().paths);
+  tools.lockFile = lockFile;
+  tools.log = [](const std::string& line) { Log(LogLevel::Info, "%1", line); };
+  if (options.dryRun) {
+    tools.dryRun = [print = options.dryRun](const std::vector<std::string>& command) {
+      print(OtxCtl::Linux::InWords(command));
+    };
+  }
+  auto changes = std::make_shared<GroupChanges>(host, std::move(tools));
+  if (options.alone) {
+    try {
+      changes->KeepOthersOut();
+    } catch (const HostCtl::Lib::HostCtlException& refused) {
+      throw Host::HostError(refused.Describe());
+    }
+  }
+  return changes;
+}
+
 }  // namespace
 
-LinuxMachine::LinuxMachine(const std::string& settingsFile) : LinuxMachine(HostOfThisSystem(settingsFile)) {
+LinuxMachine::LinuxMachine(const MachineOptions& options)
+    : _host(HostOfThisSystem(options.settings)), _changes(ChangesOf(_host, options)) {
+  _host->SetListener([this] { TellListener(); });
   try {
     _events.emplace([this] { Follow(); });
   } catch (const std::system_error& failed) {
@@ -54,7 +89,8 @@ LinuxMachine::LinuxMachine(const std::string& settingsFile) : LinuxMachine(HostO
   }
 }
 
-LinuxMachine::LinuxMachine(std::shared_ptr<LinuxHost> host) : _host(std::move(host)) {
+LinuxMachine::LinuxMachine(std::shared_ptr<LinuxHost> host, std::shared_ptr<GroupChanges> changes)
+    : _host(std::move(host)), _changes(std::move(changes)) {
   _host->SetListener([this] { TellListener(); });
 }
 
@@ -65,7 +101,7 @@ LinuxMachine::~LinuxMachine() {
 }
 
 std::unique_ptr<HostCtl::Kova::KovaInfo> LinuxMachine::MakeProvider() {
-  return std::make_unique<OtxCtl::Linux::LinuxProvider>(_host);
+  return std::make_unique<OtxCtl::Linux::LinuxProvider>(_host, _changes);
 }
 
 Tessa::Ref<Nox::Host::StorageDeviceInfo> LinuxMachine::GetInventory() {

@@ -8,12 +8,16 @@ namespace Machines {
 
 std::unique_ptr<Host::Machine> MakeMachine(const MachineOptions& options) {
   if (options.host != thisMachine) {
+    if (options.dryRun) {
+      throw Host::HostError(
+          "--dry-run is for the disks of this machine (--host linux); other hosts have none");
+    }
     return std::make_unique<SimulatedMachine>(options);
   }
   if (options.save) {
     throw Host::HostError("--save is for hosts that are described in a file; this machine is not");
   }
-  return std::make_unique<LinuxMachine>(options.settings);
+  return std::make_unique<LinuxMachine>(options);
 }
 
 Host::MachineFactory MachineOf(const MachineOptions& options) {

@@ -4,6 +4,7 @@
 // further kind is a folder or a file beside this one, and its line in MakeMachine.
 #pragma once
 
+#include <functional>
 #include <optional>
 #include <string>
 
@@ -21,7 +22,11 @@ struct MachineOptions {
   std::optional<std::string> description = std::nullopt;
   bool save = false;                             // write every change of the host back to its file
   std::string settings = "/etc/kova/host.json";  // of this machine (HostSettingsFile.h)
-  bool waitForFaults = true;                     // whether delays that the host has on demand are waited for
+  // Of this machine: no other program may change its disks while this one lives (an agent).
+  bool alone = false;
+  // Of this machine: given each command that would change a disk, in place of running it.
+  std::function<void(const std::string& command)> dryRun = {};
+  bool waitForFaults = true;  // whether delays that the host has on demand are waited for
 };
 
 // Throws Host::HostError, OtxCtl::Sim::HostFileError or OtxCtl::Sim::HostDescriptionError.

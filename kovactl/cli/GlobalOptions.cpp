@@ -1,4 +1,5 @@
 #include <cstdlib>
+#include <iostream>
 
 #include "kovactl/cli/CommandLine.h"
 
@@ -49,6 +50,13 @@ void AddGlobalOptions(CLI::App& app, CommandLine& line) {
   app.add_option("--settings", global.machine.settings,
                  "Of this machine, what no kernel knows: cluster, networks, capacity flash")
       ->capture_default_str();
+  app.add_flag_callback(
+         "--dry-run",
+         [&global] {
+           global.machine.dryRun = [](const std::string& command) { std::cout << command << std::endl; };
+         },
+         "With --host linux, print the commands that would change disks, and run none")
+      ->needs(host);
   app.add_flag("--save", global.machine.save, "With --host, write changes back to the host description");
   app.add_option("-o,--output", global.output, "How to print: table, json or soap")
       ->check(CLI::IsMember({"table", "json", "soap"}))

@@ -1,6 +1,7 @@
 #include "otxctl/linux/BlkidProbe.h"
 
 #include <fcntl.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <sys/sysmacros.h>
 
@@ -51,19 +52,8 @@ std::string WhyAnother(const FileDescriptor& file, const std::string& node, cons
 
 }  // namespace
 
+// Whoever changes the disk has locked it for himself, and would be disturbed by a claim.
 ProbeResult BlkidProbe::Probe(const std::string& node, const std::string& number) {
-  bool isBusy = false;
-  {
-    const FileDescriptor claim = Open(node, O_EXCL);
-    isBusy = !claim.IsOpen() && errno == EBUSY;
-    if (!claim.IsOpen() && !isBusy) {
-      return WhyNotOpen(node, errno);
-    }
-    const std::string why = claim.IsOpen() ? WhyAnother(claim, node, number) : "";
-    if (!why.empty()) {
-      return Unknown(why);
-    }
-  }
   const FileDescriptor file = Open(node, 0);
   if (!file.IsOpen()) {
     return WhyNotOpen(node, errno);
@@ -72,8 +62,27 @@ ProbeResult BlkidProbe::Probe(const std::string& node, const std::string& number
   if (!why.empty()) {
     return Unknown(why);
   }
+  bool isBusy = flock(file.Get(), LOCK_SH | LOCK_NB) != 0;
+  if (!isBusy) {
+    const FileDescriptor claim = Open(node, O_EXCL);
+    isBusy = !claim.IsOpen() && errno == EBUSY;
+    if (!claim.IsOpen() && !isBusy) {
+      return WhyNotOpen(node, errno);
+    }
+  }
   Signatures signatures = ReadSignatures(file.Get(), Tessa::Escape(node));
   return {std::move(signatures.all), std::move(signatures.partitionTable), isBusy};
+}
+
+bool HoldsData(const std::string& path) {
+  const FileDescriptor file = Open(path, 0);
+  if (!file.IsOpen()) {
+    return true;
+  }
+  const Signatures found = ReadSignatures(file.Get(), Tessa::Escape(path));
+  const bool isEmpty = found.all.IsKnown() && found.all.Get().empty() && found.partitionTable.IsKnown() &&
+                       found.partitionTable.Get().empty();
+  return !isEmpty;
 }
 
 }  // namespace OtxCtl::Linux

@@ -15,4 +15,7 @@ class BlkidProbe : public DiskProbe {
   ProbeResult Probe(const std::string& node, const std::string& number) override;
 };
 
+// Whether a signature or a partition table stands on the device of this path. True if nobody can tell.
+bool HoldsData(const std::string& path);
+
 }  // namespace OtxCtl::Linux

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <functional>
+#include <utility>
 
 #include "otxctl/linux/testing/TestGroups.h"
 
@@ -20,9 +21,15 @@ struct Machine {
   std::vector<PhysicalVolume> physical = {MemberVolume("1", "cache", "u1"),
                                           MemberVolume("2", "capacity", "u2", "g1", 1),
                                           MemberVolume("3", "capacity", "u3", "g1", 0)};
-  std::vector<LogicalVolume> logical = {{"vg-uuid-g1", true}, {"vg-uuid-g1", true}};
+  std::vector<LogicalVolume> logical = {DataVolumeOf("u2"), DataVolumeOf("u3")};
+  std::vector<std::string> underChange;
+  std::vector<Unfinished> unfinished;
 
-  std::vector<DiskGroup> Find() { return FindDiskGroups(physical, logical, testMachine, disks); }
+  std::vector<DiskGroup> Find(const std::string& machineId = testMachine) {
+    FoundGroups found = FindDiskGroups(physical, logical, machineId, underChange, disks);
+    unfinished = std::move(found.unfinished);
+    return std::move(found.groups);
+  }
 
   // The one line that is told of each disk.
   std::string WordsOf(std::size_t disk) const { return disks[disk].facts.signatures.Get().at(0); }
@@ -58,9 +65,155 @@ TEST(DiskGroups, AreMountedWhenAllTheirVolumesAreActive) {
   machine.logical[1].isActive = false;
   EXPECT_FALSE(machine.Find().at(0).isMounted);
   EXPECT_EQ(machine.disks[0].facts.membership, Membership::Unmounted);
-  Machine without;
-  without.logical.clear();
-  EXPECT_FALSE(without.Find().at(0).isMounted);
+}
+
+TEST(DiskGroups, AreNotMountedOnADiskThatWentAway) {
+  Machine capacity;
+  capacity.disks[2].facts.holders = std::vector<std::string>();
+  EXPECT_FALSE(capacity.Find().at(0).isMounted) << "its map is on the disk that was there before";
+  Machine cache;
+  cache.disks[0].facts.holders = std::vector<std::string>();
+  EXPECT_FALSE(cache.Find().at(0).isMounted);
+  Machine unknown;
+  unknown.disks[0].facts.holders = Disks::Fact<std::vector<std::string>>::Unknown("why");
+  EXPECT_TRUE(unknown.Find().at(0).isMounted);
+}
+
+TEST(DiskGroups, AreNotMountedBeforeAMemberThatCameBackIsTakenBack) {
+  for (const std::size_t member : {0, 2}) {
+    Machine machine;
+    machine.physical[member].isLeftBehind = true;
+    const auto groups = machine.Find();
+    ASSERT_EQ(groups.size(), 1U);
+    EXPECT_FALSE(groups[0].isMounted);
+    EXPECT_EQ((member == 0 ? groups[0].cache : groups[0].capacity[0]).isLeftBehind, true);
+  }
+}
+
+TEST(DiskGroups, TellOfTheirVolumes) {
+  Machine machine;
+  const auto groups = machine.Find();
+  EXPECT_EQ(groups.at(0).volumeGroup, "vg-g1");
+  EXPECT_EQ(groups[0].volumeGroupUuid, "vg-uuid-g1");
+  EXPECT_EQ(groups[0].cache.extents, 511);
+  EXPECT_EQ(groups[0].cache.deviceNode, "/dev/sd1");
+  const DataVolume& volume = groups[0].capacity.at(1).volume;
+  EXPECT_EQ(volume.path, "/dev/vg-g1/data_u2");
+  EXPECT_EQ(volume.bytes, std::int64_t{4} << 30);
+  EXPECT_EQ(volume.cacheState, "37% of its cache used");
+  EXPECT_TRUE(volume.isActive);
+  EXPECT_FALSE(volume.isOpen);
+  EXPECT_THAT(groups[0].foreignVolumes, IsEmpty());
+}
+
+TEST(DiskGroups, TellHowAVolumeIsCached) {
+  const auto stateWith = [](const std::function<void(LogicalVolume&)>& change) {
+    Machine machine;
+    change(machine.logical[0]);
+    return machine.Find().at(0).capacity.at(1).volume.cacheState;
+  };
+  EXPECT_EQ(stateWith([](LogicalVolume& v) { v.isActive = false; }), "cached, not active");
+  EXPECT_EQ(stateWith([](LogicalVolume& v) { v.cacheBlocks = 0; }), "cached, not active");
+  EXPECT_EQ(stateWith([](LogicalVolume& v) { v.cacheMode = "writeback"; }), "cached in mode writeback");
+  EXPECT_EQ(stateWith([](LogicalVolume& v) { v.cacheMode.clear(); }), "cached in mode unknown");
+}
+
+TEST(DiskGroups, VolumesOfOthersInThemAreTold) {
+  Machine machine;
+  LogicalVolume own = DataVolumeOf("u2");
+  own.name = "data_u2_cache";
+  own.tags.clear();
+  LogicalVolume foreign = own;
+  foreign.name = "home";
+  machine.logical.insert(machine.logical.end(), {own, foreign});
+  EXPECT_THAT(machine.Find().at(0).foreignVolumes, ElementsAre("home"));
+}
+
+// A disk is a member from the moment its volume is cached until it is removed.
+TEST(DiskGroups, ADiskWithoutAWholeVolumeIsHalfWay) {
+  struct Row {
+    const char* title;
+    std::function<void(Machine&)> change;
+    std::vector<std::string> volumes;
+  };
+  const std::vector<Row> rows = {
+      {"no volume yet", [](Machine& m) { m.logical.erase(m.logical.begin()); }, {}},
+      {"no marks yet",
+       [](Machine& m) {
+         m.logical.erase(m.logical.begin());
+         m.physical[1].tags.clear();
+       },
+       {}},
+      {"not yet cached",
+       [](Machine& m) {
+         m.logical[0].kind = "linear";
+         m.logical.push_back(m.logical[0]);
+         m.logical.back().name = "data_u2_cache";
+         m.logical.back().tags.clear();
+       },
+       {"data_u2", "data_u2_cache"}},
+  };
+  for (const Row& row : rows) {
+    SCOPED_TRACE(row.title);
+    Machine machine;
+    row.change(machine);
+    const auto groups = machine.Find();
+    ASSERT_EQ(groups.size(), 1U);
+    EXPECT_THAT(UuidsOf(groups[0]), ElementsAre("u1", "u3"));
+    EXPECT_TRUE(groups[0].isMounted);
+    EXPECT_EQ(machine.WordsOf(1), "half way into disk group g1, or out of it");
+    EXPECT_EQ(machine.disks[1].facts.membership, Membership::None);
+    ASSERT_EQ(machine.unfinished.size(), 1U);
+    EXPECT_THAT(machine.unfinished[0].disks, ElementsAre("naa.2"));
+    EXPECT_THAT(machine.unfinished[0].deviceNodes, ElementsAre("/dev/sd2"));
+    EXPECT_EQ(machine.unfinished[0].volumeGroup, "vg-g1");
+    EXPECT_FALSE(machine.unfinished[0].isWholeGroup);
+    EXPECT_EQ(machine.unfinished[0].volumes, row.volumes);
+  }
+}
+
+TEST(DiskGroups, VolumesWithoutACacheAreThoseOfAGroupWhoseCacheDiskHasLeft) {
+  Machine machine;
+  machine.disks.erase(machine.disks.begin());
+  machine.physical[0].deviceNumber.clear();
+  machine.logical[0].kind = "linear";
+  const auto groups = machine.Find();
+  ASSERT_EQ(groups.size(), 1U);
+  EXPECT_EQ(groups[0].capacity.size(), 2U);
+  EXPECT_EQ(groups[0].capacity[1].volume.cacheState, "not cached");
+}
+
+TEST(DiskGroups, HalfMadeAndHalfRemovedOnesOfThisMachineCanBeCleanedUp) {
+  for (const char* const state : {"creating", "removing"}) {
+    Machine machine;
+    for (PhysicalVolume& volume : machine.physical) {
+      volume.groupTags[3] = std::string("kova.state=") + state;
+    }
+    EXPECT_THAT(machine.Find(), IsEmpty());
+    ASSERT_EQ(machine.unfinished.size(), 1U) << state;
+    EXPECT_TRUE(machine.unfinished[0].isWholeGroup);
+    EXPECT_EQ(machine.unfinished[0].volumeGroup, "vg-g1");
+    EXPECT_THAT(machine.unfinished[0].disks, ElementsAre("naa.1", "naa.2", "naa.3"));
+    for (PhysicalVolume& volume : machine.physical) {
+      volume.groupTags[2] = "kova.machine=machine-2";
+    }
+    machine.Find();
+    EXPECT_THAT(machine.unfinished, IsEmpty()) << "another machine may be at it";
+  }
+}
+
+TEST(DiskGroups, WhatAChangeLeftInNoVolumeGroupCanBeCleanedUp) {
+  Machine machine;
+  machine.physical[1].groupUuid.clear();
+  machine.physical[2].groupUuid.clear();
+  machine.underChange = {"naa.9", "naa.3"};
+  machine.Find();
+  EXPECT_EQ(machine.WordsOf(1), "LVM physical volume in no volume group");
+  EXPECT_EQ(machine.WordsOf(2), "LVM physical volume that an unfinished change of a disk group left behind");
+  EXPECT_EQ(machine.disks[2].facts.signatures.Get().size(), 1U);
+  ASSERT_EQ(machine.unfinished.size(), 1U);
+  EXPECT_THAT(machine.unfinished[0].disks, ElementsAre("naa.3"));
+  EXPECT_EQ(machine.unfinished[0].volumeGroup, "");
 }
 
 TEST(DiskGroups, KeepMembersThatHaveLeft) {
@@ -91,6 +244,7 @@ TEST(DiskGroups, StandInOrderOfCreation) {
         MemberVolume(number, *number == '4' ? "cache" : "capacity", std::string("v") + number, "g0"));
     machine.physical.back().groupTags.back() = "kova.created=4";
   }
+  machine.logical.push_back(DataVolumeOf("v5", "g0"));
   const auto groups = machine.Find();
   ASSERT_EQ(groups.size(), 2U);
   EXPECT_EQ(groups[0].uuid, "g0");
@@ -118,6 +272,11 @@ TEST(DiskGroups, WhatIsNotWholeAndOursIsShownAsWhatItIsAndNeverClaimed) {
       {[](Machine& m) { SetGroupTag(m, 3, "kova.state=creating"); },
        "member of disk group g1, which was never finished"},
       {[](Machine& m) { SetGroupTag(m, 3, "x"); }, "member of disk group g1, which was never finished"},
+      {[](Machine& m) { SetGroupTag(m, 3, "kova.state=removing"); },
+       "member of disk group g1, of which the removal was not finished"},
+      {[](Machine& m) { SetGroupTag(m, 3, "kova.state=released"); },
+       "member of disk group g1, whose cache disk was removed while its volumes held data"},
+      {[](Machine& m) { m.logical.clear(); }, "member of disk group g1, which is not whole"},
       {[](Machine& m) { m.physical[1].tags[0] = "x"; },
        "member of disk group g1, whose members are not marked as they should be"},
       {[](Machine& m) { m.physical[1].tags[0] = "kova.disk=u1"; },
@@ -152,7 +311,7 @@ TEST(DiskGroups, WhatIsNotWholeAndOursIsShownAsWhatItIsAndNeverClaimed) {
 TEST(DiskGroups, WithoutAnIdOfThisMachineNoneIsOurs) {
   Machine machine;
   SetGroupTag(machine, 2, "kova.machine=");
-  EXPECT_THAT(FindDiskGroups(machine.physical, machine.logical, "", machine.disks), IsEmpty());
+  EXPECT_THAT(machine.Find(""), IsEmpty());
 }
 
 TEST(DiskGroups, TwoVolumeGroupsThatClaimOneIdentityAreBothLeftAlone) {

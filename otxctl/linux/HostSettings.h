@@ -12,6 +12,7 @@ namespace OtxCtl::Linux {
 
 struct HostSettings {
   std::int64_t minimumDiskBytes = std::int64_t{1} << 30;
+  bool isAutoMode = false;  // the service claims disks on its own
   bool isInCluster = false;
   std::string clusterUuid;
   std::string nodeUuid;

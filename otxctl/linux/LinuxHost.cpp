@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "kova/agentd/include/HostCtlException.h"
+#include "otxctl/linux/ChangeRecord.h"
 
 namespace OtxCtl::Linux {
 namespace {
@@ -72,6 +73,19 @@ std::shared_ptr<const LinuxSnapshot> LinuxHost::Look() {
   return oneLook->_seen;
 }
 
+std::shared_ptr<const LinuxSnapshot> LinuxHost::LookAgain() {
+  Forget();
+  return Look();
+}
+
+void LinuxHost::Forget() {
+  if (oneLook != nullptr && oneLook->_host == this) {
+    oneLook->_host = nullptr;
+  }
+  const std::lock_guard guard(_mutex);
+  _lookedAt = Clock::time_point();
+}
+
 std::shared_ptr<const LinuxSnapshot> LinuxHost::LookAnew() {
   std::shared_ptr<const LinuxSnapshot> seen;
   Listener listener;
@@ -110,18 +124,24 @@ void LinuxHost::SetListener(Listener listener) {
   _listener = std::move(listener);
 }
 
-LinuxSnapshot LinuxHost::TakeSnapshot() {
-  LinuxSnapshot snapshot;
+HostSettings LinuxHost::ReadSettings() const {
   try {
-    snapshot.settings = _options.readSettings();
+    return _options.readSettings();
   } catch (const std::exception& refused) {
     Fail("this host's settings cannot be used", refused.what());
   }
+}
+
+LinuxSnapshot LinuxHost::TakeSnapshot() {
+  LinuxSnapshot snapshot;
+  snapshot.settings = ReadSettings();
   DiskScan scan = ScanDisks(_options.paths, *_probe);
   if (!scan.whyIncomplete.empty()) {
     Fail("this machine's disks cannot be looked at", scan.whyIncomplete);
   }
-  snapshot.groups = FindGroups(scan.disks);
+  FoundGroups found = FindGroups(scan.disks);
+  snapshot.groups = std::move(found.groups);
+  snapshot.unfinished = std::move(found.unfinished);
   std::vector<Disks::DiskFacts> facts;
   facts.reserve(scan.disks.size());
   for (const ScannedDisk& disk : scan.disks) {
@@ -134,7 +154,7 @@ LinuxSnapshot LinuxHost::TakeSnapshot() {
 }
 
 // At most two programs are run, and none where no disk is a physical volume.
-std::vector<DiskGroup> LinuxHost::FindGroups(std::vector<ScannedDisk>& disks) {
+FoundGroups LinuxHost::FindGroups(std::vector<ScannedDisk>& disks) {
   if (std::none_of(disks.begin(), disks.end(), &IsPhysicalVolume) ||
       !_commands->Has(_options.volumeManager)) {
     return {};
@@ -145,11 +165,10 @@ std::vector<DiskGroup> LinuxHost::FindGroups(std::vector<ScannedDisk>& disks) {
     if (HasMarkedGroup(physical)) {
       logical = ReadLogicalVolumes(Report("lvs", logicalVolumeColumns, disks));
     }
-    return FindDiskGroups(physical, logical, _options.machineId, disks);
-  } catch (const CommandFailed& failed) {
+    const auto underChange = ChangeRecord(_options.stateFolder).Read();
+    return FindDiskGroups(physical, logical, _options.machineId, underChange, disks);
+  } catch (const std::runtime_error& failed) {  // a command, its report, or the record of changes
     Fail("the volume groups cannot be read", failed.what());
-  } catch (const BadReport& bad) {
-    Fail("the volume groups cannot be read", bad.what());
   }
 }
 

@@ -25,6 +25,7 @@ struct LinuxSnapshot {
   std::vector<Disks::DiskVerdict> verdicts;  // of the disks, in their order
   std::vector<LeftOut> leftOut;
   std::vector<DiskGroup> groups;  // in order of creation
+  std::vector<Unfinished> unfinished;
   HostSettings settings;
 
   // "disk sda: ext4 file system" and the like, for who compares two looks.
@@ -37,6 +38,7 @@ struct LinuxHostOptions {
   std::string machineId;
   // Throws anything that says what is wrong.
   std::function<HostSettings()> readSettings = [] { return HostSettings(); };
+  std::string stateFolder;  // where changes leave word of what they do (ChangeRecord.h); empty: nowhere
   // A look that is younger answers the next question too; the questions of one operation come together.
   std::chrono::milliseconds freshness = std::chrono::milliseconds(1000);
 };
@@ -65,10 +67,21 @@ class LinuxHost {
   // A new look, but for those within a OneLook. Throws HostCtl::Lib::HostCtlException if the machine cannot
   // be looked at; what was seen last stays.
   std::shared_ptr<const LinuxSnapshot> Look();
+  // A new look, also within a OneLook, which goes by it from now on.
+  std::shared_ptr<const LinuxSnapshot> LookAgain();
+  // What was seen is no answer to any further question.
+  void Forget();
   // The last look if it is fresh, else a new one.
   std::shared_ptr<const LinuxSnapshot> Current();
   // The last one, however old; null: nobody has looked.
   std::shared_ptr<const LinuxSnapshot> Last() const;
+
+  // What the operator says of the machine; no disk is looked at. Throws HostCtl::Lib::HostCtlException.
+  HostSettings ReadSettings() const;
+  // What stands on one disk now.
+  ProbeResult Probe(const ScannedDisk& disk) { return _probe->Probe(disk.deviceNode, disk.deviceNumber); }
+
+  const LinuxHostOptions& GetOptions() const noexcept { return _options; }
 
   // Called after each look that differs from the one before, by the thread that looked.
   void SetListener(Listener listener);
@@ -78,7 +91,7 @@ class LinuxHost {
 
   std::shared_ptr<const LinuxSnapshot> LookAnew();
   LinuxSnapshot TakeSnapshot();
-  std::vector<DiskGroup> FindGroups(std::vector<ScannedDisk>& disks);
+  FoundGroups FindGroups(std::vector<ScannedDisk>& disks);
   std::string Report(const char* command, const char* columns, const std::vector<ScannedDisk>& disks);
 
   const LinuxHostOptions _options;

@@ -70,7 +70,7 @@ TEST(LinuxHost, AsksForVolumesOnlyOfGroupsWithKovasMarks) {
   }
   const auto seen = machine.Host()->Look();
   EXPECT_THAT(machine.results.commands, SizeIs(1));
-  EXPECT_EQ(seen->verdicts[0].detail, "member of volume group vg");
+  EXPECT_EQ(seen->verdicts[0].detail, "member of volume group vg, held by vg-d (LVM)");
 }
 
 TEST(LinuxHost, WithoutAVolumeManagerAPhysicalVolumeIsSomebodysAllTheSame) {
@@ -79,7 +79,7 @@ TEST(LinuxHost, WithoutAVolumeManagerAPhysicalVolumeIsSomebodysAllTheSame) {
   machine.results.areThere = false;
   const auto seen = machine.Host()->Look();
   EXPECT_THAT(seen->groups, IsEmpty());
-  EXPECT_EQ(seen->verdicts[0].detail, "LVM physical volume");
+  EXPECT_EQ(seen->verdicts[0].detail, "LVM physical volume, held by vg-d (LVM)");
 }
 
 TEST(LinuxHost, GroupsThatCannotBeReadAreAnErrorNotNone) {

@@ -17,11 +17,6 @@ using HostCtl::Kova::DiskState;
 
 constexpr std::uint8_t groupFormatVersion = 3;
 
-[[noreturn]] void RefuseChange() {
-  throw HostCtl::Lib::HostCtlException(
-      "the disks of this machine can only be looked at: nothing was changed");
-}
-
 DiskName NameOf(const GroupMember& member) {
   return {member.canonicalName, member.kovaUuid};
 }
@@ -114,66 +109,71 @@ void LinuxProvider::GetDiskMappings(std::vector<DiskMapping>& mappings, bool wit
   }
 }
 
-void LinuxProvider::FormatDiskMapping(const std::string&, const std::vector<std::string>&,
+GroupChanges& LinuxProvider::Changes() const {
+  if (_changes == nullptr) {
+    throw HostCtl::Lib::HostCtlException(
+        "the disks of this machine can only be looked at: nothing was changed");
+  }
+  return *_changes;
+}
+
+void LinuxProvider::FormatDiskMapping(const std::string& ssd, const std::vector<std::string>& capacityDisks,
                                       const HostCtl::Kova::FormatContext&) {
-  RefuseChange();
+  Changes().Format(ssd, capacityDisks);
 }
 
-void LinuxProvider::RestampDiskMapping(const std::string&, const std::vector<std::string>&) {
-  RefuseChange();
+void LinuxProvider::RestampDiskMapping(const std::string& ssd, const std::vector<std::string>&) {
+  Changes().Restamp(ssd);
 }
 
-void LinuxProvider::MountDiskMapping(const std::string&, bool) {
-  RefuseChange();
+void LinuxProvider::MountDiskMapping(const std::string& ssd, bool) {
+  Changes().Mount(ssd);
 }
 
-void LinuxProvider::RestampDiskMappingByUuid(const std::string&) {
-  RefuseChange();
+void LinuxProvider::RestampDiskMappingByUuid(const std::string& kovaUuid) {
+  Changes().RestampByUuid(kovaUuid);
 }
 
-void LinuxProvider::RemoveDisk(const std::string&, const std::string&, const HostCtl::Kova::RemovalOptions&) {
-  RefuseChange();
+void LinuxProvider::RemoveDisk(const std::string& disk, const std::string&,
+                               const HostCtl::Kova::RemovalOptions& options) {
+  Changes().RemoveDisk(disk, options);
 }
 
-void LinuxProvider::RemoveDiskMapping(const std::string&, const std::string&,
-                                      const HostCtl::Kova::RemovalOptions&) {
-  RefuseChange();
+void LinuxProvider::RemoveDiskMapping(const std::string& ssd, const std::string&,
+                                      const HostCtl::Kova::RemovalOptions& options) {
+  Changes().RemoveGroup(ssd, options);
 }
 
-void LinuxProvider::UnmountDiskMapping(const std::string&) {
-  RefuseChange();
+void LinuxProvider::UnmountDiskMapping(const std::string& ssd) {
+  Changes().Unmount(ssd);
 }
 
-void LinuxProvider::RemoveDiskByUuid(const std::string&, const std::string&) {
-  RefuseChange();
+void LinuxProvider::RemoveDiskByUuid(const std::string& kovaUuid, const std::string&) {
+  Changes().RemoveByUuid(kovaUuid);
 }
 
 bool LinuxProvider::IsAutoModeEnabled() {
-  return false;
+  return _host->ReadSettings().isAutoMode;
 }
 
 std::vector<HostCtl::Kova::KovaOtxNicConfig*> LinuxProvider::GetKovaOtxNicConfigs() {
-  return Provider::MakeNicRecords(_host->Current()->settings.nics);
+  return Provider::MakeNicRecords(_host->ReadSettings().nics);
 }
 
 void LinuxProvider::GetClusterInfoDetailed(HostCtl::Kova::KovaClusterInfoDetailed& info) {
-  const auto seen = _host->Current();
+  const HostSettings settings = _host->ReadSettings();
   info = {};
-  info.enabled = seen->settings.isInCluster;
-  info.clusterUuid = seen->settings.clusterUuid;
-  info.nodeUuid = seen->settings.nodeUuid;
+  info.enabled = settings.isInCluster;
+  info.clusterUuid = settings.clusterUuid;
+  info.nodeUuid = settings.nodeUuid;
 }
 
 std::string LinuxProvider::GetFaultDomainName() {
-  return _host->Current()->settings.faultDomain;
+  return _host->ReadSettings().faultDomain;
 }
 
 void LinuxProvider::ClaimUnmountedDiskgroups() {
-  for (const DiskGroup& group : _host->Current()->groups) {
-    if (!group.isMounted) {
-      RefuseChange();
-    }
-  }
+  Changes().Claim();
 }
 
 void LinuxProvider::RefreshKovaInfo() {

@@ -1,19 +1,20 @@
 // What the plug-in holds of this machine: a thin face that can be deleted while the host lives on.
 //
-// It reads. What would change a disk is refused, and changes nothing: no disk of a real machine is written
-// to.
+// Without something to change the groups by, it only reads: what would change a disk is refused.
 #pragma once
 
 #include <memory>
 
 #include "kova/agentd/include/KovaInfo.h"
+#include "otxctl/linux/GroupChanges.h"
 #include "otxctl/linux/LinuxHost.h"
 
 namespace OtxCtl::Linux {
 
 class LinuxProvider final : public HostCtl::Kova::KovaInfo {
  public:
-  explicit LinuxProvider(std::shared_ptr<LinuxHost> host) : _host(std::move(host)) {}
+  explicit LinuxProvider(std::shared_ptr<LinuxHost> host, std::shared_ptr<GroupChanges> changes = nullptr)
+      : _host(std::move(host)), _changes(std::move(changes)) {}
 
   void QueryDisks(const std::vector<std::string>& names, std::vector<HostCtl::Kova::DiskResult>& results,
                   bool flag) override;
@@ -37,7 +38,10 @@ class LinuxProvider final : public HostCtl::Kova::KovaInfo {
   void RefreshKovaInfo() override;
 
  private:
+  GroupChanges& Changes() const;
+
   const std::shared_ptr<LinuxHost> _host;
+  const std::shared_ptr<GroupChanges> _changes;
 };
 
 }  // namespace OtxCtl::Linux

@@ -1,5 +1,7 @@
 #include "otxctl/linux/LvmReport.h"
 
+#include <algorithm>
+#include <charconv>
 #include <nlohmann/json.hpp>
 
 #include "tessa/text/Escape.h"
@@ -29,6 +31,17 @@ std::string TextOf(const json& row, const char* column) {
     throw BadReport("the volume manager's report has no column " + std::string(column));
   }
   return Tessa::Sanitize(found->get_ref<const std::string&>());
+}
+
+// Whole numbers; what is empty is 0.
+std::int64_t NumberOf(const json& row, const char* column) {
+  const std::string text = TextOf(row, column);
+  std::int64_t number = 0;
+  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
+  if (!text.empty() && (error != std::errc() || end != text.data() + text.size())) {
+    throw BadReport("the volume manager's report has no number in column " + std::string(column));
+  }
+  return number;
 }
 
 std::vector<std::string> TagsOf(const json& row, const char* column) {
@@ -74,12 +87,13 @@ std::vector<PhysicalVolume> ReadPhysicalVolumes(std::string_view report) {
   return ReadRows<PhysicalVolume>(report, "pv", [](const json& row) {
     PhysicalVolume volume;
     const std::string name = TextOf(row, "pv_name");
-    const bool isMissing = !TextOf(row, "pv_missing").empty() || name.empty() || name.front() == '[';
-    if (!isMissing) {
+    if (!name.empty() && name.front() != '[') {
       volume.deviceNumber = TextOf(row, "pv_major") + ":" + TextOf(row, "pv_minor");
+      volume.isLeftBehind = !TextOf(row, "pv_missing").empty();
     }
     volume.groupName = TextOf(row, "vg_name");
     volume.groupUuid = TextOf(row, "vg_uuid");
+    volume.extents = NumberOf(row, "pv_pe_count");
     volume.tags = TagsOf(row, "pv_tags");
     volume.groupTags = TagsOf(row, "vg_tags");
     return volume;
@@ -87,10 +101,27 @@ std::vector<PhysicalVolume> ReadPhysicalVolumes(std::string_view report) {
 }
 
 std::vector<LogicalVolume> ReadLogicalVolumes(std::string_view report) {
-  return ReadRows<LogicalVolume>(report, "lv", [](const json& row) {
-    TextOf(row, "lv_name");
-    return LogicalVolume{TextOf(row, "vg_uuid"), TextOf(row, "lv_active") == "active"};
+  auto volumes = ReadRows<LogicalVolume>(report, "lv", [](const json& row) {
+    LogicalVolume volume;
+    volume.groupUuid = TextOf(row, "vg_uuid");
+    volume.name = TextOf(row, "lv_name");
+    volume.path = TextOf(row, "lv_path");
+    volume.bytes = NumberOf(row, "lv_size");
+    volume.tags = TagsOf(row, "lv_tags");
+    volume.kind = TextOf(row, "segtype");
+    volume.isActive = TextOf(row, "lv_active") == "active";
+    volume.isOpen = TextOf(row, "lv_device_open") == "open";
+    volume.cacheMode = TextOf(row, "cache_mode");
+    volume.usedBlocks = NumberOf(row, "cache_used_blocks");
+    volume.cacheBlocks = NumberOf(row, "cache_total_blocks");
+    return volume;
   });
+  // The rows of one volume stand together.
+  const auto isSame = [](const LogicalVolume& one, const LogicalVolume& other) {
+    return one.groupUuid == other.groupUuid && one.name == other.name;
+  };
+  volumes.erase(std::unique(volumes.begin(), volumes.end(), isSame), volumes.end());
+  return volumes;
 }
 
 }  // namespace OtxCtl::Linux

@@ -73,8 +73,48 @@ TEST(LvmReport, TellsWhetherVolumesAreActive) {
   const auto volumes = ReadLogicalVolumes(Recorded("lvm-tagged-lvs.json"));
   ASSERT_EQ(volumes.size(), 2U);
   EXPECT_TRUE(volumes[0].isActive);
-  EXPECT_FALSE(ReadLogicalVolumes(R"({"report":[{"lv":[{"vg_uuid":"u","lv_name":"n","lv_active":""}]}]})")[0]
-                   .isActive);
+  EXPECT_EQ(volumes[0].kind, "cache");
+  EXPECT_EQ(volumes[0].cacheMode, "writethrough");
+  EXPECT_GT(volumes[0].cacheBlocks, 0);
+}
+
+std::string Row(const std::string& name, const std::string& open, const std::string& used) {
+  return R"({"vg_uuid":"u","lv_name":")" + name +
+         R"(","lv_path":"/dev/v/n","lv_size":"8192","lv_tags":"a,b",)" +
+         R"("segtype":"linear","lv_active":"","lv_device_open":")" + open +
+         R"(","cache_mode":"","cache_used_blocks":")" + used + R"(","cache_total_blocks":"9"})";
+}
+
+TEST(LvmReport, TellsWhatAVolumeIs) {
+  const auto volumes = ReadLogicalVolumes(R"({"report":[{"lv":[)" + Row("n", "open", "7") + "," +
+                                          Row("n", "open", "7") + "," + Row("o", "unknown", "") + "]}]}");
+  ASSERT_EQ(volumes.size(), 2U) << "a volume of two segments has two rows";
+  EXPECT_EQ(volumes[0].groupUuid, "u");
+  EXPECT_EQ(volumes[0].name, "n");
+  EXPECT_EQ(volumes[0].path, "/dev/v/n");
+  EXPECT_EQ(volumes[0].bytes, 8192);
+  EXPECT_THAT(volumes[0].tags, ElementsAre("a", "b"));
+  EXPECT_EQ(volumes[0].kind, "linear");
+  EXPECT_FALSE(volumes[0].isActive);
+  EXPECT_TRUE(volumes[0].isOpen);
+  EXPECT_EQ(volumes[0].usedBlocks, 7);
+  EXPECT_EQ(volumes[0].cacheBlocks, 9);
+  EXPECT_FALSE(volumes[1].isOpen);
+  EXPECT_EQ(volumes[1].usedBlocks, 0);
+}
+
+TEST(LvmReport, ANumberThatIsNoneIsRefused) {
+  EXPECT_THROW(ReadLogicalVolumes(R"({"report":[{"lv":[)" + Row("n", "", "x") + "]}]}"), BadReport);
+}
+
+TEST(LvmReport, AMemberThatIsBackAfterItsGroupHasChangedIsLeftBehind) {
+  const std::string rows =
+      R"({"report":[{"pv":[{"pv_name":"/dev/sda","pv_major":"8","pv_minor":"0","pv_missing":"missing",
+          "pv_pe_count":"511","pv_tags":"","vg_name":"v","vg_uuid":"u","vg_tags":""}]}]})";
+  const auto volumes = ReadPhysicalVolumes(rows);
+  EXPECT_EQ(volumes.at(0).deviceNumber, "8:0");
+  EXPECT_TRUE(volumes[0].isLeftBehind);
+  EXPECT_EQ(volumes[0].extents, 511);
 }
 
 TEST(LvmReport, NothingToTellIsAReport) {
@@ -108,7 +148,7 @@ TEST(LvmReport, CutOffAnywhereItIsRefused) {
 TEST(LvmReport, HostileTextsAreCleaned) {
   const auto volumes = ReadPhysicalVolumes(
       R"({"report":[{"pv":[{"pv_name":"/dev/sda","pv_major":"8","pv_minor":"0","pv_missing":"",
-          "pv_tags":",a,,b,","vg_name":"\u001b[31mX","vg_uuid":"u","vg_tags":""}]}]})");
+          "pv_pe_count":"5","pv_tags":",a,,b,","vg_name":"\u001b[31mX","vg_uuid":"u","vg_tags":""}]}]})");
   EXPECT_EQ(volumes.at(0).groupName, "[31mX");
   EXPECT_THAT(volumes.at(0).tags, ElementsAre("a", "b"));
   EXPECT_THAT(volumes.at(0).groupTags, IsEmpty());

@@ -47,7 +47,8 @@ def commands(device):
             yield f"pvchange -q {member_tags(0, kova_uuid, 'cache')} {device[name]}"
         else:
             yield f"pvchange -q {member_tags(number - 1, kova_uuid)} {device[name]}"
-            yield f"lvcreate -q -y -n data{number - 1} -l 16 {GROUP} {device[name]}"
+            yield (f"lvcreate -q -y -n data{number - 1} {tag('add', f'kova.disk={kova_uuid}')} --type cache "
+                   f"--cachedevice {device[CACHE]} --cachesize 64m -l 16 {GROUP} {device[name]}")
 
 
 @contextlib.contextmanager

@@ -32,9 +32,25 @@ inline ScannedDisk MemberDisk(const std::string& number, bool isFlash) {
   disk.facts.partitionTable = std::string();
   disk.facts.partitions = 0;
   disk.facts.mounts = std::vector<std::string>();
-  disk.facts.holders = std::vector<std::string>();
+  disk.facts.holders = std::vector<std::string>{"vg-data (device-mapper)"};
   disk.facts.multipathMap = std::string();
   return disk;
+}
+
+// The data volume of a capacity disk, active.
+inline LogicalVolume DataVolumeOf(const std::string& uuid, const std::string& group = "g1") {
+  LogicalVolume volume;
+  volume.groupUuid = "vg-uuid-" + group;
+  volume.name = "data_" + uuid;
+  volume.path = "/dev/vg-" + group + "/data_" + uuid;
+  volume.bytes = std::int64_t{4} << 30;
+  volume.tags = {"kova.disk=" + uuid};
+  volume.kind = "cache";
+  volume.isActive = true;
+  volume.cacheMode = "writethrough";
+  volume.usedBlocks = 37;
+  volume.cacheBlocks = 100;
+  return volume;
 }
 
 // A member of a volume group with the marks of a disk group of this machine; empty number: it has left.
@@ -44,6 +60,7 @@ inline PhysicalVolume MemberVolume(const std::string& number, const std::string&
   volume.deviceNumber = number.empty() ? "" : "8:" + number;
   volume.groupName = "vg-" + group;
   volume.groupUuid = "vg-uuid-" + group;
+  volume.extents = 511;
   volume.tags = {"kova.disk=" + uuid, "kova.role=" + role, "kova.place=" + std::to_string(place)};
   volume.groupTags = {"kova", "kova.group=" + group, std::string("kova.machine=") + testMachine,
                       "kova.state=ready", "kova.created=5"};

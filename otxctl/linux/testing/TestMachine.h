@@ -34,7 +34,7 @@ class TestMachine {
     const auto row = [&state](const std::string& name, const std::string& number, const std::string& tags) {
       const std::size_t colon = number.find(':');
       return R"({"pv_name":")" + name + R"(","pv_major":")" + number.substr(0, colon) + R"(","pv_minor":")" +
-             number.substr(colon + 1) + R"(","pv_missing":"","pv_tags":")" + tags +
+             number.substr(colon + 1) + R"(","pv_missing":"","pv_pe_count":"511","pv_tags":")" + tags +
              R"(","vg_name":"vg","vg_uuid":"v","vg_tags":"kova,kova.group=g1,kova.machine=m1,kova.state=)" +
              state + R"("})";
     };
@@ -42,8 +42,14 @@ class TestMachine {
         R"({"report":[{"pv":[)" + row("/dev/sda", tree.NumberOf("sda"), "kova.disk=u1,kova.role=cache") +
         "," + row("/dev/sdb", tree.NumberOf("sdb"), "kova.disk=u2,kova.role=capacity") + "]}]}";
     results.of["lvs"].output =
-        std::string(R"({"report":[{"lv":[{"vg_uuid":"v","lv_name":"d","lv_active":")") +
-        (isActive ? "active" : "") + R"("}]}]})";
+        std::string(
+            R"({"report":[{"lv":[{"vg_uuid":"v","lv_name":"d","lv_path":"/dev/vg/d","lv_size":"4096",)") +
+        R"("lv_tags":"kova.disk=u2","segtype":"cache","lv_device_open":"","cache_mode":"writethrough",)" +
+        R"("cache_used_blocks":"1","cache_total_blocks":"4","lv_active":")" + (isActive ? "active" : "") +
+        R"("}]}]})";
+    if (isActive) {
+      tree.AddMapping("dm-0", "vg-d", "LVM-d", {"sda", "sdb"});
+    }
   }
 
   // The machine may be changed and looked at again.

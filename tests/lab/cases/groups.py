@@ -62,10 +62,14 @@ def a_capacity_disk_that_has_left_is_told_by_its_uuid_until_it_is_back(machine):
         expect.assertNotIn("hdd1", told(here.disks()))
         machine.plug("hdd1")
         machine.eventually("hdd1 is back", lambda: "hdd1" in told(here.disks()))
-        machine.eventually("the group is whole", lambda: shown(here.groups()) == [(True, WHOLE)])
+        # Its volume is mapped to the disk that went away until the group is claimed.
+        machine.eventually("the group is whole", lambda: shown(here.groups()) == [(False, WHOLE)])
+        machine.check("kovactl --agent unix:/run/agentd.sock claim")
+        expect.assertEqual(shown(here.groups()), [(True, WHOLE)])
         answers = told(here.disks())
         expect.assertEqual(answers["hdd1"], ("inUse", handmade.MEMBERS["hdd1"], ""))
         expect.assertNotIn(absent, answers)
+        machine.check("dd if=/dev/lab/data1 of=/dev/null bs=1M count=1")
 
 
 @case()

@@ -56,8 +56,9 @@ TEST_F(HostSettingsFile, SaysWhatNoKernelKnows) {
   Write(R"({"cluster": {"enabled": true, "clusterUuid": "c", "nodeUuid": "n"}, "faultDomain": "rack-1",
             "networks": [{"interface": "otx1", "masterMulticastGroup": "224.1.2.3",
                           "agentMulticastGroup": "FF19::1"}],
-            "minimumDiskBytes": 5, "capacityFlash": ["naa.2", "naa.1"]})");
+            "autoMode": true, "minimumDiskBytes": 5, "capacityFlash": ["naa.2", "naa.1"]})");
   const HostSettings settings = ReadHostSettings(_file);
+  EXPECT_TRUE(settings.isAutoMode);
   EXPECT_TRUE(settings.isInCluster);
   EXPECT_EQ(settings.clusterUuid, "c");
   EXPECT_EQ(settings.nodeUuid, "n");

@@ -6,7 +6,7 @@
 #include <functional>
 
 #include "kova/agentd/include/HostCtlException.h"
-#include "otxctl/linux/testing/TestMachine.h"
+#include "otxctl/linux/testing/ChangeableMachine.h"
 
 namespace OtxCtl::Linux {
 namespace {
@@ -161,7 +161,7 @@ TEST(LinuxProvider, AMachineThatCannotBeLookedAtIsAnError) {
   EXPECT_THROW(provider.RefreshKovaInfo(), HostCtlException);
 }
 
-TEST(LinuxProvider, RefusesEveryChange) {
+TEST(LinuxProvider, WithNothingToChangeByItRefusesEveryChange) {
   TestMachine machine;
   machine.AddGroup("ready", false);
   LinuxProvider provider(machine.Host());
@@ -181,10 +181,38 @@ TEST(LinuxProvider, RefusesEveryChange) {
   }
 }
 
-TEST(LinuxProvider, ToMountNothingIsNoError) {
+TEST(LinuxProvider, HandsChangesOn) {
+  ChangeableMachine machine;
+  GroupRow group = WholeGroup();
+  group.members[1].isActive = group.members[2].isActive = false;
+  machine.Show({group});
+  LinuxProvider provider(machine.host, std::move(machine.changes));
+  provider.MountDiskMapping("naa.1", true);
+  provider.ClaimUnmountedDiskgroups();
+  provider.RestampDiskMapping("naa.1", {});
+  provider.RestampDiskMappingByUuid("u1");
+  provider.RemoveDisk("naa.2", "", {});
+  provider.RemoveDiskMapping("naa.1", "", {});
+  EXPECT_THROW(provider.RemoveDiskByUuid("u2", ""), HostCtlException) << "it has not left";
+  EXPECT_THROW(provider.FormatDiskMapping("naa.5", {"naa.2"}, {}), HostCtlException);
+  EXPECT_EQ(machine.Changes().size(), 10U);
+  machine.Show({WholeGroup()});
+  provider.UnmountDiskMapping("naa.1");
+  EXPECT_EQ(machine.Changes().back(), "vgchange --activate n -- kova_g1");
+}
+
+TEST(LinuxProvider, TheAutomaticModeIsASetting) {
   TestMachine machine;
-  machine.AddGroup();
-  EXPECT_NO_THROW(LinuxProvider(machine.Host()).ClaimUnmountedDiskgroups());
+  EXPECT_FALSE(LinuxProvider(machine.Host()).IsAutoModeEnabled());
+  machine.settings.isAutoMode = true;
+  EXPECT_TRUE(LinuxProvider(machine.Host()).IsAutoModeEnabled());
+}
+
+TEST(LinuxProvider, ConfigurationIsToldWithoutALookAtTheDisks) {
+  TestMachine machine;
+  machine.tree.Remove("sys/class/block");
+  machine.settings.faultDomain = "rack-1";
+  EXPECT_EQ(LinuxProvider(machine.Host()).GetFaultDomainName(), "rack-1");
 }
 
 }  // namespace

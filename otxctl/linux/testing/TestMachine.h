@@ -54,14 +54,16 @@ class TestMachine {
 
   // The machine may be changed and looked at again.
   std::shared_ptr<LinuxHost> Host() {
-    auto probe = std::make_unique<FakeProbe>();
-    probe->results = probeResults;
+    auto made = std::make_unique<FakeProbe>();
+    made->results = probeResults;
+    probe = made.get();
     LinuxHostOptions options;
     options.paths = tree.Paths();
     options.machineId = "m1";
     options.readSettings = [this] { return settings; };
     options.freshness = freshness;
-    return std::make_shared<LinuxHost>(std::move(options), std::move(probe),
+    options.stateFolder = stateFolder;
+    return std::make_shared<LinuxHost>(std::move(options), std::move(made),
                                        std::make_unique<FakeCommands>(results));
   }
 
@@ -69,6 +71,8 @@ class TestMachine {
   std::unordered_map<std::string, ProbeResult> probeResults;  // by kernel name
   FakeCommands::Results results;
   HostSettings settings;
+  std::string stateFolder;
+  FakeProbe* probe = nullptr;  // of the last host that was made
   std::chrono::milliseconds freshness{0};
 };
 

@@ -3,8 +3,8 @@
 #include <ostream>
 
 #include "kovactl/DiskGroups.h"
+#include "kovactl/GroupResults.h"
 #include "kovactl/Print.h"
-#include "kovactl/change/GroupResults.h"
 #include "kovactl/plan/LeftOvers.h"
 #include "tessa/text/Escape.h"
 

@@ -8,9 +8,9 @@
 #include <functional>
 #include <memory>
 
+#include "kovactl/Change.h"
 #include "kovactl/Connection.h"
 #include "kovactl/ExitStatus.h"
-#include "kovactl/change/Change.h"
 #include "kovactl/change/ChangeCommand.h"
 
 namespace Kovactl {

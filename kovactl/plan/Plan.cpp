@@ -6,7 +6,7 @@
 
 #include "host/KnownDisks.h"
 #include "kovactl/DiskGroups.h"
-#include "kovactl/change/GroupResults.h"
+#include "kovactl/GroupResults.h"
 
 namespace Kovactl {
 namespace {

@@ -5,9 +5,9 @@
 #include <ostream>
 #include <set>
 
+#include "kovactl/GroupResults.h"
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
-#include "kovactl/change/GroupResults.h"
 #include "kovactl/plan/LeftOvers.h"
 #include "orbis/Json.h"
 

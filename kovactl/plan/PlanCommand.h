@@ -4,8 +4,8 @@
 #include <iosfwd>
 #include <string>
 
+#include "kovactl/Change.h"
 #include "kovactl/ExitStatus.h"
-#include "kovactl/change/Change.h"
 #include "kovactl/plan/Plan.h"
 
 namespace Kovactl {

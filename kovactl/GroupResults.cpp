@@ -1,4 +1,4 @@
-#include "kovactl/change/GroupResults.h"
+#include "kovactl/GroupResults.h"
 
 #include <map>
 #include <ostream>

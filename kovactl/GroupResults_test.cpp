@@ -1,4 +1,4 @@
-#include "kovactl/change/GroupResults.h"
+#include "kovactl/GroupResults.h"
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>

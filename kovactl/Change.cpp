@@ -1,4 +1,4 @@
-#include "kovactl/change/Change.h"
+#include "kovactl/Change.h"
 
 #include <utility>
 

@@ -8,6 +8,8 @@ from pathlib import Path
 import kept
 from places import places_of
 
+HERE = Path(__file__).resolve().parent
+ROOT = HERE.parent.parent
 CODE = "int F() {\n  return 1;\n}\n\nint G() {\n  f();\n  g();\n  f();\n  return 2;\n}\n"
 ENTRY = '[[kept]]\nfile = "a.cpp"\nfunction = "F"\nbefore = "return 1;"\nafter = "return 2;"\nwhy = "because"\n'
 
@@ -56,6 +58,13 @@ class KeptList(unittest.TestCase):
     def test_names_a_place_once(self):
         with self.assertRaisesRegex(kept.Faulty, "stands there twice"):
             read(ENTRY + ENTRY)
+
+    def test_is_of_the_sources_as_they_are(self):
+        listed = kept.read(HERE / "equivalent.toml")
+        files = sorted({file for file, *_ in listed})
+        self.assertTrue(files)
+        kept.check(listed, [place for file in files if (ROOT / file).exists()
+                            for place in places_of(file, (ROOT / file).read_text(encoding="utf-8"))])
 
 
 if __name__ == "__main__":

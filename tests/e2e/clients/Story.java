@@ -96,7 +96,7 @@ public final class Story {
     Holder<List<KovaHostDiskMapResult>> made = new Holder<>();
     Holder<MethodFault> fault = new Holder<>();
     Holder<String> task = new Holder<>();
-    port.addAllEligibleDisks("the first", made, fault, task);
+    port.addAllEligibleDisks("the first", null, made, fault, task);
     check(fault.value == null && made.value.size() == 2 && !task.value.isEmpty(), "two groups are made");
     check(groups().equals(Map.of("naa.f1", List.of("naa.c1", "naa.c3"), "naa.f2", List.of("naa.c2", "naa.c4"))),
           "groups");
@@ -105,21 +105,21 @@ public final class Story {
     check(config.value.getFaultDomainInfo().getName().equals("rack-1"), "the fault domain");
 
     List<KovaHostDiskMapping> first = List.of(made.value.get(0).getMapping());  // as it came
-    port.unmountDiskMapping(first, "", new Holder<>(), fault, task);
+    port.unmountDiskMapping(first, "", true, new Holder<>(), fault, task);
     check(fault.value == null && groups().keySet().equals(java.util.Set.of("naa.f2")), "one group is left");
-    port.claimUnmountedDiskgroup(fault, task);
+    port.claimUnmountedDiskgroup(null, null, fault, task);
     check(groups().size() == 2, "it is back");
-    port.removeDisk("naa.c1", null, null, null, null, fault, task);
+    port.removeDisk("naa.c1", null, null, null, null, null, null, fault, task);
     check(groups().get("naa.f1").equals(List.of("naa.c3")), "a disk is removed");
-    port.removeDiskMapping(group("naa.f1", "naa.c3"), "p", "o", 1, 2, fault, task);
+    port.removeDiskMapping(group("naa.f1", "naa.c3"), "p", "o", 1, 2, null, null, fault, task);
     check(groups().size() == 1, "a group is removed");
-    port.addDisks(List.of(named("naa.f1"), named("naa.c1")), null, made, fault, task);
+    port.addDisks(List.of(named("naa.f1"), named("naa.c1")), null, null, made, fault, task);
     check(groups().get("naa.f1").equals(List.of("naa.c1")), "disks are added by their names");
   }
 
   private void faults() throws Exception {
     Fault few = faultOf(() -> {
-      port.initializeDisks(List.of(), null, new Holder<>(), new Holder<>(), new Holder<>());
+      port.initializeDisks(List.of(), null, null, new Holder<>(), new Holder<>(), new Holder<>());
       return null;
     });
     check(few.getFaultInfo() instanceof InsufficientDisks, "the type: " + few.getFaultInfo());
@@ -128,28 +128,28 @@ public final class Story {
     check(refused.getFaultInfo() instanceof InvalidArgument invalid && invalid.getArgument().equals("names[0]"),
           "a name that is none");
     Holder<MethodFault> fault = new Holder<>();
-    port.initializeDisks(List.of(group("naa.f1", "naa.p1")), null, new Holder<>(), fault, new Holder<>());
+    port.initializeDisks(List.of(group("naa.f1", "naa.p1")), null, null, new Holder<>(), fault, new Holder<>());
     check(fault.value instanceof DiskHasPartitions parted && parted.getDevice().equals("naa.p1"), "a parted disk");
   }
 
   private void part() throws Exception {
     Holder<List<KovaHostDiskMapResult>> result = new Holder<>();
     Holder<MethodFault> fault = new Holder<>();
-    port.addAllEligibleDisks(null, result, fault, new Holder<>());
+    port.addAllEligibleDisks(null, null, result, fault, new Holder<>());
     check(fault.value instanceof SystemError error && error.getReason().equals("it does not answer"), "what failed");
     check(result.value.get(0).getError() == null && result.value.get(1).getError() != null, "the second group failed");
   }
 
   private void absent() throws Exception {
     String gone = disks().keySet().stream().filter(name -> name.startsWith("kova:")).findFirst().orElseThrow();
-    port.removeDisk(gone, null, null, null, null, new Holder<>(), new Holder<>());
+    port.removeDisk(gone, null, null, null, null, null, null, new Holder<>(), new Holder<>());
     check(groups().equals(Map.of("naa.f1", List.of("naa.c2"))), "it is removed");
   }
 
   private void read() throws Exception {
     check(disks().size() == 8, "eight disks");
     Fault refused = faultOf(() -> {
-      port.claimUnmountedDiskgroup(new Holder<>(), new Holder<>());
+      port.claimUnmountedDiskgroup(null, null, new Holder<>(), new Holder<>());
       return null;
     });
     check(refused.getFaultInfo() instanceof NotPermitted, "reading only");

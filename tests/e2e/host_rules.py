@@ -72,8 +72,7 @@ class Comparison:
     def __init__(self, operation, named, before, after):
         self.operation = operation
         self.before, self.after = before, after
-        self.named = {disk["name"] for disk in before["disks"]
-                      if disk["name"] in named or request_name(disk) in named}
+        self.named = {disk["name"] for disk in before["disks"] if request_name(disk) in named}
         self.old, self.new = members_of(before), members_of(after)
 
     def violation(self):

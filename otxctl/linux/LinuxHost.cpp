@@ -105,6 +105,9 @@ std::shared_ptr<const LinuxSnapshot> LinuxHost::LookAnew() {
 }
 
 std::shared_ptr<const LinuxSnapshot> LinuxHost::Current() {
+  if (oneLook != nullptr && oneLook->_host == this) {
+    return oneLook->_seen;
+  }
   {
     const std::lock_guard guard(_mutex);
     if (_last != nullptr && Clock::now() - _lookedAt < _options.freshness) {

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include <stdexcept>
+#include <thread>
 
 #include "kova/agentd/include/HostCtlException.h"
 #include "otxctl/linux/testing/TestMachine.h"
@@ -165,6 +166,17 @@ TEST(LinuxHost, WithinOneLookAllLooksOfAThreadAreTheFirst) {
     EXPECT_NE(other->Look(), held) << "of another host";
   }
   EXPECT_NE(host->Look(), held);
+}
+
+TEST(LinuxHost, WithinOneLookNobodyElsesLookIsSeen) {
+  TestMachine machine;
+  machine.freshness = std::chrono::hours(1);
+  const auto host = machine.Host();
+  const LinuxHost::OneLook look;
+  const auto held = host->Look();
+  std::thread([&host] { host->Look(); }).join();
+  ASSERT_NE(host->Last(), held);
+  EXPECT_EQ(host->Current(), held);
 }
 
 TEST(LinuxHost, AFreshLookAnswersTheNextQuestionToo) {

@@ -125,6 +125,7 @@ class PlainMachine final : public Machine {
     return info;
   }
   void SetListener(Listener) override {}
+  Twin TakeTwin() override { return {"as-it-was", "{}"}; }
 };
 
 TEST_F(HostRuntimeTest, ServesAMachineThatIsNotSimulated) {
@@ -149,6 +150,7 @@ class LivingMachine final : public Machine {
   std::unique_ptr<HostCtl::Kova::KovaInfo> MakeProvider() override { return _machine.MakeProvider(); }
   Ref<Nox::Host::StorageDeviceInfo> GetInventory() override { return _machine.GetInventory(); }
   void SetListener(Listener listener) override { _machine.SetListener(std::move(listener)); }
+  Twin TakeTwin() override { return _machine.TakeTwin(); }
   std::shared_ptr<void> HoldLook() override {
     ++looksHeld;
     return nullptr;

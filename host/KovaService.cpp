@@ -36,6 +36,11 @@ using Tessa::Ref;
 
 namespace {
 
+// Who answers requests: the plug-in, and the machine behind it, or null.
+struct Served : PluginHooks {
+  Machine* machine;
+};
+
 // Calls a hook with empty texts; what it appended is the answer.
 template <class Call>
 Answer Ask(Call call) {
@@ -144,6 +149,17 @@ Answer GetConfigInfo(const PluginHooks& hooks, const Op::GetConfigInfo&) {
                   "The configuration of the host could not be read; the agent's log says why.");
 }
 
+Answer GetTwin(const Served& served, const Op::GetTwin&) {
+  if (served.machine == nullptr) {
+    throw HostError("nobody knows the machine of this host: it cannot be described");
+  }
+  Twin taken = served.machine->TakeTwin();
+  const auto twin = MakeRef<Nox::Kova::Host::Twin>();
+  twin->SetGeneration(std::move(taken.generation));
+  twin->SetDescription(std::move(taken.description));
+  return {.result = twin, .fault = nullptr};
+}
+
 Answer AddDisks(const PluginHooks& hooks, const Op::AddDisks& request) {
   const KnownDisks known = KnownDisks::Now();
   const Ref<DiskList> disks = OrEmpty(request.GetDisks());
@@ -226,12 +242,12 @@ Answer GetTask(const PluginHooks&, const Op::GetTask& request) {
 // Which function answers which request.
 struct Row {
   const Orbis::TypeDescriptor& (*request)();
-  Answer (*answer)(const PluginHooks& hooks, const Orbis::DataObject& request);
+  Answer (*answer)(const Served& served, const Orbis::DataObject& request);
 };
 
-template <class Request, Answer (*function)(const PluginHooks&, const Request&)>
-constexpr Row rowOf = {&Request::StaticType, [](const PluginHooks& hooks, const Orbis::DataObject& request) {
-                         return function(hooks, static_cast<const Request&>(request));
+template <class Request, auto function>
+constexpr Row rowOf = {&Request::StaticType, [](const Served& served, const Orbis::DataObject& request) {
+                         return function(served, static_cast<const Request&>(request));
                        }};
 
 constexpr Row rows[] = {
@@ -239,6 +255,7 @@ constexpr Row rows[] = {
     rowOf<Op::GetStorageInfo, &GetStorageInfo>,
     rowOf<Op::GetDiskGroups, &GetDiskGroups>,
     rowOf<Op::GetConfigInfo, &GetConfigInfo>,
+    rowOf<Op::GetTwin, &GetTwin>,
     rowOf<Op::GetTasks, &GetTasks>,
     rowOf<Op::GetTask, &GetTask>,
     rowOf<Op::AddDisks, &AddDisks>,
@@ -250,10 +267,10 @@ constexpr Row rows[] = {
     rowOf<Op::ClaimUnmountedDiskgroup, &ClaimUnmountedDiskgroup>,
 };
 
-Answer AnswerTo(const Orbis::DataObject& request, const PluginHooks& hooks) {
+Answer AnswerTo(const Orbis::DataObject& request, const Served& served) {
   for (const Row& row : rows) {
     if (&row.request() == &request.GetType()) {
-      return Guarded([&] { return row.answer(hooks, request); });
+      return Guarded([&] { return row.answer(served, request); });
     }
   }
   return FailedWith("this host does not serve " + request.GetType().name);
@@ -275,12 +292,12 @@ void KovaService::DropDiskCache() const {
 Answer KovaService::Query(const Op::Query& request) const {
   const bool isOfDisks = &request.GetType() == &Op::QueryDisksForKova::StaticType();
   if (!isOfDisks || !ChangesByItself()) {
-    return AnswerTo(request, _hooks);
+    return AnswerTo(request, {_hooks, _machine});
   }
   return Guarded([&] {
     const std::shared_ptr<void> look = _machine->HoldLook();
     DropDiskCache();
-    return AnswerTo(request, _hooks);
+    return AnswerTo(request, {_hooks, _machine});
   });
 }
 
@@ -289,7 +306,7 @@ Answer KovaService::Change(Op::Change&& request) const {
     if (ChangesByItself()) {
       DropDiskCache();
     }
-    return AnswerTo(request, _hooks);
+    return AnswerTo(request, {_hooks, _machine});
   });
 }
 

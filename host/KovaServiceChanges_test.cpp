@@ -377,6 +377,21 @@ TEST_F(KovaServiceChanges, AnswersAChangeThatCannotBeSavedByASystemError) {
   EXPECT_FALSE(_host->Snapshot().autoMode);
 }
 
+TEST_F(KovaServiceChanges, TellsTheTwinOfItsMachineWithoutThePlugin) {
+  const Answer answer = _service.Query(Nox::Operation::GetTwin());
+  const auto* const twin = dynamic_cast<const Nox::Kova::Host::Twin*>(answer.result.Get());
+  ASSERT_NE(twin, nullptr);
+  EXPECT_EQ(OtxCtl::Sim::ParseHostDescription(twin->GetDescription()), _host->Snapshot());
+  EXPECT_EQ(twin->GetGeneration().size(), 16U);
+  EXPECT_THAT(heard, IsEmpty());
+}
+
+TEST_F(KovaServiceChanges, SaysThatAHostOfWhichTheMachineIsNotKnownHasNoTwin) {
+  const Answer answer = KovaService(Listeners()).Query(Nox::Operation::GetTwin());
+  EXPECT_FALSE(answer.result);
+  EXPECT_THAT(OutcomeText(answer.fault.Get()), HasSubstr("nobody knows the machine"));
+}
+
 TEST_F(KovaServiceChanges, SaysThatAHostWhichIsNotSimulatedHasNoDescription) {
   const KovaService service(Listeners());
   EXPECT_THROW(service.DescribeHost(), HostError);

@@ -8,6 +8,7 @@
 
 #include <functional>
 #include <memory>
+#include <string>
 
 #include "nox/Fwd.h"
 #include "tessa/Ref.h"
@@ -19,6 +20,12 @@ class KovaInfo;
 namespace Host {
 
 class Simulation;
+
+// A machine as it was at one moment, in values that outlive it.
+struct Twin {
+  std::string generation;   // of what it told then (Generation.h)
+  std::string description;  // of a simulated machine that answers like it, as its file would hold it
+};
 
 class Machine {
  public:
@@ -43,6 +50,11 @@ class Machine {
   // While what is handed back lives, the machine is looked at once for all that this thread asks of it; to be
   // let go by the thread that has it. Null: a look costs this machine nothing.
   virtual std::shared_ptr<void> HoldLook();
+
+  // Looks at the machine anew, and describes a simulated one on which changes can be tried: it has the same
+  // disks, verdicts, groups and configuration. Nothing is changed. Throws HostCtl::Lib::HostCtlException if
+  // the machine cannot be looked at.
+  virtual Twin TakeTwin() = 0;
 
   // How the machine is described and changed from outside, if it is not a real one; otherwise null. Lives as
   // long as the machine.

@@ -5,10 +5,13 @@
 #include <system_error>
 #include <utility>
 
+#include "host/Generation.h"
 #include "host/HostError.h"
+#include "host/HostState.h"
 #include "kova/agentd/include/HostCtlException.h"
 #include "machines/HostSettingsFile.h"
 #include "machines/LinuxInventory.h"
+#include "machines/Twin.h"
 #include "nox/Host.h"
 #include "otxctl/linux/BlkidProbe.h"
 #include "otxctl/linux/LinuxProvider.h"
@@ -120,6 +123,13 @@ void LinuxMachine::SetListener(Listener listener) {
 
 std::shared_ptr<void> LinuxMachine::HoldLook() {
   return std::make_shared<LinuxHost::OneLook>();
+}
+
+Host::Twin LinuxMachine::TakeTwin() {
+  const LinuxHost::OneLook look;
+  const auto seen = _host->Look();
+  const Host::HostState state = Host::ReadHostState(*MakeProvider(), DescribeInventory(*seen));
+  return {.generation = Host::GenerationOf(state), .description = WriteHostDescription(DescribeTwin(state))};
 }
 
 void LinuxMachine::Follow() {

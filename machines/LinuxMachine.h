@@ -32,6 +32,7 @@ class LinuxMachine final : public Host::Machine {
   Tessa::Ref<Nox::Host::StorageDeviceInfo> GetInventory() override;
   void SetListener(Listener listener) override;
   std::shared_ptr<void> HoldLook() override;
+  Host::Twin TakeTwin() override;
 
  private:
   void Follow();

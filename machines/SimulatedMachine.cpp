@@ -3,7 +3,9 @@
 #include <chrono>
 #include <utility>
 
+#include "host/Generation.h"
 #include "host/HostError.h"
+#include "host/HostState.h"
 #include "machines/SimulatedInventory.h"
 #include "nox/Host.h"
 #include "otxctl/sim/DefaultHost.h"
@@ -33,6 +35,11 @@ HostDescription DescribedHost(const MachineOptions& options) {
     return OtxCtl::Sim::ParseHostDescription(*options.description);
   }
   return options.host.empty() ? OtxCtl::Sim::DefaultHost() : OtxCtl::Sim::LoadHostFile(options.host);
+}
+
+Tessa::Ref<Nox::Host::StorageDeviceInfo> InventoryOf(const HostDescription& host) {
+  const bool isPresent = host.storageSystem == OtxCtl::Sim::StorageSystem::Present;
+  return isPresent ? DescribeInventory(host) : nullptr;
 }
 
 }  // namespace
@@ -65,9 +72,16 @@ std::unique_ptr<HostCtl::Kova::KovaInfo> SimulatedMachine::MakeProvider() {
 }
 
 Tessa::Ref<Nox::Host::StorageDeviceInfo> SimulatedMachine::GetInventory() {
-  const HostDescription host = _host->Snapshot();
-  const bool isPresent = host.storageSystem == OtxCtl::Sim::StorageSystem::Present;
-  return isPresent ? DescribeInventory(host) : nullptr;
+  return InventoryOf(_host->Snapshot());
+}
+
+Host::Twin SimulatedMachine::TakeTwin() {
+  const HostDescription now = _host->Snapshot();
+  HostDescription faultless = now;
+  faultless.faults.clear();
+  OtxCtl::Sim::SimProvider provider(std::make_shared<SimHost>(faultless));
+  return {.generation = Host::GenerationOf(Host::ReadHostState(provider, InventoryOf(now))),
+          .description = WriteHostDescription(now)};
 }
 
 void SimulatedMachine::SetListener(Listener listener) {

@@ -34,6 +34,8 @@ class SimulatedMachine final : public Host::Machine, public Host::Simulation {
   // Null while the host is described as one whose storage system is missing.
   Tessa::Ref<Nox::Host::StorageDeviceInfo> GetInventory() override;
   void SetListener(Listener listener) override;
+  // The faults that the machine has on demand are the twin's as well; taking it counts as no call.
+  Host::Twin TakeTwin() override;
   Host::Simulation* GetSimulation() noexcept override { return this; }
 
   std::string Describe() const override;

@@ -5,7 +5,6 @@
 #include <map>
 #include <optional>
 
-#include "host/HostError.h"
 #include "kova/agentd/planning/pure/AddPlan.h"
 #include "kovactl/Table.h"
 #include "kovactl/Words.h"
@@ -154,13 +153,12 @@ std::vector<LeftOverDisk> FindLeftOvers(const Host::ManagementApi& host, const H
 }
 
 std::vector<LeftOverDisk> ExplainLeftOvers(const Host::ManagementApi& host, const Names& offered) {
-  std::string description;
-  try {
-    description = host.DescribeHost();
-  } catch (const Host::HostError&) {
+  const Host::Answer answer = host.Query(Nox::Operation::GetTwin());
+  const auto* const twin = dynamic_cast<const Nox::Kova::Host::Twin*>(answer.result.Get());
+  if (twin == nullptr) {
     return {};
   }
-  return FindLeftOvers(host, OtxCtl::Sim::ParseHostDescription(description), offered, {});
+  return FindLeftOvers(host, OtxCtl::Sim::ParseHostDescription(twin->GetDescription()), offered, {});
 }
 
 void PrintLeftOverCounts(const std::vector<LeftOverDisk>& disks, std::ostream& out) {

@@ -20,7 +20,7 @@ std::vector<LeftOverDisk> FindLeftOvers(const Host::ManagementApi& host,
                                         const std::vector<std::string>& offered,
                                         const std::set<std::string>& placed);
 
-// The same for a host on which nothing was changed; nothing for one that is not simulated.
+// The same for a host on which nothing was changed; nothing for one that cannot be looked at.
 std::vector<LeftOverDisk> ExplainLeftOvers(const Host::ManagementApi& host,
                                            const std::vector<std::string>& offered);
 

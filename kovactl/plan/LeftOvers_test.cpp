@@ -119,7 +119,7 @@ TEST_F(LeftOvers, CannotBeToldByAHostThatFails) {
   EXPECT_THAT(Find(AHost().WithHdd("hdd1")), IsEmpty());
 }
 
-TEST_F(LeftOvers, AreExplainedOnlyOfASimulatedHost) {
+TEST_F(LeftOvers, AreExplainedOnlyOfAHostThatCanBeLookedAt) {
   HostSays({AVerdict("hdd1", "eligible")});
   EXPECT_THAT(ExplainLeftOvers(_host, {}), IsEmpty());
   _host.descriptions = {OtxCtl::Sim::WriteHostDescription(AHost().WithHdd("hdd1").Build())};

@@ -7,6 +7,7 @@
 #include "host/HostError.h"
 #include "host/ManagementApi.h"
 #include "host/testing/RequestInALine.h"
+#include "nox/Kova.h"
 #include "nox/Operations.h"
 
 namespace Kovactl::Testing {
@@ -17,6 +18,9 @@ class FakeHost final : public Host::ManagementApi {
     if (const auto* const disks = dynamic_cast<const Nox::Operation::QueryDisksForKova*>(&request)) {
       asked = disks->GetNames() ? disks->GetNames()->Items() : std::vector<std::string>();
       return answer;
+    }
+    if (dynamic_cast<const Nox::Operation::GetTwin*>(&request) != nullptr) {
+      return NextTwin();
     }
     const bool isGroups = dynamic_cast<const Nox::Operation::GetDiskGroups*>(&request) != nullptr;
     return isGroups ? NextGroups() : answer;
@@ -42,7 +46,7 @@ class FakeHost final : public Host::ManagementApi {
   Host::Answer answer;                            // to every question without one of its own
   mutable std::vector<Host::Answer> groups;       // to GetDiskGroups, one after the other
   Host::Answer changeAnswer;                      // to every change
-  mutable std::vector<std::string> descriptions;  // from DescribeHost, one after the other
+  mutable std::vector<std::string> descriptions;  // from DescribeHost or GetTwin, one after the other
   mutable std::vector<std::string> asked;         // names of the last query
   mutable std::vector<std::string> changes;       // "RemoveDisk naa.1", in order
 
@@ -50,6 +54,15 @@ class FakeHost final : public Host::ManagementApi {
   Host::Answer Changed(const std::string& what) const {
     changes.push_back(what);
     return changeAnswer;
+  }
+  Host::Answer NextTwin() const {
+    if (descriptions.empty()) {
+      return Host::FailedWith("this host cannot be looked at");
+    }
+    const auto twin = Tessa::MakeRef<Nox::Kova::Host::Twin>();
+    twin->SetGeneration("0123456789abcdef");
+    twin->SetDescription(DescribeHost());
+    return {.result = twin, .fault = nullptr};
   }
   // The last of the prepared states stays; the others are given once.
   Host::Answer NextGroups() const {

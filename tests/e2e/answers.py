@@ -10,7 +10,7 @@ API = "{urn:nox}"
 FAULT_STATUSES = {"InvalidArgument": 400, "DuplicateDisks": 400, "NotPermitted": 403, "Busy": 503, "SystemError": 500}
 OTHER_FAULT = 409  # the disks, as they are now, do not allow it
 MAPPING_RESULTS = ("AddDisks", "AddAllEligibleDisks", "InitializeDisks", "UnmountDiskMapping")
-QUERIES = ("QueryDisksForKova", "GetStorageInfo", "GetDiskGroups", "GetConfigInfo")
+QUERIES = ("QueryDisksForKova", "GetStorageInfo", "GetDiskGroups", "GetConfigInfo", "GetTwin")
 # Operations that may end with neither result nor fault.
 SILENT = ("AddAllEligibleDisks", "RemoveDisk", "RemoveDiskMapping", "ClaimUnmountedDiskgroup")
 PLAIN = "a text"  # in the place of a fault's type: a SOAP message that could not be read

@@ -26,10 +26,10 @@ PROVIDER_OPERATIONS = ["QueryDisks", "GetDiskMappings", "FormatDiskMapping", "Re
                        "RemoveDiskByUuid", "IsAutoModeEnabled", "GetKovaOtxNicConfigs", "GetClusterInfoDetailed",
                        "GetFaultDomainName", "ClaimUnmountedDiskgroups", "RefreshKovaInfo"]
 ASKED_ALWAYS = ["RefreshKovaInfo", "QueryDisks", "GetDiskMappings", "FormatDiskMapping"]
-OPERATIONS = ["QueryDisksForKova", "GetStorageInfo", "GetDiskGroups", "GetConfigInfo", "AddDisks",
+OPERATIONS = ["QueryDisksForKova", "GetStorageInfo", "GetDiskGroups", "GetConfigInfo", "GetTwin", "AddDisks",
               "AddAllEligibleDisks", "InitializeDisks", "UnmountDiskMapping", "RemoveDisk", "RemoveDiskMapping",
               "ClaimUnmountedDiskgroup"]
-QUERIES = OPERATIONS[:4]
+QUERIES = OPERATIONS[:5]
 
 
 def request_name(disk):
@@ -46,7 +46,7 @@ class Draw:
 
     def __init__(self, rng):
         self.rng = rng
-        self.favourite = rng.choice(OPERATIONS[4:])
+        self.favourite = rng.choice(OPERATIONS[5:])
         self.is_kernel_away = False
         flaw = self.oddity() if self.chance(2) else {}
         self.flaw = lambda: flaw

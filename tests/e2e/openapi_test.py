@@ -74,6 +74,7 @@ class Described(ProgramTest):
         self.ask("POST", "/api/v1/GetStorageInfo", "200", {})
         self.ask("GET", "/api/v1/config", "200")
         self.ask("POST", "/api/v1/GetConfigInfo", "200", {})
+        self.ask("POST", "/api/v1/GetTwin", "200", {})
         self.ask("POST", "/api/v1/UnmountDiskMapping", "200", {"mappings": [GROUP]})
         self.ask("POST", "/api/v1/ClaimUnmountedDiskgroup", "200", {})
         answered = self.ask("GET", "/api/v1/disks?names=naa.f2", "200")["result"][0]["disk"]  # is handed back as it came

@@ -20,6 +20,7 @@ REMOVAL = {"passThrough": "p", "optionText": "o", "optionFirst": 1, "optionSecon
 # Each operation with all its parameters, such as would be taken.
 REQUESTS = {
     "QueryDisksForKova": {"names": ["naa.s1"]}, "GetStorageInfo": {}, "GetDiskGroups": {}, "GetConfigInfo": {},
+    "GetTwin": {},
     "AddDisks": {"disks": ["naa.s1", "naa.h1"], "label": "l"}, "AddAllEligibleDisks": {"label": "l"},
     "InitializeDisks": {"mappings": [GROUP], "label": "l"}, "UnmountDiskMapping": {"mappings": [MADE], "label": "l"},
     "RemoveDisk": {"disk": "naa.h3", **REMOVAL},

@@ -15,7 +15,7 @@ SCHEMA = "nox/schema/nox.schema"
 OPERATION = re.compile(r"^(?:query|change) (\w+)", re.MULTILINE)
 
 # Answered by the host program, not by the plug-in.
-WITHOUT_HOOK = {"GetDiskGroups", "GetTasks", "GetTask"}
+WITHOUT_HOOK = {"GetDiskGroups", "GetTwin", "GetTasks", "GetTask"}
 # Hooks are called like their operations, but for one.
 HOOKS = {"RemoveDisk": "RemoveDisksHookFn"}
 # The command line asks for more than this one tells, and for tasks by a road of their own.

@@ -30,6 +30,8 @@ CONFIG = answer({"@type": "KovaHostConfigInfo", "enabled": True,
                  "clusterInfo": {"@type": "KovaHostConfigInfoClusterInfo",
                                  "clusterUuid": "52e1cd1c-22b5-4b9a-8f0d-6c1d2f3a4b5c"},
                  "faultDomainInfo": {"@type": "KovaHostConfigInfoFaultDomainInfo", "name": "rack-1"}})
+TWIN = answer({"@type": "KovaHostTwin", "generation": "9b1d6c0f5e2a7348",
+               "description": '{"disks": [{"name": "%s", "ssd": true, "bytes": 400088457216}]}' % CACHE})
 TASK_ID = "task-1a2b3c4d-7"
 MADE = answer([{"@type": "KovaHostDiskMapResult", "mapping": MAPPING,
                 "diskResult": [result(CACHE_DISK, "inUse"), result(CAPACITY_DISK, "inUse")]}], task=TASK_ID)
@@ -45,6 +47,7 @@ EXAMPLES = {
     "GetDiskGroups": ({}, GROUPS),
     "GetStorageInfo": ({}, GROUPS),
     "GetConfigInfo": ({}, CONFIG),
+    "GetTwin": ({}, TWIN),
     "AddDisks": ({"disks": [CACHE, {"canonicalName": CAPACITY}], "label": "rack 3"}, MADE),
     "AddAllEligibleDisks": ({"label": "rack 3"}, MADE),
     "InitializeDisks": ({"mappings": [BY_NAME]}, MADE),

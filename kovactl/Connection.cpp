@@ -8,6 +8,8 @@
 #include "host/KovaService.h"
 #include "host/LogSink.h"
 #include "kovactl/ExitStatus.h"
+#include "nox/Kova.h"
+#include "nox/Operations.h"
 #include "tessa/Panic.h"
 
 namespace Kovactl {
@@ -19,9 +21,12 @@ namespace {
   _exit(static_cast<int>(ExitStatus::Panic));
 }
 
-Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
+void SetUpLogging(const GlobalOptions& options) {
   Tessa::Service::SetDefaultLogger(Host::MakeConsoleLogger(LevelOf(options.logLevel)));
   Tessa::SetPanicHandler(&EndOverPanic);
+}
+
+Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
   Host::RuntimeOptions runtime = options.runtime;
   runtime.makeMachine = Machines::MachineOf(options.machine);
   return Host::HostRuntime::Start(runtime);
@@ -29,6 +34,26 @@ Host::HostRuntime& StartRuntime(const GlobalOptions& options) {
 
 std::unique_ptr<Host::ManagementApi> ServiceOf(Host::HostRuntime& runtime) {
   return std::make_unique<Host::KovaService>(runtime.Hooks(), &runtime.GetMachine());
+}
+
+// The machine's own, without a plug-in.
+Host::Answer TakeTwin(Host::Machine& machine) {
+  try {
+    const Host::Twin taken = machine.TakeTwin();
+    const auto twin = Tessa::MakeRef<Nox::Kova::Host::Twin>();
+    twin->SetGeneration(taken.generation);
+    twin->SetDescription(taken.description);
+    return {.result = twin, .fault = nullptr};
+  } catch (const std::exception& failed) {
+    return Host::FailedWith(failed.what());
+  }
+}
+
+Host::Answer AskForTwin(const GlobalOptions& options) {
+  if (options.HostsThePlugIn()) {
+    return TakeTwin(*Machines::MakeMachine(options.machine));
+  }
+  return ConnectToAgent(options)->Query(Nox::Operation::GetTwin());
 }
 
 // What an agent of that address is asked with.
@@ -59,6 +84,7 @@ Agentd::TlsClientFiles TlsFilesOf(const GlobalOptions& options) {
 
 std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options) {
   if (options.HostsThePlugIn()) {
+    SetUpLogging(options);
     return ServiceOf(StartRuntime(options));
   }
   return ConnectToAgent(options);
@@ -75,16 +101,19 @@ std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options
   }
 }
 
-std::unique_ptr<Host::ManagementApi> ConnectToCopy(const GlobalOptions& options) {
+HostCopy ConnectToCopy(const GlobalOptions& options) {
   if (options.machine.save) {
     throw BadInput("a plan changes nothing, so there is nothing to --save");
   }
-  GlobalOptions copy = options;
-  if (!options.HostsThePlugIn()) {
-    copy.machine.description = Connect(options)->DescribeHost();
+  SetUpLogging(options);
+  const Host::Answer answer = AskForTwin(options);
+  const auto* const twin = dynamic_cast<const Nox::Kova::Host::Twin*>(answer.result.Get());
+  if (twin == nullptr) {
+    return {.host = nullptr, .generation = "", .fault = answer.fault};
   }
-  copy.machine.waitForFaults = false;
-  return ServiceOf(StartRuntime(copy));
+  GlobalOptions copy = options;
+  copy.machine = {.description = twin->GetDescription(), .waitForFaults = false};
+  return {.host = ServiceOf(StartRuntime(copy)), .generation = twin->GetGeneration()};
 }
 
 Tessa::Service::LogLevel LevelOf(const std::string& name) {

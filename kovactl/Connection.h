@@ -31,9 +31,16 @@ std::unique_ptr<Host::ManagementApi> Connect(const GlobalOptions& options);
 // The options' agent, not called yet. Throws BadInput.
 std::unique_ptr<Agentd::AgentClient> ConnectToAgent(const GlobalOptions& options);
 
+struct HostCopy {
+  std::unique_ptr<Host::ManagementApi> host;       // null: there is none
+  std::string generation;                          // of what it is a copy of
+  Tessa::Ref<Orbis::MethodFault> fault = nullptr;  // why there is none
+};
+
 // A copy of the options' host, simulated in this process: what is done to it is forgotten, and delays that
-// it has on demand are not waited for. Throws as Connect does. Once per process, and instead of Connect.
-std::unique_ptr<Host::ManagementApi> ConnectToCopy(const GlobalOptions& options);
+// it has on demand are not waited for. The host itself is only looked at. Throws as Connect does. Once per
+// process, and instead of Connect.
+HostCopy ConnectToCopy(const GlobalOptions& options);
 
 // The level of that name; throws BadInput.
 Tessa::Service::LogLevel LevelOf(const std::string& name);

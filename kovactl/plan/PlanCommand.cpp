@@ -10,6 +10,7 @@
 #include "kovactl/Words.h"
 #include "kovactl/plan/LeftOvers.h"
 #include "orbis/Json.h"
+#include "tessa/text/Escape.h"
 
 namespace Kovactl {
 namespace {
@@ -50,8 +51,11 @@ Json ToJson(const PlannedGroup& group) {
   return json;
 }
 
-Json ToJson(const Plan& plan) {
-  Json json = {{"groups", Json::array()}, {"leftOver", Json::array()}, {"fault", ToJson(plan.answer.fault)}};
+Json ToJson(const Plan& plan, const std::string& generation) {
+  Json json = {{"generation", generation},
+               {"groups", Json::array()},
+               {"leftOver", Json::array()},
+               {"fault", ToJson(plan.answer.fault)}};
   for (const PlannedGroup& group : plan.groups) {
     json["groups"].push_back(ToJson(group));
   }
@@ -85,7 +89,7 @@ void PrintLeftOvers(const std::vector<LeftOverDisk>& disks, bool named, std::ost
   }
 }
 
-void PrintPlan(const Plan& plan, bool allDisks, std::ostream& out) {
+void PrintPlan(const Plan& plan, const PlanOptions& options, std::ostream& out) {
   Table table({{"CHANGE"}, {"GROUP"}, {"ROLE"}, {"DISK"}});
   for (const PlannedGroup& group : plan.groups) {
     AddGroup(table, group);
@@ -94,8 +98,9 @@ void PrintPlan(const Plan& plan, bool allDisks, std::ostream& out) {
     table.Print(out);
     out << "\n";
   }
-  PrintLeftOvers(plan.leftOver, allDisks, out);
-  out << (plan.groups.empty() ? "Nothing would change." : "This is a plan: nothing was changed.") << "\n";
+  PrintLeftOvers(plan.leftOver, options.allDisks, out);
+  out << (plan.groups.empty() ? "Nothing would change." : "This is a plan: nothing was changed.") << "\n"
+      << "Planned on generation " << Tessa::Escape(options.generation) << ".\n";
 }
 
 }  // namespace
@@ -121,9 +126,9 @@ ExitStatus RunPlan(const Host::ManagementApi& copy, Change& change, const PlanOp
                    std::ostream& out, std::ostream& err) {
   const Plan plan = MakePlan(copy, change);
   if (options.output == "json") {
-    out << ToJson(plan).dump(2) << "\n";
+    out << ToJson(plan, options.generation).dump(2) << "\n";
   } else {
-    PrintPlan(plan, options.allDisks, out);
+    PrintPlan(plan, options, out);
   }
   PrintGroupFaults(dynamic_cast<const GroupResults*>(plan.answer.result.Get()), plan.answer.fault.Get(), err);
   return plan.answer.fault ? ExitStatus::Fault : ExitStatus::Done;

@@ -10,11 +10,12 @@
 
 namespace Kovactl {
 
-// Makes the change on a host that may be spoiled, a copy in memory, and compares. Throws BadInput as the
-// change does, and for an answer that cannot be a simulated host's.
+// Makes the change on a host that may be spoiled, a simulated copy in memory, and compares. Throws BadInput
+// as the change does, and for an answer that cannot be a simulated host's.
 Plan MakePlan(const Host::ManagementApi& copy, Change& change);
 
 struct PlanOptions {
+  std::string generation;  // of the host that the copy is of: the plan is good for no other one
   std::string output = "table";
   bool allDisks = false;  // in a table, whether disks that are left over are named; JSON always names them
 };

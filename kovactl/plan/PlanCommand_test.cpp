@@ -28,9 +28,11 @@ class PlanCommand : public testing::Test {
     _copy.descriptions = {OtxCtl::Sim::WriteHostDescription(before.Build()),
                           OtxCtl::Sim::WriteHostDescription(after.Build())};
   }
-  ExitStatus Run(const ChangeRef& change, const PlanOptions& options = {}) {
+  ExitStatus Run(const ChangeRef& change, PlanOptions options = {}) {
+    options.generation = "0123456789abcdef";
     return RunPlan(_copy, *change, options, _out, _err);
   }
+  static PlanOptions Json() { return {.generation = "", .output = "json"}; }
   static OtxCtl::Sim::HostBuilder Disks() { return AHost().WithSsd("ssd1").WithHdds({"hdd1", "hdd2"}); }
 
   Testing::FakeHost _copy;
@@ -58,7 +60,8 @@ TEST_F(PlanCommand, ShowsTheGroupsAndWhatIsLeftOver) {
             "        1  attached by USB\n"
             "\n"
             "1 disk is left over; --all-disks names it.\n"
-            "This is a plan: nothing was changed.\n");
+            "This is a plan: nothing was changed.\n"
+            "Planned on generation 0123456789abcdef.\n");
   EXPECT_EQ(_err.str(), "");
 }
 
@@ -73,9 +76,10 @@ TEST_F(PlanCommand, NamesTheDisksLeftOverWhenItIsToldTo) {
             "        2  attached by USB\n"
             "\n"
             "2 disks are left over; --all-disks names them.\n"
-            "Nothing would change.\n");
+            "Nothing would change.\n"
+            "Planned on generation 0123456789abcdef.\n");
   _out.str("");
-  EXPECT_EQ(Run(AddEveryEligibleDisk(), {.allDisks = true}), ExitStatus::Done);
+  EXPECT_EQ(Run(AddEveryEligibleDisk(), {.generation = "", .allDisks = true}), ExitStatus::Done);
   EXPECT_EQ(_out.str(),
             "LEFT OVER  WHY\n"
             "        2  attached by USB\n"
@@ -84,7 +88,8 @@ TEST_F(PlanCommand, NamesTheDisksLeftOverWhenItIsToldTo) {
             "hdd3            attached by USB\n"
             "hdd4            attached by USB\n"
             "\n"
-            "Nothing would change.\n");
+            "Nothing would change.\n"
+            "Planned on generation 0123456789abcdef.\n");
 }
 
 TEST_F(PlanCommand, ShowsNoDisksLeftOverOfAChangeThatOffersNone) {
@@ -99,7 +104,7 @@ TEST_F(PlanCommand, SaysThatNothingWouldChange) {
   CopyGoes(Disks(), Disks());
   _copy.answer = Testing::WithGroups({});
   EXPECT_EQ(Run(ClaimGroups()), ExitStatus::Done);
-  EXPECT_EQ(_out.str(), "Nothing would change.\n");
+  EXPECT_EQ(_out.str(), "Nothing would change.\nPlanned on generation 0123456789abcdef.\n");
 }
 
 TEST_F(PlanCommand, PrintsForScripts) {
@@ -109,8 +114,9 @@ TEST_F(PlanCommand, PrintsForScripts) {
       {AGroupResult("ssd1", {"hdd1"}), AGroupResult("ssd2", {"hdd2"}, {}, fault)}, fault);
   _copy.answer = Testing::WithList<Testing::DiskResult>(
       {AVerdict("hdd3", "ineligible", Tessa::MakeRef<Nox::Fault::DiskTooSmall>("hdd3"))});
-  EXPECT_EQ(Run(AddTheseDisks({"ssd1", "hdd1", "hdd2", "hdd3"}), {"json"}), ExitStatus::Fault);
+  EXPECT_EQ(Run(AddTheseDisks({"ssd1", "hdd1", "hdd2", "hdd3"}), Json()), ExitStatus::Fault);
   EXPECT_EQ(nlohmann::json::parse(_out.str()), nlohmann::json::parse(R"({
+    "generation": "0123456789abcdef",
     "groups": [{"change": "made", "ssd": "ssd1", "capacity": ["hdd1"], "allFlash": false},
                {"change": "failed", "ssd": "ssd2", "capacity": ["hdd2"],
                 "fault": {"@type": "DiskIsUSB", "device": "hdd2"}}],
@@ -121,9 +127,10 @@ TEST_F(PlanCommand, PrintsForScripts) {
 TEST_F(PlanCommand, PrintsNothingThatIsThereForScripts) {
   CopyGoes(Disks(), Disks());
   _copy.answer = Testing::WithGroups({});
-  EXPECT_EQ(Run(ClaimGroups(), {"json"}), ExitStatus::Done);
+  EXPECT_EQ(Run(ClaimGroups(), Json()), ExitStatus::Done);
   EXPECT_EQ(nlohmann::json::parse(_out.str()),
-            nlohmann::json::parse(R"({"groups": [], "leftOver": [], "fault": null})"));
+            nlohmann::json::parse(R"({"generation": "0123456789abcdef", "groups": [], "leftOver": [],
+                                      "fault": null})"));
 }
 
 TEST_F(PlanCommand, ExplainsTheFaultThatWouldCome) {
@@ -131,7 +138,7 @@ TEST_F(PlanCommand, ExplainsTheFaultThatWouldCome) {
   _copy.answer = Testing::WithGroups({});
   _copy.changeAnswer.fault = Tessa::MakeRef<Nox::Fault::DiskIsLastRemainingNonSSD>("hdd1");
   EXPECT_EQ(Run(RemoveOneDisk("hdd1", {})), ExitStatus::Fault);
-  EXPECT_EQ(_out.str(), "Nothing would change.\n");
+  EXPECT_EQ(_out.str(), "Nothing would change.\nPlanned on generation 0123456789abcdef.\n");
   EXPECT_THAT(_err.str(), HasSubstr("last capacity disk of its group: hdd1"));
 }
 

@@ -52,6 +52,30 @@ class ThisMachine(ProgramTest):
         self.assertIn("disk", self.ask_agent("disks").out)
         self.assert_ended(self.ask_agent("groups"), 0)
 
+    def test_is_planned_for_on_a_twin(self):
+        plan = self.here("-o", "json", "plan", "add", "--all")
+        self.assertIn(plan.status, (0, 1), plan.err)  # whether there is a disk to be used nobody knows
+        told = plan.json()
+        self.assertRegex(told["generation"], "^[0-9a-f]{16}$")
+        eligible = [result["disk"]["canonicalName"] for result in self.disks() if result["state"] == "eligible"]
+        named = [name for group in told["groups"] for name in [group["ssd"], *group["capacity"]]]
+        self.assertLessEqual(set(named), set(eligible))
+        self.start_agent("--host", "linux", "--settings", self.path("settings.json"))
+        asked = self.ask_agent("-o", "json", "plan", "add", "--all")
+        self.assertEqual((asked.status, asked.json()), (plan.status, told))
+
+    def test_a_twin_answers_like_it(self):
+        self.start_agent("--host", "linux", "--settings", self.path("settings.json"))
+        status, answer = self.http().post("GetTwin")
+        self.assertEqual(status, 200, answer)
+        twin = self.write("twin.json", answer["result"]["description"])
+
+        def shown(results):
+            return [(one["disk"]["canonicalName"], one["state"], one["disk"].get("detail"), one.get("error"))
+                    for one in results]
+
+        self.assertEqual(shown(self.kovactl("--host", twin, "-o", "json", "disks").json()), shown(self.disks()))
+
     def test_has_no_description(self):
         self.assert_ended(self.here("sim", "show"), 2, "no simulated host")
 
@@ -82,6 +106,7 @@ class ThisMachine(ProgramTest):
         self.assert_ended(self.ask_agent("config"), 0)
         self.write("settings.json", {"faultDomain": 7})
         self.assertNotIn("rack", self.ask_agent("config").out)
+        self.assert_ended(self.ask_agent("plan", "add", "--all"), 1, "faultDomain: must be a text")
         self.write("settings.json", {"faultDomain": "rack-7"})
         told = self.ask_agent("config")
         self.assert_ended(told, 0)

@@ -43,7 +43,24 @@ class Plan(ProgramTest):
                 plan = self.kovactl("--host", self.example(name), "-o", "json", "plan", "add", "--all")
                 self.assert_ended(plan, 0)
                 with open(os.path.join(EXPECTED, name + ".json"), encoding="utf-8") as file:
-                    self.assertEqual(plan.json(), json.load(file))
+                    self.assertEqual({**plan.json(), "generation": None}, {**json.load(file), "generation": None})
+
+    def test_tells_the_generation_that_it_stands_on(self):
+        host = self.example("default")
+
+        def generation(*where):
+            plan = self.kovactl(*where, "-o", "json", "plan", "add", "--all")
+            self.assert_ended(plan, 0)
+            return plan.json()["generation"]
+
+        first = generation("--host", host)
+        self.assertRegex(first, "^[0-9a-f]{16}$")
+        self.assertIn(f"Planned on generation {first}.", self.kovactl("--host", host, "plan", "add", "--all").out)
+        self.start_agent("--host", host)
+        self.assertEqual(generation("--agent", "unix:" + self.socket), first, "it is the same host")
+        self.assert_ended(self.ask_agent("sim", "set", "naa.5000c50000000200", "--absent"), 0)
+        self.assertNotEqual(generation("--agent", "unix:" + self.socket), first)
+        self.assertEqual(generation("--host", host), first, "the file is as it was")
 
     def test_comes_about_when_every_disk_is_added(self):
         for name in stems(EXAMPLES):

@@ -55,7 +55,7 @@ RULES = {
     "kovactl/replay": ["tessa", "orbis", "orbis/json", "nox", "host", "machines/Machines.h", "otxctl/fault",
                        "kovactl/ExitStatus.h"],
     # A plan is what becomes of a simulated copy, so it compares descriptions.
-    "kovactl/plan": ["orbis", "nox", "host", "kovactl", "machines/SimulatedInventory.h", "otxctl/sim",
+    "kovactl/plan": ["tessa/text", "orbis", "nox", "host", "kovactl", "machines/SimulatedInventory.h", "otxctl/sim",
                      "kova/agentd/planning/pure"],
     # A change of nothing is explained as a plan explains what it leaves over.
     "kovactl/change": ["tessa/text", "kovactl", "kovactl/plan/LeftOvers.h"],

@@ -18,6 +18,7 @@
 #include "machines/SimulatedMachine.h"
 #include "nox/Kova.h"
 #include "nox/StorageSystem.h"
+#include "orbis/Json.h"
 #include "orbis/Soap.h"
 #include "otxctl/fault/CallRecorder.h"
 #include "otxctl/provider/ForwardingProvider.h"
@@ -151,12 +152,14 @@ class LivingMachine final : public Machine {
   Ref<Nox::Host::StorageDeviceInfo> GetInventory() override { return _machine.GetInventory(); }
   void SetListener(Listener listener) override { _machine.SetListener(std::move(listener)); }
   Twin TakeTwin() override { return _machine.TakeTwin(); }
+  std::vector<DataVolume> GetDataVolumes() override { return volumes; }
   std::shared_ptr<void> HoldLook() override {
     ++looksHeld;
     return nullptr;
   }
 
   int looksHeld = 0;
+  std::vector<DataVolume> volumes;
 
  private:
   Machines::SimulatedMachine _machine;
@@ -187,6 +190,41 @@ TEST_F(HostRuntimeTest, AChangeOfAMachineThatChangesByItselfSeesItsDisksAsTheyAr
     _host->Change([](OtxCtl::Sim::HostDescription& host) { host.disks[0].verdict = {2, 4}; });
     service.Change(Op::AddAllEligibleDisks());
     EXPECT_THAT(_host->Snapshot().groups, testing::IsEmpty());
+  });
+}
+
+// The groups in a JSON text.
+std::string GroupsText(const KovaService& service) {
+  std::string text;
+  const Answer answer = service.Query(Op::GetDiskGroups());
+  EXPECT_FALSE(answer.fault);
+  Orbis::WriteJson(*answer.result.Get(), text);
+  return text;
+}
+
+TEST_F(HostRuntimeTest, ShowsTheDataVolumesOfItsMachineWithTheGroupsMountedOrNot) {
+  auto options = On(AHost()
+                        .WithSsd("naa.1")
+                        .WithHdd("naa.2")
+                        .WithSsd("naa.3")
+                        .WithHdd("naa.4")
+                        .WithGroup("naa.1", {"naa.2"})
+                        .WithUnmountedGroup("naa.3", {"naa.4"}));
+  options.makeMachine = [host = _host] { return std::make_unique<LivingMachine>(host); };
+  InOwnProcess([&options] {
+    HostRuntime& runtime = HostRuntime::Start(options);
+    auto& machine = static_cast<LivingMachine&>(runtime.GetMachine());
+    const KovaService service(runtime.Hooks(), &machine);
+    const std::string before = GroupsText(service);
+    EXPECT_THAT(before, testing::Not(HasSubstr("olume")));
+    machine.volumes = {{"naa.2", "/dev/vg/d2", 4096, "cached"}, {"naa.4", "/dev/vg/d4", 8192, "inactive"}};
+    const std::string shown = GroupsText(service);
+    EXPECT_THAT(shown,
+                HasSubstr(R"("disk":"naa.2","path":"/dev/vg/d2","bytes":4096,"cacheState":"cached"})"));
+    EXPECT_THAT(shown,
+                HasSubstr(R"("disk":"naa.4","path":"/dev/vg/d4","bytes":8192,"cacheState":"inactive"})"));
+    machine.volumes.clear();
+    EXPECT_EQ(GroupsText(service), before);
   });
 }
 

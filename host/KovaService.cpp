@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "host/DataVolumes.h"
 #include "host/Gate.h"
 #include "host/HostError.h"
 #include "host/KnownDisks.h"
@@ -130,15 +131,20 @@ Answer GetStorageInfo(const PluginHooks& hooks, const Op::GetStorageInfo&) {
                   "The disk groups of the host could not be read; the agent's log says why.");
 }
 
-// The mounted groups as the plug-in tells them, and behind them the others that the kernel has.
-Answer GetDiskGroups(const PluginHooks& hooks, const Op::GetDiskGroups&) {
-  Answer answer = GetStorageInfo(hooks, Op::GetStorageInfo());
+// The mounted groups as the plug-in tells them, and behind them the others that the kernel has; each with the
+// data volumes that the machine knows.
+Answer GetDiskGroups(const Served& served, const Op::GetDiskGroups&) {
+  const std::shared_ptr<void> look = served.machine == nullptr ? nullptr : served.machine->HoldLook();
+  Answer answer = GetStorageInfo(served, Op::GetStorageInfo());
   auto* const info = dynamic_cast<StorageInfo*>(answer.result.Get());
   if (info == nullptr) {
     return answer;
   }
   const Answer more = Guarded([&] {
     AppendUnlisted(GroupsOf(*Kernel()), KnownDisks::Now(), *info);
+    if (served.machine != nullptr) {
+      AddDataVolumes(served.machine->GetDataVolumes(), *info);
+    }
     return Answer();
   });
   return {.result = Ref<StorageInfo>(info), .fault = more.fault};  // beside the groups that could be read

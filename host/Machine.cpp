@@ -8,6 +8,10 @@ std::shared_ptr<void> Machine::HoldLook() {
   return nullptr;
 }
 
+std::vector<DataVolume> Machine::GetDataVolumes() {
+  return {};
+}
+
 Simulation* Machine::GetSimulation() noexcept {
   return nullptr;
 }

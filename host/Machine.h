@@ -6,9 +6,11 @@
 // Threads: every operation may be called from any thread.
 #pragma once
 
+#include <cstdint>
 #include <functional>
 #include <memory>
 #include <string>
+#include <vector>
 
 #include "nox/Fwd.h"
 #include "tessa/Ref.h"
@@ -25,6 +27,14 @@ class Simulation;
 struct Twin {
   std::string generation;   // of what it told then (Generation.h)
   std::string description;  // of a simulated machine that answers like it, as its file would hold it
+};
+
+// The volume on which the data of one capacity disk of a disk group stands.
+struct DataVolume {
+  std::string disk;  // canonical name of the capacity disk, or what stands for it in answers if it has left
+  std::string path;  // where programs find it
+  std::int64_t bytes = 0;
+  std::string cacheState;  // what its cache does, in words for people
 };
 
 class Machine {
@@ -55,6 +65,10 @@ class Machine {
   // disks, verdicts, groups and configuration. Nothing is changed. Throws HostCtl::Lib::HostCtlException if
   // the machine cannot be looked at.
   virtual Twin TakeTwin() = 0;
+
+  // The data volumes of its disk groups; none of a machine that has no such thing. Throws
+  // HostCtl::Lib::HostCtlException if the machine cannot be looked at.
+  virtual std::vector<DataVolume> GetDataVolumes();
 
   // How the machine is described and changed from outside, if it is not a real one; otherwise null. Lives as
   // long as the machine.

@@ -69,6 +69,38 @@ TEST_F(GroupsCommand, MarksDisksThatHaveLeft) {
             "1 disk group\n");
 }
 
+Ref<Nox::Kova::Host::DataVolume> AVolume(const std::string& disk, const std::string& path,
+                                         const std::string& cacheState) {
+  const auto volume = MakeRef<Nox::Kova::Host::DataVolume>();
+  volume->SetDisk(disk);
+  volume->SetPath(path);
+  volume->SetBytes(std::int64_t{3} << 30);
+  volume->SetCacheState(cacheState);
+  return volume;
+}
+
+TEST_F(GroupsCommand, ShowsTheDataVolumesOfCapacityDisks) {
+  const auto groups = MakeRef<DataArray<DiskMapInfo>>();
+  groups->Append(AGroup("naa.1", {"naa.2", "naa.3"}, true));
+  groups->Append(AGroup("naa.4", {"naa.5"}, false));
+  const auto volumes = MakeRef<DataArray<Nox::Kova::Host::DataVolume>>();
+  volumes->Append(AVolume("naa.2", "/dev/g/d2", "cached, 37% used"));
+  volumes->Append(AVolume("naa.3", "/dev/g/d3", ""));
+  (*groups)[0]->SetVolume(volumes);
+  _info->SetDiskMapInfo(groups);
+  EXPECT_EQ(Run(), ExitStatus::Done);
+  EXPECT_EQ(
+      _out.str(),
+      "GROUP  ROLE      DISK   KIND          SIZE  STATE        VOLUME     VOLUME SIZE  CACHE\n"
+      "    1  cache     naa.1  flash      1.0 GiB  mounted\n"
+      "       capacity  naa.2  hard disk  1.0 GiB               /dev/g/d2      3.0 GiB  cached, 37% used\n"
+      "       capacity  naa.3  hard disk  1.0 GiB               /dev/g/d3      3.0 GiB\n"
+      "    2  cache     naa.4  flash      1.0 GiB  not mounted\n"
+      "       capacity  naa.5  hard disk  1.0 GiB\n"
+      "\n"
+      "2 disk groups\n");
+}
+
 TEST_F(GroupsCommand, SaysThatThereAreNone) {
   _info->SetAutoClaim(true);
   EXPECT_EQ(Run(), ExitStatus::Done);

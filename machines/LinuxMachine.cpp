@@ -11,6 +11,7 @@
 #include "kova/agentd/include/HostCtlException.h"
 #include "machines/HostSettingsFile.h"
 #include "machines/LinuxInventory.h"
+#include "machines/LinuxVolumes.h"
 #include "machines/Twin.h"
 #include "nox/Host.h"
 #include "otxctl/linux/BlkidProbe.h"
@@ -130,6 +131,10 @@ Host::Twin LinuxMachine::TakeTwin() {
   const auto seen = _host->Look();
   const Host::HostState state = Host::ReadHostState(*MakeProvider(), DescribeInventory(*seen));
   return {.generation = Host::GenerationOf(state), .description = WriteHostDescription(DescribeTwin(state))};
+}
+
+std::vector<Host::DataVolume> LinuxMachine::GetDataVolumes() {
+  return DescribeVolumes(*_host->Current());
 }
 
 void LinuxMachine::Follow() {

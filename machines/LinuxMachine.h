@@ -33,6 +33,7 @@ class LinuxMachine final : public Host::Machine {
   void SetListener(Listener listener) override;
   std::shared_ptr<void> HoldLook() override;
   Host::Twin TakeTwin() override;
+  std::vector<Host::DataVolume> GetDataVolumes() override;
 
  private:
   void Follow();

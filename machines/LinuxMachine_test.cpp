@@ -6,6 +6,7 @@
 #include "host/HostError.h"
 #include "kova/agentd/include/KovaInfo.h"
 #include "machines/LinuxInventory.h"
+#include "machines/LinuxVolumes.h"
 #include "machines/Machines.h"
 #include "nox/Host.h"
 #include "orbis/Types.h"
@@ -140,6 +141,41 @@ TEST(LinuxMachine, IsLookedAtOnceWhileALookIsHeld) {
   look.reset();
   provider->QueryDisks({}, records, true);
   EXPECT_EQ(records.size(), 1U);
+}
+
+// "DISK PATH BYTES CACHESTATE"
+std::vector<std::string> Lines(const std::vector<Host::DataVolume>& volumes) {
+  std::vector<std::string> lines;
+  for (const Host::DataVolume& volume : volumes) {
+    lines.push_back(volume.disk + " " + volume.path + " " + std::to_string(volume.bytes) + " " +
+                    volume.cacheState);
+  }
+  return lines;
+}
+
+TEST(LinuxVolumes, AreToldOfEachCapacityDiskThatHasOne) {
+  OtxCtl::Linux::LinuxSnapshot seen;
+  OtxCtl::Linux::DiskGroup& group = seen.groups.emplace_back();
+  group.cache.canonicalName = "naa.1";
+  for (const char* const name : {"naa.2", "naa.3", ""}) {
+    OtxCtl::Linux::GroupMember& member = group.capacity.emplace_back();
+    member.canonicalName = name;
+    member.kovaUuid = std::string("u-") + name;
+  }
+  EXPECT_THAT(DescribeVolumes(seen), testing::IsEmpty());
+  group.capacity[0].volume.path = "/dev/vg/data_2";
+  group.capacity[0].volume.bytes = 4096;
+  group.capacity[0].volume.cacheState = "cached, 37% used";
+  group.capacity[2].volume.path = "/dev/vg/data_4";
+  group.capacity[2].volume.cacheState = "inactive";
+  EXPECT_THAT(Lines(DescribeVolumes(seen)),
+              ElementsAre("naa.2 /dev/vg/data_2 4096 cached, 37% used", "kova:u- /dev/vg/data_4 0 inactive"));
+}
+
+TEST(LinuxMachine, WithoutDiskGroupsHasNoDataVolumes) {
+  TestMachine machine;
+  machine.tree.AddScsiDisk("sda", {.worldWideName = "naa.1", .serial = "S1"});
+  EXPECT_THAT(LinuxMachine(machine.Host()).GetDataVolumes(), testing::IsEmpty());
 }
 
 TEST(LinuxMachine, IsNoSimulation) {

@@ -25,7 +25,10 @@ def answer(value=None, **more):
 DISKS = answer([result(CAPACITY_DISK, "eligible"),
                 result(disk(STICK, False, 62521344), "ineligible", error={"@type": "DiskIsUSB", "device": STICK})])
 GROUPS = answer({"@type": "KovaHostConfigInfoStorageInfo", "autoClaim": False, "diskMapping": [MAPPING],
-                 "diskMapInfo": [{"@type": "KovaHostDiskMapInfo", "mapping": MAPPING, "mounted": True}]})
+                 "diskMapInfo": [{"@type": "KovaHostDiskMapInfo", "mapping": MAPPING, "mounted": True,
+                                  "volume": [{"@type": "KovaHostDataVolume", "disk": CAPACITY,
+                                              "path": "/dev/kova_1a2b/data_3c4d", "bytes": 3998639521792,
+                                              "cacheState": "cached, 37% used"}]}]})
 CONFIG = answer({"@type": "KovaHostConfigInfo", "enabled": True,
                  "clusterInfo": {"@type": "KovaHostConfigInfoClusterInfo",
                                  "clusterUuid": "52e1cd1c-22b5-4b9a-8f0d-6c1d2f3a4b5c"},

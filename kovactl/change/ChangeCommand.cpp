@@ -54,6 +54,9 @@ void NoteForgotten(const ChangeOptions& options, std::ostream& err) {
   if (options.forgotten) {
     err << "(not saved: give --save to keep the change)\n";
   }
+  if (options.dryRun) {
+    err << "(dry run: nothing was changed)\n";
+  }
 }
 
 ExitStatus RunChange(const Host::ManagementApi& host, Change& change, const Consent& consent,

@@ -13,9 +13,10 @@ namespace Kovactl {
 struct ChangeOptions {
   std::string output = "table";
   bool forgotten = false;  // the host is a description in memory that nobody saves
+  bool dryRun = false;     // the commands that would change disks were printed, and none was run
 };
 
-// Says that a change is forgotten, where it is.
+// Says that a change is forgotten, or was not made, where it is so.
 void NoteForgotten(const ChangeOptions& options, std::ostream& err);
 
 // Asks for consent where data may be lost, makes the change and prints what became of it. Nothing is changed

@@ -211,6 +211,13 @@ TEST_F(ChangeCommand, SaysThatAChangeIsForgotten) {
   EXPECT_THAT(_err.str(), Not(HasSubstr("--save"))) << "there is nothing to forget";
 }
 
+TEST_F(ChangeCommand, SaysThatADryRunChangesNothing) {
+  _options.dryRun = true;
+  _host.answer = Testing::WithGroups({AGroup("naa.1", {"naa.2"})});
+  Run(RemoveOneDisk("naa.2", {}));
+  EXPECT_THAT(_err.str(), HasSubstr("(dry run: nothing was changed)"));
+}
+
 TEST_F(ChangeCommand, LetsNoNamePlayWithTheTerminal) {
   _host.answer = Testing::WithGroups({});
   Run(RemoveOneDisk("naa.\x1b[2J", {}));

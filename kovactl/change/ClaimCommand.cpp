@@ -60,6 +60,10 @@ ExitStatus RunClaim(const Host::ManagementApi& host, const ChangeOptions& option
     return ExitStatus::Fault;
   }
   const Texts wanted = NotMounted(before);
+  if (options.dryRun) {
+    NoteForgotten(options, err);
+    return ExitStatus::Done;
+  }
   if (options.output == "table") {
     PrintOutcome(wanted, now, out);
   } else {

@@ -86,5 +86,13 @@ TEST_F(ClaimCommand, SaysThatMountingIsForgottenOnlyWhereThereWasSome) {
   EXPECT_THAT(_err.str(), HasSubstr("--save"));
 }
 
+TEST_F(ClaimCommand, ADryRunLeavesGroupsAsTheyAreWithoutFault) {
+  _options.dryRun = true;
+  _host.groups = {WithGroups({AGroup("naa.1", {"naa.2"}, false)})};
+  EXPECT_EQ(Run(), ExitStatus::Done);
+  EXPECT_EQ(_out.str(), "");
+  EXPECT_THAT(_err.str(), HasSubstr("(dry run: nothing was changed)"));
+}
+
 }  // namespace
 }  // namespace Kovactl

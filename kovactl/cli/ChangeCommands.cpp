@@ -79,7 +79,10 @@ Consent ConsentOf(bool given) {
 }  // namespace
 
 ChangeOptions OptionsOf(const GlobalOptions& global) {
-  return {.output = global.output, .forgotten = global.HostsThePlugIn() && !global.machine.save};
+  const bool isDescribed = global.HostsThePlugIn() && global.machine.host != Machines::thisMachine;
+  return {.output = global.output,
+          .forgotten = isDescribed && !global.machine.save,
+          .dryRun = static_cast<bool>(global.machine.dryRun)};
 }
 
 void AddChanges(CLI::App& parent,

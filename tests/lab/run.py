@@ -18,7 +18,7 @@ import guest
 
 LIMIT = 900  # seconds for all cases; booting and downloading have limits of their own
 # The order of the files is that of the run; every case leaves the machine as it found it.
-FILES = ("boot", "capture", "plug", "inventory", "groups", "cost")
+FILES = ("boot", "capture", "plug", "inventory", "groups", "plans", "cost")
 
 
 def all_cases():

@@ -53,6 +53,8 @@ DISKS = (
     scsi("twice", 2 * GIB, "TWO0000600", 0x600, "SEEN TWICE", paths=("twice_a", "twice_b")),
     Disk("usb", GIB, "USBSTICK0001", kind="usb"),
     Disk("nvme", 2 * GIB, "NVME0000500", kind="nvme"),
+    *(scsi(f"flash{i}", 2 * GIB, f"SSD000010{i}", 0x100 + i, "FAST SSD 2G", kind="flash") for i in range(2, 5)),
+    *(scsi(f"hdd{i}", 2 * GIB, f"HDD000020{i}", 0x200 + i, "SLOW HDD 2G") for i in range(6, 10)),
 )
 
 CONTROLLERS = (

@@ -6,7 +6,11 @@
     @case(waits_for="what must be there first")
     def ...
 
-A case that waits is not run; the run says so, with the reason. `expect` has the assertions of unittest."""
+    @case(full=True)
+    def ...
+
+A case that waits is not run; the run says so, with the reason. One that is for a full run alone takes long, and is left
+out of others. `expect` has the assertions of unittest."""
 
 import unittest
 
@@ -17,17 +21,18 @@ expect.maxDiff = None
 class Case:
     """One case; `name` is what it is chosen by and told by."""
 
-    def __init__(self, function, waits_for):
+    def __init__(self, function, waits_for, full=False):
         self.sentence = function.__name__.replace("_", " ")
         self.file = function.__module__.rpartition(".")[2]
         self.name = f"{self.file}: {self.sentence}"
         self.waits_for = waits_for
+        self.full = full
         self.run = function
 
 
-def case(waits_for=None):
+def case(waits_for=None, full=False):
     def mark(function):
-        function.case = Case(function, waits_for)
+        function.case = Case(function, waits_for, full)
         return function
     return mark
 

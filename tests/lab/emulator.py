@@ -49,13 +49,13 @@ def wait_for_lock(lock, limit):
 
 
 def start(arguments, log):
-    """A process that ends with its starter, even if that is killed."""
+    """A process that ends with its starter, even if that is killed. What it says is added to the log."""
     libc = ctypes.CDLL(None)
 
     def end_with_parent():
         libc.prctl(PR_SET_PDEATHSIG, signal.SIGKILL)
 
-    with open(log, "wb") as out:
+    with open(log, "ab") as out:
         return subprocess.Popen([PROGRAM, *arguments], stdin=subprocess.DEVNULL, stdout=out, stderr=out,
                                 preexec_fn=end_with_parent)
 

@@ -3,6 +3,8 @@
     with guest.boot("build/lab", "build/dev") as machine:
         machine.run("lsblk").out
 
+The power can be cut, and the machine be switched on again with the data that its disks then have.
+
 Everything that waits has a limit; what goes wrong raises `Failed`, with the end of the machine's console."""
 
 import contextlib
@@ -21,6 +23,7 @@ import packages
 
 BOOT_LIMIT = 120  # seconds; it takes ten when nobody else needs the processors
 MEMORY = "1G"
+LOGS = ("console.log", "emulator.log")
 TESTED = ("bin/agentd", "bin/kovactl", "lib/kova-agentd.so")
 
 Failed = emulator.Failed
@@ -45,24 +48,49 @@ class Outcome:
 class Guest:
     """Not made by hand: `boot` does, and ends it."""
 
-    def __init__(self, work, folder, process, programs):
+    def __init__(self, work, folder, programs, kernel, first):
         self.work = work  # for what a run leaves behind
         self.folder = folder  # seen as /host in the guest
         self.programs = programs
+        self.full = False  # whether cases may take their time
         self.devices = disks.devices()
-        self.answers = True  # until it fails to
+        self.disk_files = make_disks(work)  # by the disks' names
+        self.answers = False  # until it does, and when it fails to
         self.boot_seconds = 0.0
-        self._process = process
+        self._arguments = arguments(work, folder, programs, kernel, first, self.disk_files)
+        self._process = None
         self._number = 0
         self._unplugged = []
-        self._control = emulator.Control(emulator.connect(folder + "/control.sock", process))
-        self._channel = emulator.connect(folder + "/channel.sock", process)
-        self._answers = self._channel.makefile("rb")
+        self._connections = contextlib.ExitStack()
+        self._control = self._channel = self._answers = None
 
-    def close(self):
-        self._answers.close()
-        self._channel.close()
-        self._control.close()
+    def start(self):
+        """Switches it on, with all disks plugged, and waits until it is ready."""
+        self._process = emulator.start(self._arguments, os.path.join(self.work, "emulator.log"))
+        self._unplugged = []
+        with contextlib.ExitStack() as made:
+            self._control = made.enter_context(contextlib.closing(emulator.Control(
+                emulator.connect(self.folder + "/control.sock", self._process))))
+            self._channel = made.enter_context(emulator.connect(self.folder + "/channel.sock", self._process))
+            self._answers = made.enter_context(self._channel.makefile("rb"))
+            self._connections = made.pop_all()
+        self.wait_until_ready()
+
+    def cut(self):
+        """Takes the power away at once. The disks keep what has come to them so far."""
+        self.answers = False
+        if self._process:
+            emulator.end(self._process)
+        self._connections.close()
+        for name in ("control.sock", "channel.sock"):
+            with contextlib.suppress(FileNotFoundError):
+                os.remove(os.path.join(self.folder, name))
+
+    def restart(self):
+        """Ends it when everything is on the disks, and switches it on again."""
+        self.check("sync")
+        self.cut()
+        self.start()
 
     def wait_until_ready(self):
         """Until it answers, and has found the last disk: those on USB come late."""
@@ -200,7 +228,7 @@ def arguments(work, folder, programs, kernel, first, files):
     result = ["-accel", "tcg,thread=multi", "-cpu", "max", "-smp", "2", "-m", MEMORY, "-display", "none", "-nodefaults",
               "-no-reboot", "-kernel", kernel, "-initrd", first,
               "-append", "console=ttyS0 panic=-1 quiet rdinit=/init",
-              "-serial", f"file:{work}/console.log",
+              "-chardev", f"file,id=console,path={work}/console.log,append=on", "-serial", "chardev:console",
               "-qmp", f"unix:{folder}/control.sock,server=on,wait=off",
               "-chardev", f"socket,id=channel,path={folder}/channel.sock,server=on,wait=off",
               "-device", "virtio-serial-pci", "-device", "virtserialport,chardev=channel,name=lab",
@@ -225,12 +253,13 @@ def boot(work, programs):
             kernel, first = image.build(work, programs, TESTED)
         except (image.Failed, packages.Failed) as failure:
             raise Failed(str(failure)) from failure
-        command = arguments(work, folder, programs, kernel, first, make_disks(work))
-        process = emulator.start(command, os.path.join(work, "emulator.log"))
+        for log in LOGS:
+            with open(os.path.join(work, log), "wb"):
+                pass
+        machine = Guest(work, folder, programs, kernel, first)
         try:
-            with contextlib.closing(Guest(work, folder, process, programs)) as machine:
-                machine.wait_until_ready()
-                yield machine
+            machine.start()
+            yield machine
         finally:
-            emulator.end(process)
+            machine.cut()
             shutil.rmtree(os.path.join(work, "disks"), ignore_errors=True)

@@ -18,7 +18,7 @@ HERE = os.path.dirname(os.path.abspath(__file__))
 
 MODULES = """virtio_pci virtio_console virtio_scsi 9p 9pnet_virtio sd_mod nvme xhci_pci usb_storage ext4
 crc32c_generic loop dm_mod dm_cache dm_cache_smq dm_mirror dm_snapshot dm_thin_pool dm_raid dm_multipath
-md_mod raid0 raid1""".split()
+md_mod raid0 raid1 nvmet nvmet_tcp nvme_tcp""".split()
 
 # Programs of this machine, all of packages that every Debian has. Busybox stands in for what is not named here.
 HOST_PROGRAMS = """bash cat cp dd ls lsblk blkid blockdev findmnt losetup mkfs.ext4 mkswap mount stat swapoff swapon

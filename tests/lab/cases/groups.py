@@ -53,6 +53,19 @@ def a_group_is_shown_mounted_as_long_as_its_volumes_are_active(machine):
 
 
 @case()
+def the_data_volume_of_each_capacity_disk_is_shown_as_large_as_it_is(machine):
+    with handmade.group(machine), agent.running(machine) as here:
+        volumes = here.groups()[0]["volume"]
+        expect.assertEqual([one["disk"] for one in volumes], [WWID["hdd0"], WWID["hdd1"]])
+        for one in volumes:
+            expect.assertEqual(one["bytes"], int(machine.check(f"blockdev --getsize64 {one['path']}").out))
+            expect.assertTrue(one["cacheState"])
+        table = machine.check(f"kovactl --agent unix:{agent.SOCKET} groups").out
+        for one in volumes:
+            expect.assertIn(one["path"], table)
+
+
+@case()
 def a_capacity_disk_that_has_left_is_told_by_its_uuid_until_it_is_back(machine):
     absent = "kova:" + handmade.MEMBERS["hdd1"]
     with handmade.group(machine), agent.running(machine) as here:

@@ -43,6 +43,7 @@ struct DiskGroup {
   std::vector<GroupMember> capacity;  // in the order in which they joined
   // The volumes of all capacity disks that are there are active, each on the disk that is there now.
   bool isMounted = false;
+  bool isAllFlash = false;                  // as it was made, whoever has joined or left since
   std::vector<std::string> foreignVolumes;  // that somebody else made in it
 
   bool HasLeft() const noexcept { return cache.canonicalName.empty(); }  // its cache disk

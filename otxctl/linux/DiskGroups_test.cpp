@@ -106,6 +106,21 @@ TEST(DiskGroups, TellOfTheirVolumes) {
   EXPECT_THAT(groups[0].foreignVolumes, IsEmpty());
 }
 
+TEST(DiskGroups, AreOfTheKindThatTheyWereMade) {
+  const auto isAllFlash = [](const std::string& tag, bool areFlash) {
+    Machine machine;
+    machine.disks[1].facts.isFlash = machine.disks[2].facts.isFlash = areFlash;
+    for (PhysicalVolume& volume : machine.physical) {
+      volume.groupTags.push_back(tag);
+    }
+    return machine.Find().at(0).isAllFlash;
+  };
+  EXPECT_TRUE(isAllFlash("kova.kind=all-flash", false));
+  EXPECT_FALSE(isAllFlash("kova.kind=hybrid", true));
+  EXPECT_TRUE(isAllFlash("", true)) << "one that does not say so";
+  EXPECT_FALSE(isAllFlash("", false));
+}
+
 TEST(DiskGroups, TellHowAVolumeIsCached) {
   const auto stateWith = [](const std::function<void(LogicalVolume&)>& change) {
     Machine machine;

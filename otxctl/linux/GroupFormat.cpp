@@ -26,6 +26,12 @@ std::string Microseconds() {
   return std::to_string(std::chrono::duration_cast<std::chrono::microseconds>(now).count());
 }
 
+std::string_view KindOf(const std::vector<const ScannedDisk*>& capacityDisks) {
+  const bool isAllFlash = std::all_of(capacityDisks.begin(), capacityDisks.end(),
+                                      [](const ScannedDisk* disk) { return disk->facts.isFlash.Is(true); });
+  return isAllFlash ? Tags::allFlash : Tags::hybrid;
+}
+
 void Report(std::size_t done, std::size_t all, const std::string& step) {
   if (const TaskScope* const task = TaskScope::Current()) {
     task->ReportProgress(static_cast<int>(done * 100 / all), step);
@@ -74,7 +80,7 @@ void GroupFormat::Make(const std::string& machineId, const ScannedDisk& cacheDis
   Report(0, 1, "making the volume group");
   const std::string creating = Tag(Tags::state, std::string(Tags::creating));
   CreateGroup({std::string(Tags::marker), Tag(Tags::group, uuid), Tag(Tags::machine, machineId), creating,
-               Tag(Tags::created, Microseconds())});
+               Tag(Tags::created, Microseconds()), Tag(Tags::kind, std::string(KindOf(capacityDisks)))});
   try {
     _manager.TagMember(_nodes, _cacheNode,
                        {Tag(Tags::disk, NewUuid()), Tag(Tags::role, std::string(Tags::cache))});

@@ -33,7 +33,8 @@ std::vector<std::string> Plain(std::vector<std::string> lines) {
 
 const std::string create =
     "vgcreate --setautoactivation n --physicalextentsize 4194304b --addtag kova --addtag kova.group=U "
-    "--addtag kova.machine=m1 --addtag kova.state=creating --addtag kova.created=T -- kova_u sda sdb sdc";
+    "--addtag kova.machine=m1 --addtag kova.state=creating --addtag kova.created=T --addtag kova.kind=hybrid "
+    "-- kova_u sda sdb sdc";
 const std::string tagCache = "pvchange --addtag kova.disk=U --addtag kova.role=cache -- sda";
 
 std::string TagDisk(const std::string& disk, const std::string& place) {
@@ -83,6 +84,13 @@ TEST(GroupFormat, MakesAVolumeGroupWithAVolumeForEachCapacityDisk) {
   EXPECT_THAT(machine.locked, ElementsAre("naa.1 free", "naa.2 free", "naa.3 free"));
   EXPECT_THAT(Plain(machine.flushed), ElementsAre("/dev/kova_u/data_u", "/dev/kova_u/data_u"));
   EXPECT_THAT(machine.Recorded(), IsEmpty());
+}
+
+TEST(GroupFormat, AGroupOfFlashDisksAloneSaysSo) {
+  ChangeableMachine machine;
+  ShowMade(machine);
+  WhyNotMade(machine, {"naa.5"});
+  EXPECT_THAT(machine.Changes().at(0), HasSubstr("--addtag kova.kind=all-flash"));
 }
 
 TEST(GroupFormat, LetsTheVolumeManagerSeeTheDisksConcernedAlone) {

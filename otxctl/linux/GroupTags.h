@@ -12,6 +12,7 @@ inline constexpr std::string_view group = "kova.group=";      // the disk group'
 inline constexpr std::string_view machine = "kova.machine=";  // the id of the machine that made it
 inline constexpr std::string_view state = "kova.state=";      // one of the states below
 inline constexpr std::string_view created = "kova.created=";  // microseconds since 1970: the order of groups
+inline constexpr std::string_view kind = "kova.kind=";        // as it was made: one of the kinds below
 
 // Of its members; the disk's UUID also of a capacity disk's data volume, for without one it is no member.
 inline constexpr std::string_view disk = "kova.disk=";    // the disk's KOVA UUID
@@ -24,6 +25,9 @@ inline constexpr std::string_view ready = "ready";
 inline constexpr std::string_view removing = "removing";
 // Its cache disk was removed after it had left the host, and its volumes hold data.
 inline constexpr std::string_view released = "released";
+
+inline constexpr std::string_view hybrid = "hybrid";
+inline constexpr std::string_view allFlash = "all-flash";
 
 inline constexpr std::string_view cache = "cache";
 inline constexpr std::string_view capacity = "capacity";

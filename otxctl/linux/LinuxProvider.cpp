@@ -52,15 +52,6 @@ struct Members {
   }
 };
 
-bool IsAllFlash(const DiskGroup& group) {
-  for (const GroupMember& member : group.capacity) {
-    if (!member.isFlash) {
-      return false;
-    }
-  }
-  return true;
-}
-
 }  // namespace
 
 void LinuxProvider::QueryDisks(const std::vector<std::string>& names, std::vector<DiskResult>& results,
@@ -104,7 +95,7 @@ void LinuxProvider::GetDiskMappings(std::vector<DiskMapping>& mappings, bool wit
       mapping.capacityDisks.push_back(NameOf(member));
     }
     mapping.formatVersion = groupFormatVersion;
-    mapping.allFlash = IsAllFlash(group);
+    mapping.allFlash = group.isAllFlash;
     mapping.thirdFlag = !group.isMounted;
   }
 }

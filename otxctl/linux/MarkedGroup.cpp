@@ -94,6 +94,7 @@ void MarkedGroup::Read() {
   ReadCapacityDisks();
   ReadForeignVolumes();
   _group.isMounted = IsMounted();
+  _group.isAllFlash = IsAllFlash();
 }
 
 void MarkedGroup::ReadCacheDisk() {
@@ -188,6 +189,16 @@ bool MarkedGroup::IsMounted() const {
   }
   const bool isCacheStale = _cache != nullptr && _cache->disk != nullptr && !IsHeld(*_cache);
   return hasActive && !_isStale && !isCacheStale && !_group.cache.isLeftBehind;
+}
+
+// A group that does not say so is what its members are.
+bool MarkedGroup::IsAllFlash() const {
+  const std::string kind = ValueOf(_source.tags, Tags::kind).value_or("");
+  if (!kind.empty()) {
+    return kind == Tags::allFlash;
+  }
+  return std::all_of(_group.capacity.begin(), _group.capacity.end(),
+                     [](const GroupMember& member) { return member.isFlash; });
 }
 
 }  // namespace OtxCtl::Linux

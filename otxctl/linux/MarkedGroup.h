@@ -36,6 +36,7 @@ class MarkedGroup {
   void AddCapacityDisk(const Member& member, const LogicalVolume& volume);
   void Identify(const std::string& uuid);
   bool IsMounted() const;
+  bool IsAllFlash() const;
 
   const VolumeGroup& _source;
   const std::string _uuid;

@@ -27,14 +27,12 @@ using Tessa::System::LockGuard;
 namespace {
 
 void DemandNoRepeat(Logger& logger, const std::vector<std::string>& names) {
-  const auto repeated = Planning::FindRepeatedNeighbour({names.begin(), names.end()});
-  if (!repeated) {
-    return;
+  if (const auto repeated = Planning::FindRepeatedNeighbour({names.begin(), names.end()})) {
+    const std::string& told = names[*repeated];
+    LogInternal(logger, LogLevel::Warning,
+                "Error checking disk uniqueness, duplicate disks found in mappings: %1", told);
+    throw DuplicateDisks::Exception(MakeRef<DuplicateDisks>(told));
   }
-  const std::string& told = names[*repeated];
-  LogInternal(logger, LogLevel::Warning,
-              "Error checking disk uniqueness, duplicate disks found in mappings: %1", told);
-  throw DuplicateDisks::Exception(MakeRef<DuplicateDisks>(told));
 }
 
 // A fault that says by its one message which limit stopped the planning.

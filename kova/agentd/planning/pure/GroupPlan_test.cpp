@@ -20,7 +20,7 @@ using Candidates = std::vector<Candidate>;
 using testing::Each;
 
 constexpr Candidate cacheDisk = {.isCache = true};
-constexpr Candidate capacityDisk = {.isCache = false};
+constexpr Candidate capacityDisk = {};  // as a disk is unless somebody says otherwise
 
 Candidates operator*(std::size_t count, const Candidate& candidate) {
   return Candidates(count, candidate);

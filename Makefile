@@ -1,6 +1,6 @@
 # The front door. Every target installs what it needs and builds what it uses.
 .DEFAULT_GOAL := help
-.PHONY: help demo test clients check commits api-check bench growth soak door tls-check lab lab-programs lab-record mutants build format-check format asan tsan shipped clang tidy fuzz clean
+.PHONY: help demo test clients check commits api-check bench growth soak door tls-check lab lab-full lab-programs lab-record mutants build format-check format asan tsan shipped clang tidy fuzz clean
 
 SETUP := tools/setup/install-packages.sh
 JOBS ?= $(shell nproc)
@@ -19,6 +19,7 @@ help:
 	@echo "make door    an agent with 2,000 clients at its doors who want nothing good: others are answered as in peace"
 	@echo "make tls-check  testssl on the agent: versions, suites, tickets, known weaknesses"
 	@echo "make lab     real disks in a virtual machine: the kernel's, unplugged and plugged; CASE=WORDS, LIST=1"
+	@echo "make lab-full  all of it: the contract suite on real disks, twenty power cuts; an hour or more"
 	@echo "make build   the release build only: build/release"
 
 build:
@@ -146,10 +147,14 @@ tls-check:
 lab: lab-programs
 	@python3 -B tests/lab/run.py $(if $(LIST),--list) --case "$(CASE)" build/lab build/dev
 
+# The same with the cases that take long, and with more rounds of those that repeat something.
+lab-full: lab-programs
+	@python3 -B tests/lab/run.py --full $(if $(LIST),--list) --case "$(CASE)" build/lab build/dev
+
 lab-programs:
 	@$(SETUP) build lab
 	@cmake --preset dev >/dev/null
-	@cmake --build --preset dev -j $(JOBS) --target agentd kovactl
+	@cmake --build --preset dev -j $(JOBS) --target agentd kovactl linux_contract
 
 # What unit tests read in place of a kernel and of a volume manager, recorded in that machine.
 lab-record: lab-programs

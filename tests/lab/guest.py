@@ -24,7 +24,7 @@ import packages
 BOOT_LIMIT = 120  # seconds; it takes ten when nobody else needs the processors
 MEMORY = "1G"
 LOGS = ("console.log", "emulator.log")
-TESTED = ("bin/agentd", "bin/kovactl", "lib/kova-agentd.so")
+TESTED = ("bin/agentd", "bin/kovactl", "lib/kova-agentd.so", "test/linux_contract")
 
 Failed = emulator.Failed
 

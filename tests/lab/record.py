@@ -72,8 +72,8 @@ def settle(machine):
 
 
 def record_in_use(machine, out):
-    record_tree(machine, out, "lab", "Disks that nobody uses: five of flash, thirteen hard disks of which one has two paths "
-                                     "and one a partition, USB, NVMe.")
+    record_tree(machine, out, "lab", "Disks that nobody uses: five of flash, thirteen hard disks of which one has two "
+                                     "paths and one a partition, USB, NVMe.")
     make_group(machine)
     record_reports(machine, out, "tagged")
     use_more(machine)

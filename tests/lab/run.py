@@ -22,7 +22,7 @@ import guest
 LIMIT = 1800
 FULL_LIMIT = 4 * 3600
 # The order of the files is that of the run; every case leaves the machine as it found it.
-FILES = ("boot", "capture", "plug", "inventory", "groups", "plans", "cost")
+FILES = ("boot", "capture", "plug", "inventory", "groups", "plans", "contract", "cost")
 
 
 def all_cases():

@@ -19,7 +19,7 @@ help:
 	@echo "make door    an agent with 2,000 clients at its doors who want nothing good: others are answered as in peace"
 	@echo "make tls-check  testssl on the agent: versions, suites, tickets, known weaknesses"
 	@echo "make lab     real disks in a virtual machine: the kernel's, unplugged and plugged; CASE=WORDS, LIST=1"
-	@echo "make lab-full  all of it: the contract suite on real disks, twenty power cuts; an hour or more"
+	@echo "make lab-full  all of it: the contract suite on real disks, twenty power cuts; takes hours"
 	@echo "make build   the release build only: build/release"
 
 build:

@@ -1,7 +1,10 @@
 """The agent in the guest, on the guest's own disks, for as long as a case asks it.
 
     with agent.running(machine) as agent_here:
-        agent_here.disks()"""
+        agent_here.disks()
+        agent_here.run("claim")
+
+It may end before: with the machine, if a case cuts its power."""
 
 import contextlib
 
@@ -21,8 +24,16 @@ class Agent:
     def groups(self):
         return self._ask("groups").get("diskMapInfo", [])
 
+    def run(self, arguments, limit=300):
+        """What kovactl prints; the case fails unless the change is made."""
+        return self._machine.check(command(arguments), limit).out
+
     def _ask(self, what):
-        return self._machine.check(f"kovactl --agent unix:{SOCKET} {what} -o json").json()
+        return self._machine.check(command(what + " -o json")).json()
+
+
+def command(arguments):
+    return f"kovactl --agent unix:{SOCKET} {arguments}"
 
 
 @contextlib.contextmanager
@@ -33,5 +44,10 @@ def running(machine):
         machine.eventually("the agent answers", lambda: machine.run("test -s /run/ready").status == 0)
         yield Agent(machine)
     finally:
-        machine.run("kill $(cat /run/agentd.pid)")
-        machine.eventually("the agent has ended", lambda: machine.run("kill -0 $(cat /run/agentd.pid)").status != 0)
+        if machine.answers:
+            end(machine)
+
+
+def end(machine):
+    machine.run("kill $(cat /run/agentd.pid)")
+    machine.eventually("the agent has ended", lambda: machine.run("kill -0 $(cat /run/agentd.pid)").status != 0)

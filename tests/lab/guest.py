@@ -86,6 +86,12 @@ class Guest:
             with contextlib.suppress(FileNotFoundError):
                 os.remove(os.path.join(self.folder, name))
 
+    def renew(self):
+        """Cuts its power, empties all disks, and switches it on again."""
+        self.cut()
+        self.disk_files = make_disks(self.work)
+        self.start()
+
     def restart(self):
         """Ends it when everything is on the disks, and switches it on again."""
         self.check("sync")
@@ -103,6 +109,8 @@ class Guest:
 
     def run(self, command, limit=60):
         """Runs a command in bash; stdout and stderr are apart. Fails if it takes longer than `limit` seconds."""
+        if not self.answers:
+            raise self.failed(f"{command}\nis not run: the machine is off, or answers no more")
         self._number += 1
         base = os.path.join(self.folder, str(self._number))
         with open(base + ".sh", "w", encoding="utf-8") as file:

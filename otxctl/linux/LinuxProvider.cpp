@@ -2,6 +2,7 @@
 
 #include <unordered_map>
 #include <unordered_set>
+#include <utility>
 
 #include "kova/agentd/include/HostCtlException.h"
 #include "otxctl/provider/NicRecords.h"
@@ -21,34 +22,63 @@ DiskName NameOf(const GroupMember& member) {
   return {member.canonicalName, member.kovaUuid};
 }
 
-// Of each member that is there, by its canonical name, and of each that is not.
+DiskResult RecordOfAbsent(const GroupMember& member, const DiskGroup& group) {
+  DiskResult record;
+  record.kovaUuid = member.kovaUuid;
+  record.state = group.isMounted ? DiskState::InUse : DiskState::Ineligible;
+  record.reason = group.isMounted ? DiskReason::None : DiskReason::GroupNotMounted;
+  record.isSsd = member.isFlash;
+  record.isPdl = true;
+  record.formatVersion = groupFormatVersion;
+  return record;
+}
+
+// `uuid`: of a member; empty: it is none.
+DiskResult RecordOf(const LinuxSnapshot& seen, std::size_t index, const std::string& uuid) {
+  const Disks::DiskFacts& facts = seen.disks[index].facts;
+  DiskResult record;
+  record.name = facts.canonicalName;
+  record.state = seen.verdicts[index].state;
+  record.reason = seen.verdicts[index].reason;
+  record.isSsd = facts.isFlash.Is(true);
+  record.capacityFlash = record.isSsd && seen.settings.capacityFlash.count(record.name) > 0;
+  record.kovaUuid = uuid;
+  record.formatVersion = uuid.empty() ? 0 : groupFormatVersion;
+  return record;
+}
+
+// The members of all groups: of those that are there, the UUIDs by canonical name; of those that are not, the
+// records, at their place. They have none in the kernel's order any more: they stand behind the member before
+// them in their group, or before the first one that is there.
 struct Members {
   std::unordered_map<std::string, std::string> uuidOf;
-  std::vector<DiskResult> absent;
+  std::unordered_map<std::string, std::vector<DiskResult>> before;
+  std::unordered_map<std::string, std::vector<DiskResult>> behind;
+  std::vector<DiskResult> alone;  // of groups of which no disk is there
 
   explicit Members(const std::vector<DiskGroup>& groups) {
     for (const DiskGroup& group : groups) {
-      Add(group.cache, group);
+      std::string last;
+      std::vector<DiskResult> first;
+      Add(group.cache, group, last, first);
       for (const GroupMember& member : group.capacity) {
-        Add(member, group);
+        Add(member, group, last, first);
       }
+      alone.insert(alone.end(), first.begin(), first.end());
     }
   }
 
  private:
-  void Add(const GroupMember& member, const DiskGroup& group) {
+  // `last`: the member that is there and was added last; `first`: those added before there was any.
+  void Add(const GroupMember& member, const DiskGroup& group, std::string& last,
+           std::vector<DiskResult>& first) {
     if (!member.canonicalName.empty()) {
-      uuidOf.emplace(member.canonicalName, member.kovaUuid);
-      return;
+      last = member.canonicalName;
+      uuidOf.emplace(last, member.kovaUuid);
+      before[last] = std::exchange(first, {});
+    } else {
+      (last.empty() ? first : behind[last]).push_back(RecordOfAbsent(member, group));
     }
-    DiskResult record;
-    record.kovaUuid = member.kovaUuid;
-    record.state = group.isMounted ? DiskState::InUse : DiskState::Ineligible;
-    record.reason = group.isMounted ? DiskReason::None : DiskReason::GroupNotMounted;
-    record.isSsd = member.isFlash;
-    record.isPdl = true;
-    record.formatVersion = groupFormatVersion;
-    absent.push_back(std::move(record));
   }
 };
 
@@ -57,31 +87,25 @@ struct Members {
 void LinuxProvider::QueryDisks(const std::vector<std::string>& names, std::vector<DiskResult>& results,
                                bool) {
   const auto seen = _host->Current();
-  const Members members(seen->groups);
+  Members members(seen->groups);
   const std::unordered_set<std::string> wanted(names.begin(), names.end());
   const auto isWanted = [&wanted](const std::string& name) {
     return wanted.empty() || wanted.count(name) > 0;
   };
+  const auto addAbsent = [&](const std::vector<DiskResult>& absent) {
+    if (isWanted("")) {
+      results.insert(results.end(), absent.begin(), absent.end());
+    }
+  };
   for (std::size_t index = 0; index < seen->disks.size(); ++index) {
-    const Disks::DiskFacts& facts = seen->disks[index].facts;
-    if (!isWanted(facts.canonicalName)) {
-      continue;
+    const std::string& name = seen->disks[index].facts.canonicalName;
+    addAbsent(members.before[name]);
+    if (isWanted(name)) {
+      results.push_back(RecordOf(*seen, index, members.uuidOf[name]));
     }
-    const auto uuid = members.uuidOf.find(facts.canonicalName);
-    DiskResult& record = results.emplace_back();
-    record.name = facts.canonicalName;
-    record.state = seen->verdicts[index].state;
-    record.reason = seen->verdicts[index].reason;
-    record.isSsd = facts.isFlash.Is(true);
-    record.capacityFlash = record.isSsd && seen->settings.capacityFlash.count(record.name) > 0;
-    if (uuid != members.uuidOf.end()) {
-      record.kovaUuid = uuid->second;
-      record.formatVersion = groupFormatVersion;
-    }
+    addAbsent(members.behind[name]);
   }
-  if (isWanted("")) {
-    results.insert(results.end(), members.absent.begin(), members.absent.end());
-  }
+  addAbsent(members.alone);
 }
 
 void LinuxProvider::GetDiskMappings(std::vector<DiskMapping>& mappings, bool withUnmounted) {

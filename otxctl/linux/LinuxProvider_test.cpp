@@ -181,6 +181,32 @@ TEST(LinuxProvider, WithNothingToChangeByItRefusesEveryChange) {
   }
 }
 
+TEST(LinuxProvider, ADiskThatHasLeftStandsBesideTheMembersOfItsGroup) {
+  const auto uuidsWithout = [](const std::vector<std::size_t>& absent) {
+    ChangeableMachine machine;
+    GroupRow group = WholeGroup();
+    for (const std::size_t member : absent) {
+      group.members[member].disk = "";
+    }
+    machine.Show({group});
+    std::vector<DiskResult> records;
+    LinuxProvider(machine.host).QueryDisks({}, records, true);
+    std::vector<std::string> uuids;
+    for (const DiskResult& record : records) {
+      if (!record.kovaUuid.empty()) {
+        uuids.push_back(record.kovaUuid);
+      }
+    }
+    EXPECT_EQ(records.size(), 5U + absent.size()) << "a disk that is there beside each that has left";
+    return uuids;
+  };
+  using testing::ElementsAre;
+  EXPECT_THAT(uuidsWithout({1}), ElementsAre("u1", "u2", "u3"));
+  EXPECT_THAT(uuidsWithout({0}), ElementsAre("u1", "u2", "u3"));
+  EXPECT_THAT(uuidsWithout({0, 1}), ElementsAre("u1", "u2", "u3"));
+  EXPECT_THAT(uuidsWithout({1, 2}), ElementsAre("u1", "u2", "u3"));
+}
+
 TEST(LinuxProvider, HandsChangesOn) {
   ChangeableMachine machine;
   GroupRow group = WholeGroup();

@@ -22,7 +22,8 @@ import guest
 LIMIT = 3600
 FULL_LIMIT = 6 * 3600
 # The order of the files is that of the run; every case leaves the machine as it found it.
-FILES = ("boot", "capture", "plug", "inventory", "groups", "plans", "contract", "made", "power", "cost")
+FILES = ("boot", "capture", "plug", "inventory", "groups", "plans", "contract", "alike", "made", "readme", "power",
+         "cost")
 
 
 def all_cases():

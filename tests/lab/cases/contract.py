@@ -16,7 +16,8 @@ KINDS = {"flash": [f"flash{i}" for i in range(5)], "hdd": [f"hdd{i}" for i in ra
          "usb": ["usb"]}
 # Tests that go through each operation once, and through some refusals; the others run in a full run.
 QUICK = """SaysWhyADiskCannotBeUsed FormattingWithTheSsdOfAGroupExtendsIt MountingBringsARestampedGroupBackAsItWas
-ARemovedDiskCanBeUsedAgain OnlyAbsentDisksAreRemovedByIdentity AnAbsentCacheDiskTakesItsGroupAlong""".split()
+AnAbsentDiskKeepsItsRecordWithoutAName ARemovedDiskCanBeUsedAgain OnlyAbsentDisksAreRemovedByIdentity
+AnAbsentCacheDiskTakesItsGroupAlong""".split()
 # Seconds; those that need longer than the others by their nature.
 LIMIT = 600
 LONG = {"ConcurrentCallsDoNotDisturbEachOther": 3 * 3600}

@@ -61,8 +61,18 @@ void GroupChanges::KeepOthersOut() {
   AsFailureOf("the disks of this host cannot be changed", [this] { _hostLock.Take(); });
 }
 
+void GroupChanges::CheckTools() const {
+  const std::string& program = _host->GetOptions().volumeManager;
+  if (!_manager.IsDryRun() && !_tools.commands->Has(program)) {
+    throw HostCtlException("the disks of this host cannot be changed: " + program +
+                           " is not there; it comes with the package lvm2");
+  }
+}
+
 GroupChanges::Change::Change(GroupChanges& changes)
-    : guard(changes._changing), host(*changes._host), seen((changes.KeepOthersOut(), host.LookAgain())) {}
+    : guard(changes._changing),
+      host(*changes._host),
+      seen((changes.CheckTools(), changes.KeepOthersOut(), host.LookAgain())) {}
 
 // Nobody may go by what was seen before.
 GroupChanges::Change::~Change() {

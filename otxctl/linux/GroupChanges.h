@@ -63,6 +63,8 @@ class GroupChanges {
   using Snapshot = std::shared_ptr<const LinuxSnapshot>;
   using Locks = std::vector<std::unique_ptr<DiskLock>>;
 
+  void CheckTools() const;
+
   // One at a time, from the first look to the last.
   struct Change {
     explicit Change(GroupChanges& changes);

@@ -397,6 +397,14 @@ TEST_F(GroupChangesTest, WhoLooksOnceSeesWhatHasChangedAllTheSame) {
   EXPECT_FALSE(machine.host->Look()->groups.at(0).isMounted);
 }
 
+TEST_F(GroupChangesTest, WithoutAVolumeManagerNothingIsBegun) {
+  machine.machine.results.areThere = false;
+  EXPECT_THAT(Refusal<HostCtlException>([&] { Changes().Format("naa.1", {"naa.2"}); }),
+              HasSubstr("/usr/sbin/lvm is not there; it comes with the package lvm2"));
+  EXPECT_THAT(machine.machine.results.commands, IsEmpty());
+  EXPECT_THAT(machine.Recorded(), IsEmpty());
+}
+
 TEST_F(GroupChangesTest, KeepOtherProgramsOut) {
   const std::string file = machine.machine.tree.Full("run/lock").string();
   machine.machine.tree.MakeFolder("run");

@@ -113,7 +113,7 @@ def run_sequence(machine, seed, length):
 
 @case()
 def the_same_requests_have_the_same_results_as_on_a_twin(machine):
-    run_sequence(machine, 11, 6)
+    run_sequence(machine, 15, 5)
 
 
 @case(full=True)

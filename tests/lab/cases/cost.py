@@ -55,7 +55,7 @@ def tell(what, machine):
     return programs
 
 
-@case()
+@case(full=True)
 def the_agent_runs_no_program_for_an_answer_without_physical_volumes(machine):
     with agent.running(machine):
         expect.assertEqual(tell("no group", machine), 0)

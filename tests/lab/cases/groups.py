@@ -65,7 +65,7 @@ def the_data_volume_of_each_capacity_disk_is_shown_as_large_as_it_is(machine):
             expect.assertIn(one["path"], table)
 
 
-@case()
+@case(full=True)
 def a_capacity_disk_that_has_left_is_told_by_its_uuid_until_it_is_back(machine):
     absent = "kova:" + handmade.MEMBERS["hdd1"]
     with handmade.group(machine), agent.running(machine) as here:
@@ -85,7 +85,7 @@ def a_capacity_disk_that_has_left_is_told_by_its_uuid_until_it_is_back(machine):
         machine.check("dd if=/dev/lab/data1 of=/dev/null bs=1M count=1")
 
 
-@case()
+@case(full=True)
 def a_cache_disk_that_has_left_is_told_by_its_uuid(machine):
     absent = "kova:" + handmade.MEMBERS[handmade.CACHE]
     with handmade.group(machine), agent.running(machine) as here:
@@ -95,7 +95,7 @@ def a_cache_disk_that_has_left_is_told_by_its_uuid(machine):
         expect.assertNotIn("eligible", states(here.disks(), ("hdd0", "hdd1")))
 
 
-@case()
+@case(full=True)
 def a_disk_that_its_group_has_given_up_is_not_offered_when_it_comes_back(machine):
     with handmade.group(machine), agent.running(machine) as here:
         machine.check("vgchange -q -a n lab")
@@ -127,7 +127,7 @@ def none_is_offered(here, words):
         expect.assertIn(f"member of disk group {handmade.UUID}, {words}", detail)
 
 
-@case()
+@case(full=True)
 def what_has_the_marks_and_is_no_group_of_this_machine_is_told_and_not_offered(machine):
     with handmade.group(machine, others=("usb",)), agent.running(machine) as here:
         with retagged(machine, "kova.state=ready", "kova.state=creating"):

@@ -28,7 +28,7 @@ def unused(answers):
     return [name for name, (state, _) in real.states(answers).items() if state == "eligible"]
 
 
-@case()
+@case(full=True)
 def what_is_written_to_a_group_is_there_after_it_was_unmounted_and_after_a_restart(machine):
     for path in SPARE:
         machine.unplug(path)
@@ -102,7 +102,7 @@ def takes_back(machine, here, data):
     verify(data, real.volumes(machine, here))
 
 
-@case()
+@case(full=True)
 def the_other_disks_of_a_group_work_on_when_a_capacity_disk_leaves_and_it_comes_back_whole(machine):
     with real.groups(machine) as here:
         data = make_group(machine, here)
@@ -114,7 +114,7 @@ def the_other_disks_of_a_group_work_on_when_a_capacity_disk_leaves_and_it_comes_
         takes_back(machine, here, data)
 
 
-@case()
+@case(full=True)
 def what_was_written_to_a_group_is_whole_after_its_cache_disk_has_left_and_come_back(machine):
     with real.groups(machine) as here:
         data = make_group(machine, here)
@@ -142,7 +142,7 @@ cat /run/questions; rm /run/questions
 """
 
 
-@case()
+@case(full=True)
 def questions_are_answered_while_a_group_is_made(machine):
     with real.groups(machine) as here:
         capacity = " ".join(WWID[f"hdd{number}"] for number in range(7))

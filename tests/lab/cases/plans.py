@@ -50,7 +50,7 @@ def a_plan_is_made_of_free_disks_and_writes_to_none(machine):
         expect.assertEqual(summary(here.disks()), summary(answers))
 
 
-@case()
+@case(full=True)
 def a_plan_knows_a_group_and_the_disk_that_has_left_it(machine):
     with handmade.group(machine), agent.running(machine) as here:
         machine.unplug("hdd1")
@@ -63,7 +63,7 @@ def a_plan_knows_a_group_and_the_disk_that_has_left_it(machine):
         machine.eventually("hdd1 is back", lambda: absent not in [one[0] for one in summary(here.disks())])
 
 
-@case()
+@case(full=True)
 def the_generation_is_another_one_while_something_has_changed(machine):
     with handmade.group(machine), agent.running(machine):
         def generation():
